@@ -1,0 +1,197 @@
+#pragma once
+
+// The type-library component. A type library is a host model of its own
+// with its own client model (Lum_TlmModel). The library is the client of its
+// design manager; each type block lives in a design named after it, as the
+// top block of the design's view "type"; the design's other views with a top
+// block are the type block's hierarchies, keyed by view name.
+
+#include "Orb_Templates.h"
+#include "PM_PIC.h"
+#include "Port_String.h"
+
+#include <memory>
+#include <string>
+#include <vector>
+
+class Lum_TlmBlock;
+class Lum_TlmDesign;
+class Lum_TlmLibrary;
+class Lum_TlmModel;
+class Lum_TlmNetwork;
+class Lum_TlmPin;
+class Lum_TlmSignal;
+class Lum_TlmView;
+
+struct Lum_TlmTraits {
+  using Model = Lum_TlmModel;
+  using DesignMgr = Lum_TlmLibrary;
+  using Design = Lum_TlmDesign;
+  using View = Lum_TlmView;
+  using Block = Lum_TlmBlock;
+  using Pin = Lum_TlmPin;
+  using Signal = Lum_TlmSignal;
+  using Network = Lum_TlmNetwork;
+};
+
+// Names and values the component stores in its host models.
+namespace Lum_TlmNames {
+constexpr char const *kTypeViewName = "type";
+constexpr char const *kDesignTypeProperty = "TDS_DESIGN_TYPE";
+constexpr char const *kDesignTypeLibrary = "TDS_DESIGN_TYPE_LIBRARY";
+constexpr char const *kDesignTypeUser = "TDS_DESIGN_TYPE_USER";
+constexpr char const *kVersionProperty = "TLM_VERSION";
+constexpr char const *kFirstQualifierProperty = "TLM_QUALIFIER_1";
+constexpr char const *kSecondQualifierProperty = "TLM_QUALIFIER_2";
+constexpr char const *kLocalLibraryCompanion = "Lum_TlmLocalLibrary";
+} // namespace Lum_TlmNames
+
+// The client model of a type library's host model. It specializes every host
+// object into the component's classes and destroys them on deletion.
+class LUM_PLATFORM_API Lum_TlmModel : public Orb_ModelT<Lum_TlmTraits> {
+public:
+  // A new, empty library model (owns its host model).
+  Lum_TlmModel(char const *name, char const *dbName, char const *path, bool readOnly);
+  // Attached to an existing host model.
+  explicit Lum_TlmModel(Orb_Model *model);
+  ~Lum_TlmModel() override;
+
+  // Creates the library (the model's design manager). Throws Orb_Exception
+  // for a duplicate name and Lum_ExceptionInvalidLibrary for a name that is
+  // empty or holds a space or a ":".
+  Lum_TlmLibrary *CreateLibrary(char const *name, unsigned version, unsigned revision,
+                                char const *firstQualifier = "", char const *secondQualifier = "");
+  // The first library of the model, or null.
+  Lum_TlmLibrary *GetLibrary();
+
+  void SyncEventSpecializeDesignMgr(Orb_DesignMgr *o) override;
+  void SyncEventSpecializeDesign(Orb_Design *o) override;
+  void SyncEventSpecializeView(Orb_View *o) override;
+  void SyncEventSpecializeBlock(Orb_Block *o) override;
+  void SyncEventSpecializePin(Orb_Pin *o) override;
+  void SyncEventSpecializeSignal(Orb_Signal *o) override;
+  void SyncEventSpecializeNetwork(Orb_Network *o) override;
+  void SyncEventDeleteDesignMgr(Orb_DesignMgr *o) override;
+  void SyncEventDeleteDesign(Orb_Design *o) override;
+  void SyncEventDeleteView(Orb_View *o) override;
+  void SyncEventDeleteBlock(Orb_Block *o) override;
+  void SyncEventDeletePin(Orb_Pin *o) override;
+  void SyncEventDeleteSignal(Orb_Signal *o) override;
+  void SyncEventDeleteNetwork(Orb_Network *o) override;
+};
+
+// A type library: the client of its model's design manager.
+class LUM_PLATFORM_API Lum_TlmLibrary : public Orb_DesignMgrT<Lum_TlmTraits> {
+public:
+  // The name of a design database's local library.
+  static char const *const LOCAL_LIBRARY_NAME;
+
+  Lum_TlmLibrary(Lum_TlmModel *model, Orb_DesignMgr *designMgr);
+  ~Lum_TlmLibrary() override;
+
+  char const *GetLibraryName() const { return GetName(); }
+  void GetTlmVersion(unsigned &version, unsigned &revision) const;
+  virtual Port::StringBase<char> GetFirstQualifier() const;
+  virtual Port::StringBase<char> GetSecondQualifier() const;
+
+  // The type block of that name, or null.
+  Lum_TlmBlock const *GetTypeBlock(Port::StringBase<char> const &name) const;
+  Lum_TlmBlock *GetTypeBlock(Port::StringBase<char> const &name);
+
+  // Type blocks in creation order.
+  std::vector<Lum_TlmBlock *> GetTypeBlocks() const;
+
+  // Adds a type block (a design of that name with its "type" view and top
+  // block). Throws Lum_ExceptionInvalidTypeBlock for a name that is empty or
+  // holds a ":", Orb_Exception for a duplicate.
+  Lum_TlmBlock *CreateTypeBlock(char const *name);
+
+  // Saves the library's host model to a library file.
+  void Save(char const *path) const;
+
+  // Loads a library by name for a personality: from the catalog, else from
+  // the first file found on the search path (<dir>/<personality>/<name>.tlm
+  // before <dir>/<name>.tlm). Each call takes a reference. Never null: a
+  // library that cannot be found throws Lum_ExceptionInvalidLibrary naming
+  // the library and the search path; an unreadable file throws what the host
+  // throws for it.
+  static Lum_TlmLibrary const *LoadLibrary(Port::StringBase<char> const &name,
+                                           PM_PIC const &personality);
+  // Gives back a reference taken by LoadLibrary. A library read from a file
+  // is unloaded with its last reference. Null, the local library and a
+  // library that holds no reference are ignored.
+  static void ReleaseLibrary(Lum_TlmLibrary const *library);
+  // The local library of a design database, made on first request and kept
+  // with the host model (saved and reopened with it). Never released.
+  static Lum_TlmLibrary *GetLocalLibrary(Orb_Model *model, PM_PIC const &personality);
+};
+
+// The client of a type block design. Marks itself as a library design.
+class LUM_PLATFORM_API Lum_TlmDesign : public Orb_DesignT<Lum_TlmTraits> {
+public:
+  Lum_TlmDesign(Lum_TlmModel *model, Orb_Design *design);
+  // Whether the design holds type blocks: it carries TDS_DESIGN_TYPE with a
+  // value other than "TDS_DESIGN_TYPE_USER".
+  static bool IsTypeBlockDesign(Orb_Design const &design);
+};
+
+class LUM_PLATFORM_API Lum_TlmView : public Orb_ViewT<Lum_TlmTraits> {
+public:
+  Lum_TlmView(Lum_TlmModel *model, Orb_View *view) : Orb_ViewT<Lum_TlmTraits>(model, view) {}
+};
+
+// A type block (the top block of a type view) or a block of a hierarchy.
+class LUM_PLATFORM_API Lum_TlmBlock : public Orb_BlockT<Lum_TlmTraits> {
+public:
+  Lum_TlmBlock(Lum_TlmModel *model, Orb_Block *block) : Orb_BlockT<Lum_TlmTraits>(model, block) {}
+
+  // The library that holds the block.
+  Lum_TlmLibrary const *GetLibrary() const;
+  // Library name, ":", type block name.
+  Port::StringBase<char> GetUniqueTag() const;
+
+  // Whether the type block has a hierarchy for that view name, and its host
+  // top block (null when none).
+  bool HasHier(Port::StringBase<char> viewName) const;
+  Orb_Block *GetHier(Port::StringBase<char> viewName) const;
+  // Creates the hierarchy for a view name and returns its top block.
+  Lum_TlmBlock *CreateHier(char const *viewName);
+};
+
+class LUM_PLATFORM_API Lum_TlmPin : public Orb_PinT<Lum_TlmTraits> {
+public:
+  Lum_TlmPin(Lum_TlmModel *model, Orb_Pin *pin) : Orb_PinT<Lum_TlmTraits>(model, pin) {}
+};
+
+class LUM_PLATFORM_API Lum_TlmSignal : public Orb_SignalT<Lum_TlmTraits> {
+public:
+  Lum_TlmSignal(Lum_TlmModel *model, Orb_Signal *signal)
+      : Orb_SignalT<Lum_TlmTraits>(model, signal) {}
+};
+
+class LUM_PLATFORM_API Lum_TlmNetwork : public Orb_NetworkT<Lum_TlmTraits> {
+public:
+  Lum_TlmNetwork(Lum_TlmModel *model, Orb_Network *network)
+      : Orb_NetworkT<Lum_TlmTraits>(model, network) {}
+};
+
+// The catalog of libraries and the search path for library files.
+class LUM_PLATFORM_API Lum_TlmCatalog {
+public:
+  // Makes an in-memory library loadable by its name. The caller keeps it
+  // alive until it is unregistered (its destruction unregisters it). A name
+  // already in the catalog throws Lum_ExceptionInvalidLibrary.
+  static void Register(Lum_TlmLibrary *library);
+  static void Unregister(Lum_TlmLibrary const *library);
+
+  // Library directories, searched in the order added, before those of the
+  // environment variable LUM_TLM_PATH (colon-separated).
+  static void AddSearchDirectory(char const *directory);
+  static void ClearSearchDirectories();
+  static std::string GetSearchPath();
+
+  // References held on the library of that name (0 when not in the catalog),
+  // and whether it is in the catalog.
+  static unsigned GetReferenceCount(char const *name);
+  static bool IsLoaded(char const *name);
+};

@@ -1,0 +1,1 @@
+// Catalog (to be written).

@@ -1,0 +1,369 @@
+// Bridge, events and client bases.
+
+#include "Orb_Derived.h"
+
+#include "Orb_Debug.h"
+#include "Orb_Exception.h"
+
+#include <cassert>
+#include <cstdint>
+#include <string>
+
+namespace {
+char const *const kSource = "host/Orb_Derived";
+}
+
+// ---------------------------------------------------------------------------
+// Orb_Context
+
+Orb_ClientObject *Orb_Context::GetClient(Orb_Persistent const *object) const {
+  if (!object)
+    return nullptr;
+  return GetBridgeHandle(object->GetKind())[object->GetBridgeId()];
+}
+
+Orb_ClientObject *Orb_Context::Specialize(Orb_Persistent *object) {
+  if (!object)
+    return nullptr;
+  if (Orb_ClientObject *client = GetClient(object))
+    return client;
+  // Orb_ModelDerived is the only context there is.
+  static_cast<Orb_ModelDerived *>(this)->FireSpecialize(object, false);
+  return GetClient(object);
+}
+
+#define ORB_TYPED_BRIDGE(HostType, ClientType)                                                     \
+  ClientType *Orb_Context::GetClient(HostType const *object) const {                               \
+    return static_cast<ClientType *>(GetClient(static_cast<Orb_Persistent const *>(object)));      \
+  }                                                                                                \
+  ClientType *Orb_Context::Specialize(HostType *object) {                                          \
+    return static_cast<ClientType *>(Specialize(static_cast<Orb_Persistent *>(object)));           \
+  }
+
+ORB_TYPED_BRIDGE(Orb_DesignMgr, Orb_DesignMgrDerived)
+ORB_TYPED_BRIDGE(Orb_Design, Orb_DesignDerived)
+ORB_TYPED_BRIDGE(Orb_View, Orb_ViewDerived)
+ORB_TYPED_BRIDGE(Orb_Block, Orb_BlockDerived)
+ORB_TYPED_BRIDGE(Orb_Pin, Orb_PinDerived)
+ORB_TYPED_BRIDGE(Orb_Signal, Orb_SignalDerived)
+ORB_TYPED_BRIDGE(Orb_Network, Orb_NetworkDerived)
+#undef ORB_TYPED_BRIDGE
+
+std::size_t Orb_Context::GetClientCount() const {
+  std::size_t count = 0;
+  for (auto const &table : m_Bridge)
+    for (Orb_ClientObject *client : table)
+      count += client != nullptr;
+  return count;
+}
+
+void Orb_Context::Register(Orb_ClientObject *client) {
+  Orb_Persistent *object = client->GetOrbObject();
+  auto &table = m_Bridge[static_cast<unsigned>(object->GetKind())];
+  unsigned const id = object->GetBridgeId();
+  if (id >= table.size())
+    table.resize(id + 1, nullptr);
+  if (table[id])
+    throw Orb_Exception(kSource, __LINE__, object->GetName(),
+                        "The object already has a client in this context.");
+  table[id] = client;
+}
+
+void Orb_Context::Unregister(Orb_ClientObject *client) {
+  Orb_Persistent *object = client->GetOrbObject();
+  auto &table = m_Bridge[static_cast<unsigned>(object->GetKind())];
+  unsigned const id = object->GetBridgeId();
+  if (id < table.size() && table[id] == client)
+    table[id] = nullptr;
+}
+
+// ---------------------------------------------------------------------------
+// Orb_Sync
+
+Orb_Sync::~Orb_Sync() = default;
+
+void Orb_Sync::SetEventNotifyAll() {
+  assert(m_pSyncModel && "SetEventNotifyAll before the client model is attached");
+  m_pSyncModel->Subscribe(static_cast<Orb_ModelDerived *>(this));
+  m_Subscribed = true;
+}
+
+void Orb_Sync::FireSpecialize(Orb_Persistent *object, bool create) {
+  switch (object->GetKind()) {
+  case Orb_Kind::DesignMgr: {
+    auto *o = static_cast<Orb_DesignMgr *>(object);
+    create ? SyncEventSpecializeDesignMgrOnCreate(o) : SyncEventSpecializeDesignMgrOnLoad(o);
+    break;
+  }
+  case Orb_Kind::Design: {
+    auto *o = static_cast<Orb_Design *>(object);
+    create ? SyncEventSpecializeDesignOnCreate(o) : SyncEventSpecializeDesignOnLoad(o);
+    break;
+  }
+  case Orb_Kind::View: {
+    auto *o = static_cast<Orb_View *>(object);
+    create ? SyncEventSpecializeViewOnCreate(o) : SyncEventSpecializeViewOnLoad(o);
+    break;
+  }
+  case Orb_Kind::Block: {
+    auto *o = static_cast<Orb_Block *>(object);
+    create ? SyncEventSpecializeBlockOnCreate(o) : SyncEventSpecializeBlockOnLoad(o);
+    break;
+  }
+  case Orb_Kind::Pin: {
+    auto *o = static_cast<Orb_Pin *>(object);
+    create ? SyncEventSpecializePinOnCreate(o) : SyncEventSpecializePinOnLoad(o);
+    break;
+  }
+  case Orb_Kind::Signal: {
+    auto *o = static_cast<Orb_Signal *>(object);
+    create ? SyncEventSpecializeSignalOnCreate(o) : SyncEventSpecializeSignalOnLoad(o);
+    break;
+  }
+  case Orb_Kind::Network: {
+    auto *o = static_cast<Orb_Network *>(object);
+    create ? SyncEventSpecializeNetworkOnCreate(o) : SyncEventSpecializeNetworkOnLoad(o);
+    break;
+  }
+  }
+}
+
+void Orb_Sync::FireDelete(Orb_Persistent *object) {
+  switch (object->GetKind()) {
+  case Orb_Kind::DesignMgr:
+    SyncEventDeleteDesignMgr(static_cast<Orb_DesignMgr *>(object));
+    break;
+  case Orb_Kind::Design:
+    SyncEventDeleteDesign(static_cast<Orb_Design *>(object));
+    break;
+  case Orb_Kind::View:
+    SyncEventDeleteView(static_cast<Orb_View *>(object));
+    break;
+  case Orb_Kind::Block:
+    SyncEventDeleteBlock(static_cast<Orb_Block *>(object));
+    break;
+  case Orb_Kind::Pin:
+    SyncEventDeletePin(static_cast<Orb_Pin *>(object));
+    break;
+  case Orb_Kind::Signal:
+    SyncEventDeleteSignal(static_cast<Orb_Signal *>(object));
+    break;
+  case Orb_Kind::Network:
+    SyncEventDeleteNetwork(static_cast<Orb_Network *>(object));
+    break;
+  }
+}
+
+// ---------------------------------------------------------------------------
+// Client bases
+
+Orb_ClientObject::Orb_ClientObject(Orb_Context *context, Orb_Persistent *object)
+    : m_pContext(context), m_pOrbObject(object) {
+  assert(context && object && "a client needs a context and a host object");
+  context->Register(this);
+}
+
+Orb_ClientObject::~Orb_ClientObject() { m_pContext->Unregister(this); }
+
+void Orb_ClientObject::DebugDumpCallback(Port::Stream * /*stream*/, int /*indent*/) const {}
+
+Orb_ModelDerived *Orb_ClientObject::GetClientOrbModel() const {
+  return static_cast<Orb_ModelDerived *>(m_pContext);
+}
+
+void Orb_ClientObject::DbgHost() const {
+  Orb_Debug::Printf("%s <%s>\n", Orb_KindName(m_pOrbObject->GetKind()), m_pOrbObject->GetName());
+  for (auto const &property : m_pOrbObject->GetProperties()) {
+    switch (property->GetKind()) {
+    case Orb_Property::STRING:
+      Orb_Debug::Printf("  %s = <%s>\n", property->GetName(), property->GetStringValue());
+      break;
+    case Orb_Property::STRING_LIST:
+      Orb_Debug::Printf("  %s (string list):\n", property->GetName());
+      for (auto const &value : property->GetStrings())
+        Orb_Debug::Printf("    <%s>\n", value.c_str());
+      break;
+    case Orb_Property::LIST:
+      Orb_Debug::Printf("  %s (list):\n", property->GetName());
+      for (auto const &member : property->GetMembers())
+        Orb_Debug::Printf("    %s = <%s>\n", member->GetName(), member->GetStringValue());
+      break;
+    }
+  }
+}
+
+Orb_BlockDerived *Orb_PinDerived::GetParent() const {
+  return GetContext()->Specialize(GetOrbPin()->GetParent());
+}
+
+Orb_BlockDerived *Orb_SignalDerived::GetParent() const {
+  return GetContext()->Specialize(GetOrbSignal()->GetParent());
+}
+
+Orb_NetworkDerived *Orb_SignalDerived::GetNetwork() const {
+  return GetContext()->Specialize(GetOrbSignal()->GetNetwork());
+}
+
+Orb_ViewDerived *Orb_NetworkDerived::GetParent() const {
+  return GetContext()->Specialize(GetOrbNetwork()->GetParent());
+}
+
+Orb_BlockDerived *Orb_BlockDerived::OrbResolve(Orb_Context const *context, Orb_Block const *block) {
+  return context ? context->GetClient(block) : nullptr;
+}
+
+Orb_BlockDerived *Orb_BlockDerived::GetParent() const {
+  return GetContext()->Specialize(GetOrbBlock()->GetParent());
+}
+
+Orb_ViewDerived *Orb_BlockDerived::GetView() const {
+  return GetContext()->Specialize(GetOrbBlock()->GetView());
+}
+
+Orb_PinDerived *Orb_BlockDerived::GetPinByName(char const *name) const {
+  return GetContext()->Specialize(GetOrbBlock()->GetPinByName(name));
+}
+
+Orb_BlockDerived *Orb_BlockDerived::GetBlockByName(char const *name) const {
+  return GetContext()->Specialize(GetOrbBlock()->GetBlockByName(name));
+}
+
+Orb_BlockDerived *Orb_BlockDerived::CreateBlock(char const *name, int flags) {
+  return GetContext()->Specialize(GetOrbBlock()->CreateBlock(name, flags));
+}
+
+Orb_PinDerived *Orb_BlockDerived::CreatePin(char const *name, Orb_Pin::PIN_DIRECTION direction) {
+  return GetContext()->Specialize(GetOrbBlock()->CreatePin(name, direction));
+}
+
+Orb_SignalDerived *Orb_BlockDerived::CreateSignal(char const *name) {
+  return GetContext()->Specialize(GetOrbBlock()->CreateSignal(name));
+}
+
+Orb_DesignDerived *Orb_ViewDerived::GetParent() const {
+  return GetContext()->Specialize(GetOrbView()->GetParent());
+}
+
+Orb_BlockDerived *Orb_ViewDerived::GetBlock() const {
+  return GetContext()->Specialize(GetOrbView()->GetBlock());
+}
+
+Orb_BlockDerived *Orb_ViewDerived::CreateTopBlock(char const *name) {
+  return GetContext()->Specialize(GetOrbView()->CreateTopBlock(name));
+}
+
+Orb_NetworkDerived *Orb_ViewDerived::CreateNetwork(char const *name) {
+  return GetContext()->Specialize(GetOrbView()->CreateNetwork(name));
+}
+
+namespace {
+void CollectBlocks(Orb_Context *context, Orb_Block *block, std::vector<Orb_BlockDerived *> &out) {
+  out.push_back(context->Specialize(block));
+  for (std::size_t i = 0; i < block->GetBlocks().size(); ++i)
+    CollectBlocks(context, block->GetBlocks()[i], out);
+}
+} // namespace
+
+void Orb_ViewDerived::LoadAllBlocks(std::vector<Orb_BlockDerived *> &blocks) const {
+  if (Orb_Block *top = GetOrbView()->GetBlock())
+    CollectBlocks(GetContext(), top, blocks);
+}
+
+Orb_DesignMgrDerived *Orb_DesignDerived::GetParent() const {
+  return GetContext()->Specialize(GetOrbDesign()->GetParent());
+}
+
+Orb_ViewDerived *Orb_DesignDerived::GetViewByName(char const *name) const {
+  return GetContext()->Specialize(GetOrbDesign()->GetViewByName(name));
+}
+
+Orb_ViewDerived *Orb_DesignDerived::CreateView(char const *name) {
+  return GetContext()->Specialize(GetOrbDesign()->CreateView(name));
+}
+
+Orb_DesignDerived *Orb_DesignMgrDerived::GetDesignByName(char const *name) const {
+  return GetContext()->Specialize(GetOrbDesignMgr()->GetDesignByName(name));
+}
+
+Orb_DesignDerived *Orb_DesignMgrDerived::CreateDesign(char const *name) {
+  return GetContext()->Specialize(GetOrbDesignMgr()->CreateDesign(name));
+}
+
+// ---------------------------------------------------------------------------
+// Orb_ModelDerived
+
+Orb_ModelDerived::Orb_ModelDerived(char const *name, char const *dbName, char const *path,
+                                   bool readOnly)
+    : Orb_Context(nullptr),
+      m_pOwnedModel(std::make_unique<Orb_Model>(name, dbName, path, readOnly)) {
+  m_pOrbModel = m_pOwnedModel.get();
+  m_pSyncModel = m_pOrbModel;
+  m_pOrbModel->Attach(this);
+}
+
+Orb_ModelDerived::Orb_ModelDerived(Orb_Model *model) : Orb_Context(model) {
+  assert(model && "Orb_ModelDerived needs a host model");
+  m_pSyncModel = model;
+  model->Attach(this);
+}
+
+Orb_ModelDerived::~Orb_ModelDerived() {
+  for (Orb_DesignMgr *designMgr : GetOrbModel()->GetDesignMgrs())
+    DestroyClients(designMgr);
+  GetOrbModel()->Detach(this);
+  // m_pOwnedModel, if any, goes with this object.
+}
+
+void Orb_ModelDerived::DestroyClients(Orb_Persistent *object) {
+  switch (object->GetKind()) {
+  case Orb_Kind::DesignMgr:
+    for (Orb_Design *design : static_cast<Orb_DesignMgr *>(object)->GetDesigns())
+      DestroyClients(design);
+    break;
+  case Orb_Kind::Design:
+    for (Orb_View *view : static_cast<Orb_Design *>(object)->GetViews())
+      DestroyClients(view);
+    break;
+  case Orb_Kind::View: {
+    auto *view = static_cast<Orb_View *>(object);
+    for (Orb_Network *network : view->GetNetworks())
+      DestroyClients(network);
+    if (view->GetBlock())
+      DestroyClients(view->GetBlock());
+    break;
+  }
+  case Orb_Kind::Block: {
+    auto *block = static_cast<Orb_Block *>(object);
+    for (Orb_Pin *pin : block->GetPins())
+      DestroyClients(pin);
+    for (Orb_Signal *signal : block->GetSignals())
+      DestroyClients(signal);
+    for (Orb_Block *child : block->GetBlocks())
+      DestroyClients(child);
+    break;
+  }
+  case Orb_Kind::Pin:
+  case Orb_Kind::Signal:
+  case Orb_Kind::Network:
+    break;
+  }
+  delete GetClient(object);
+}
+
+Orb_DesignMgrDerived *Orb_ModelDerived::CreateDesignMgr(char const *name) {
+  return Specialize(GetOrbModel()->CreateDesignMgr(name));
+}
+
+Orb_DesignMgrDerived *Orb_ModelDerived::GetDesignMgrByName(char const *name) {
+  return Specialize(GetOrbModel()->GetDesignMgrByName(name));
+}
+
+void Orb_ModelDerived::Dbg() const {
+  Orb_Model const *model = GetOrbModel();
+  Orb_Debug::Printf("model <%s> database <%s>\n", model->GetName(), model->GetDbName());
+  for (unsigned k = 0; k < Orb_KindCount; ++k) {
+    auto const kind = static_cast<Orb_Kind>(k);
+    Orb_Debug::Printf("  %ss: %lU\n", Orb_KindName(kind),
+                      static_cast<std::uint64_t>(model->GetObjectCount(kind)));
+  }
+}

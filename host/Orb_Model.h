@@ -1,0 +1,346 @@
+#pragma once
+
+// The host design model: design managers, designs, views, blocks, pins,
+// signals and networks, each with a name and properties, owned by one
+// Orb_Model. Clients attach through Orb_ModelDerived (Orb_Derived.h).
+
+#include "Orb_Property.h"
+
+#include <algorithm>
+#include <cstddef>
+#include <map>
+#include <memory>
+#include <string>
+#include <string_view>
+#include <unordered_map>
+#include <vector>
+
+class Orb_Block;
+class Orb_Design;
+class Orb_DesignMgr;
+class Orb_Model;
+class Orb_ModelDerived;
+class Orb_Network;
+class Orb_Pin;
+class Orb_Signal;
+class Orb_View;
+template <class T> class Orb_SortFtor;
+namespace Port {
+class Stream;
+}
+
+// The kinds of host objects that clients specialize.
+enum class Orb_Kind : unsigned { DesignMgr, Design, View, Block, Pin, Signal, Network };
+constexpr unsigned Orb_KindCount = 7;
+
+LUM_PLATFORM_API char const *Orb_KindName(Orb_Kind kind);
+
+// Base of every host object: name, kind, parent, owning model, bridge id and
+// properties. Host objects are made and freed by their owners only.
+class LUM_PLATFORM_API Orb_Persistent : public Orb_PropertyHolder {
+public:
+  Orb_Persistent(Orb_Persistent const &) = delete;
+  Orb_Persistent &operator=(Orb_Persistent const &) = delete;
+
+  char const *GetName() const { return m_Name.c_str(); }
+  std::string const &GetNameString() const { return m_Name; }
+  Orb_Kind GetKind() const { return m_Kind; }
+  Orb_Model *GetModel() const { return m_pModel; }
+  Orb_Persistent *GetParentObject() const { return m_pParent; }
+  unsigned GetBridgeId() const { return m_BridgeId; }
+
+  // Prints the object's kind, name and properties, then lets the client of
+  // every attached context add its lines (DebugDumpCallback).
+  void DebugDump(Port::Stream *stream, int indent) const;
+
+protected:
+  Orb_Persistent(Orb_Model *model, Orb_Kind kind, Orb_Persistent *parent, std::string name);
+  virtual ~Orb_Persistent();
+
+private:
+  friend class Orb_Model;
+  std::string m_Name;
+  Orb_Model *m_pModel;
+  Orb_Persistent *m_pParent;
+  Orb_Kind m_Kind;
+  unsigned m_BridgeId;
+};
+
+// Children of one kind in host order, with O(1) lookup by name.
+template <class T> class Orb_NamedList {
+public:
+  std::vector<T *> const &Items() const { return m_Items; }
+  std::size_t Size() const { return m_Items.size(); }
+  T *Find(std::string_view name) const {
+    auto it = m_ByName.find(name);
+    return it == m_ByName.end() ? nullptr : it->second;
+  }
+  void Add(T *item) {
+    m_Items.push_back(item);
+    m_ByName.emplace(std::string_view(item->GetNameString()), item);
+  }
+  void Remove(T *item);
+  std::vector<T *> &MutableItems() { return m_Items; }
+
+private:
+  std::vector<T *> m_Items;
+  std::unordered_map<std::string_view, T *> m_ByName;
+};
+
+template <class T> void Orb_NamedList<T>::Remove(T *item) {
+  m_ByName.erase(std::string_view(item->GetNameString()));
+  m_Items.erase(std::find(m_Items.begin(), m_Items.end(), item));
+}
+
+class LUM_PLATFORM_API Orb_Pin : public Orb_Persistent {
+public:
+  enum PIN_DIRECTION { PIN_INPUT, PIN_OUTPUT, PIN_BIDIRECTIONAL };
+
+  PIN_DIRECTION GetDirection() const { return m_Direction; }
+  Orb_Block *GetParent() const;
+  // The signal the pin connects to, or null.
+  Orb_Signal *GetSignal() const { return m_pSignal; }
+  // Connects the pin to `signal` (null disconnects). The signal must belong to
+  // the pin's view; otherwise throws Orb_Exception and changes nothing.
+  void Connect(Orb_Signal *signal);
+
+private:
+  friend class Orb_Model;
+  friend class Orb_Block;
+  Orb_Pin(Orb_Model *model, Orb_Block *parent, std::string name, PIN_DIRECTION direction);
+  PIN_DIRECTION m_Direction;
+  Orb_Signal *m_pSignal = nullptr;
+};
+
+LUM_PLATFORM_API char const *Orb_PinDirectionName(Orb_Pin::PIN_DIRECTION direction);
+
+class LUM_PLATFORM_API Orb_Signal : public Orb_Persistent {
+public:
+  Orb_Block *GetParent() const;
+  // The network the signal belongs to, or null.
+  Orb_Network *GetNetwork() const { return m_pNetwork; }
+  // Pins connected to the signal, in connection order.
+  std::vector<Orb_Pin *> const &GetPins() const { return m_Pins; }
+
+private:
+  friend class Orb_Model;
+  friend class Orb_Block;
+  friend class Orb_Pin;
+  friend class Orb_Network;
+  Orb_Signal(Orb_Model *model, Orb_Block *parent, std::string name);
+  Orb_Network *m_pNetwork = nullptr;
+  std::vector<Orb_Pin *> m_Pins;
+};
+
+class LUM_PLATFORM_API Orb_Network : public Orb_Persistent {
+public:
+  Orb_View *GetParent() const;
+  // The network's signals in host order.
+  std::vector<Orb_Signal *> const &GetSignals() const { return m_Signals; }
+  // Adds a signal of the same view, moving it out of any other network.
+  // A signal of another view throws Orb_Exception.
+  void AddSignal(Orb_Signal *signal);
+  // Removes the signal from this network; does nothing if it is not a member.
+  void RemoveSignal(Orb_Signal *signal);
+
+private:
+  friend class Orb_Model;
+  friend class Orb_View;
+  Orb_Network(Orb_Model *model, Orb_View *parent, std::string name);
+  std::vector<Orb_Signal *> m_Signals;
+};
+
+class LUM_PLATFORM_API Orb_Block : public Orb_Persistent {
+public:
+  // The parent block, or null for a view's top block.
+  Orb_Block *GetParent() const;
+  Orb_View *GetView() const { return m_pView; }
+
+  std::vector<Orb_Block *> const &GetBlocks() const { return m_Blocks.Items(); }
+  std::vector<Orb_Pin *> const &GetPins() const { return m_Pins.Items(); }
+  std::vector<Orb_Signal *> const &GetSignals() const { return m_Signals.Items(); }
+  unsigned GetNumPins() const { return static_cast<unsigned>(m_Pins.Size()); }
+
+  Orb_Block *GetBlockByName(char const *name) const { return m_Blocks.Find(name); }
+  Orb_Pin *GetPinByName(char const *name) const { return m_Pins.Find(name); }
+  Orb_Signal *GetSignalByName(char const *name) const { return m_Signals.Find(name); }
+
+  // Creation fires the OnCreate event to every subscribed context before it
+  // returns. A duplicate name throws Orb_Exception and creates nothing. If an
+  // event handler throws, the new object is deleted again (with its delete
+  // events) and the exception passes unchanged.
+  Orb_Block *CreateBlock(char const *name, int flags = 0);
+  Orb_Pin *CreatePin(char const *name, Orb_Pin::PIN_DIRECTION direction);
+  Orb_Signal *CreateSignal(char const *name);
+
+  // Deletion fires the delete events for everything the object owns, children
+  // before parents, then for the object, then frees the host objects.
+  void DeleteBlock(Orb_Block *child);
+  void DeletePin(Orb_Pin *pin);
+  void DeleteSignal(Orb_Signal *signal);
+
+  // Sorts the pin container with the functor, stably.
+  void SortPins(Orb_SortFtor<Orb_Pin> const &ftor);
+
+private:
+  friend class Orb_Model;
+  friend class Orb_View;
+  Orb_Block(Orb_Model *model, Orb_Persistent *parent, Orb_View *view, std::string name);
+  Orb_View *m_pView;
+  Orb_NamedList<Orb_Block> m_Blocks;
+  Orb_NamedList<Orb_Pin> m_Pins;
+  Orb_NamedList<Orb_Signal> m_Signals;
+};
+
+class LUM_PLATFORM_API Orb_View : public Orb_Persistent {
+public:
+  Orb_Design *GetParent() const;
+  // The top block, or null.
+  Orb_Block *GetBlock() const { return m_pTopBlock; }
+  std::vector<Orb_Network *> const &GetNetworks() const { return m_Networks.Items(); }
+  Orb_Network *GetNetworkByName(char const *name) const { return m_Networks.Find(name); }
+
+  // A view has at most one top block; a second one throws Orb_Exception.
+  Orb_Block *CreateTopBlock(char const *name);
+  Orb_Network *CreateNetwork(char const *name);
+  void DeleteTopBlock();
+  void DeleteNetwork(Orb_Network *network);
+
+private:
+  friend class Orb_Model;
+  friend class Orb_Design;
+  Orb_View(Orb_Model *model, Orb_Design *parent, std::string name);
+  Orb_Block *m_pTopBlock = nullptr;
+  Orb_NamedList<Orb_Network> m_Networks;
+};
+
+class LUM_PLATFORM_API Orb_Design : public Orb_Persistent {
+public:
+  Orb_DesignMgr *GetParent() const;
+  std::vector<Orb_View *> const &GetViews() const { return m_Views.Items(); }
+  Orb_View *GetViewByName(char const *name) const { return m_Views.Find(name); }
+  Orb_View *CreateView(char const *name);
+  void DeleteView(Orb_View *view);
+
+private:
+  friend class Orb_Model;
+  friend class Orb_DesignMgr;
+  Orb_Design(Orb_Model *model, Orb_DesignMgr *parent, std::string name);
+  Orb_NamedList<Orb_View> m_Views;
+};
+
+class LUM_PLATFORM_API Orb_DesignMgr : public Orb_Persistent {
+public:
+  std::vector<Orb_Design *> const &GetDesigns() const { return m_Designs.Items(); }
+  Orb_Design *GetDesignByName(char const *name) const { return m_Designs.Find(name); }
+  Orb_Design *CreateDesign(char const *name);
+  void DeleteDesign(Orb_Design *design);
+
+private:
+  friend class Orb_Model;
+  Orb_DesignMgr(Orb_Model *model, std::string name);
+  Orb_NamedList<Orb_Design> m_Designs;
+};
+
+// Something a client keeps with a host model and that is saved with it: its
+// own host model, written into the design database under a key (for instance
+// a type library local to the design). The host model owns it.
+class LUM_PLATFORM_API Orb_ModelCompanion {
+public:
+  virtual ~Orb_ModelCompanion();
+  virtual Orb_Model const *GetModelToSave() const = 0;
+};
+
+// A host model. Built standalone by a caller, or by an Orb_ModelDerived that
+// then owns it. Its objects are freed with it; clients must detach first.
+class LUM_PLATFORM_API Orb_Model {
+public:
+  // name: the model's name; dbName: the design database's name; path: the
+  // file it is saved to by default (may be empty); readOnly: Save refuses.
+  Orb_Model(char const *name, char const *dbName, char const *path, bool readOnly);
+  Orb_Model(Orb_Model const &) = delete;
+  Orb_Model &operator=(Orb_Model const &) = delete;
+  ~Orb_Model();
+
+  char const *GetName() const { return m_Name.c_str(); }
+  char const *GetDbName() const { return m_DbName.c_str(); }
+  char const *GetPath() const { return m_Path.c_str(); }
+  bool IsReadOnly() const { return m_ReadOnly; }
+
+  std::vector<Orb_DesignMgr *> const &GetDesignMgrs() const { return m_DesignMgrs.Items(); }
+  Orb_DesignMgr *GetDesignMgrByName(char const *name) const { return m_DesignMgrs.Find(name); }
+  Orb_DesignMgr *CreateDesignMgr(char const *name);
+  void DeleteDesignMgr(Orb_DesignMgr *designMgr);
+
+  // Writes the whole model (and its companions) to `path` through a temporary
+  // file that is flushed and renamed over the target: a failed save throws
+  // Orb_Exception and leaves the previous file unchanged.
+  void Save(char const *path) const;
+  void Save() const { Save(m_Path.c_str()); }
+
+  // Loads every design manager of the database at `path` into this model,
+  // then fires the OnLoad events (design managers, then per design manager
+  // its designs; per design the design, its views; per view the view, its
+  // block tree in pre-order with each block's pins and signals, then its
+  // networks) to every subscribed context. All or nothing: an unreadable,
+  // corrupt, truncated or newer file, or a design manager name already in
+  // the model, throws Orb_Exception naming the file and loads nothing; an
+  // event handler that throws makes the model delete what it loaded (with
+  // the delete events) and the exception passes unchanged.
+  void Open(char const *path);
+
+  // Companions saved with this model. A companion whose section was read by
+  // Open waits, as a bare host model, until its owner takes it.
+  void SetCompanion(std::string const &key, std::unique_ptr<Orb_ModelCompanion> companion);
+  Orb_ModelCompanion *GetCompanion(std::string const &key) const;
+  std::unique_ptr<Orb_Model> TakeLoadedCompanion(std::string const &key);
+
+  // Contexts. Attached contexts may hold clients; subscribed ones get events.
+  void Attach(Orb_ModelDerived *context);
+  void Detach(Orb_ModelDerived *context);
+  void Subscribe(Orb_ModelDerived *context);
+  std::vector<Orb_ModelDerived *> const &GetContexts() const { return m_Contexts; }
+
+  // Counts of live host objects by kind (for tests and reports).
+  std::size_t GetObjectCount(Orb_Kind kind) const;
+
+  // Deletes any host object with its subtree (see Orb_Block::DeleteBlock).
+  void Delete(Orb_Persistent *object);
+
+private:
+  friend class Orb_Persistent;
+  friend class Orb_DesignMgr;
+  friend class Orb_Design;
+  friend class Orb_View;
+  friend class Orb_Block;
+  friend class Orb_ModelIO;
+
+  unsigned AllocateBridgeId(Orb_Kind kind);
+  void ReleaseBridgeId(Orb_Kind kind, unsigned id);
+
+  // Fires OnCreate for a new object; on a throw deletes it and rethrows.
+  template <class T> T *Announce(T *object);
+  // Fires OnLoad for the object in every subscribed context that has no
+  // client for it yet.
+  void AnnounceLoad(Orb_Persistent *object);
+  void AnnounceLoadTree(Orb_DesignMgr *designMgr);
+  void FireDelete(Orb_Persistent *object);
+  void FireDeleteTree(Orb_Persistent *object);
+  // Removes the object from its parent's containers.
+  void Unlink(Orb_Persistent *object);
+  // Frees the object and its subtree without events.
+  void Free(Orb_Persistent *object);
+
+  std::string m_Name;
+  std::string m_DbName;
+  std::string m_Path;
+  bool m_ReadOnly;
+  Orb_NamedList<Orb_DesignMgr> m_DesignMgrs;
+  std::vector<Orb_ModelDerived *> m_Contexts;
+  std::vector<Orb_ModelDerived *> m_Subscribers;
+  unsigned m_NextBridgeId[Orb_KindCount] = {};
+  std::vector<unsigned> m_FreeBridgeIds[Orb_KindCount];
+  std::size_t m_ObjectCount[Orb_KindCount] = {};
+  std::map<std::string, std::unique_ptr<Orb_ModelCompanion>> m_Companions;
+  std::map<std::string, std::unique_ptr<Orb_Model>> m_LoadedCompanions;
+};

@@ -1,0 +1,86 @@
+#include "Orb_Property.h"
+
+#include <algorithm>
+#include <string_view>
+
+Orb_Property::Orb_Property(Kind kind, std::string name, std::string value)
+    : m_Kind(kind), m_Name(std::move(name)), m_Value(std::move(value)) {}
+
+Orb_Property::~Orb_Property() = default;
+
+Orb_Property *Orb_Property::CreatePropertyString(char const *name, char const *value) {
+  m_Members.push_back(std::make_unique<Orb_Property>(STRING, name ? name : "", value ? value : ""));
+  return m_Members.back().get();
+}
+
+Orb_PropertyHolder::~Orb_PropertyHolder() = default;
+
+Orb_Property *Orb_PropertyHolder::GetPropertyByName(char const *name) const {
+  if (!name)
+    return nullptr;
+  for (auto const &property : m_Properties)
+    if (std::string_view(property->GetName()) == name)
+      return property.get();
+  return nullptr;
+}
+
+Orb_Property *Orb_PropertyHolder::Insert(std::unique_ptr<Orb_Property> property) {
+  for (auto &existing : m_Properties) {
+    if (std::string_view(existing->GetName()) == property->GetName()) {
+      existing = std::move(property);
+      return existing.get();
+    }
+  }
+  m_Properties.push_back(std::move(property));
+  return m_Properties.back().get();
+}
+
+Orb_Property *Orb_PropertyHolder::CreatePropertyString(char const *name, char const *value) {
+  return Insert(
+      std::make_unique<Orb_Property>(Orb_Property::STRING, name ? name : "", value ? value : ""));
+}
+
+Orb_Property *Orb_PropertyHolder::CreatePropertyStringList(char const *name) {
+  return Insert(std::make_unique<Orb_Property>(Orb_Property::STRING_LIST, name ? name : ""));
+}
+
+Orb_Property *Orb_PropertyHolder::CreatePropertyList(char const *name) {
+  return Insert(std::make_unique<Orb_Property>(Orb_Property::LIST, name ? name : ""));
+}
+
+void Orb_PropertyHolder::DeleteProperty(char const *name) {
+  if (!name)
+    return;
+  auto it = std::find_if(m_Properties.begin(), m_Properties.end(),
+                         [name](auto const &p) { return std::string_view(p->GetName()) == name; });
+  if (it != m_Properties.end())
+    m_Properties.erase(it);
+}
+
+void Orb_PropertyHolder::DeleteProperty(Orb_Property *property) {
+  auto it = std::find_if(m_Properties.begin(), m_Properties.end(),
+                         [property](auto const &p) { return p.get() == property; });
+  if (it != m_Properties.end())
+    m_Properties.erase(it);
+}
+
+void Orb_PropertyHolder::CopyPropertiesFrom(Orb_PropertyHolder const &other) {
+  for (auto const &source : other.m_Properties) {
+    Orb_Property *copy = nullptr;
+    switch (source->GetKind()) {
+    case Orb_Property::STRING:
+      CreatePropertyString(source->GetName(), source->GetStringValue());
+      break;
+    case Orb_Property::STRING_LIST:
+      copy = CreatePropertyStringList(source->GetName());
+      for (auto const &value : source->GetStrings())
+        copy->AppendString(value);
+      break;
+    case Orb_Property::LIST:
+      copy = CreatePropertyList(source->GetName());
+      for (auto const &member : source->GetMembers())
+        copy->CreatePropertyString(member->GetName(), member->GetStringValue());
+      break;
+    }
+  }
+}

@@ -1,0 +1,76 @@
+#pragma once
+
+#include "Lum_PlatformApi.h"
+
+#include <memory>
+#include <string>
+#include <vector>
+
+// A named property of a host object: a string, a list of strings, or a list
+// of named string members. Values are arbitrary bytes without NUL.
+class LUM_PLATFORM_API Orb_Property {
+public:
+  enum Kind { STRING, STRING_LIST, LIST };
+
+  Orb_Property(Kind kind, std::string name, std::string value = std::string());
+  Orb_Property(Orb_Property const &) = delete;
+  Orb_Property &operator=(Orb_Property const &) = delete;
+  ~Orb_Property();
+
+  Kind GetKind() const { return m_Kind; }
+  char const *GetName() const { return m_Name.c_str(); }
+
+  // String: the value, replaced in place by SetStringValue.
+  char const *GetStringValue() const { return m_Value.c_str(); }
+  std::string const &GetValue() const { return m_Value; }
+  void SetStringValue(std::string value) { m_Value = std::move(value); }
+
+  // String list: read, cleared and appended to in order.
+  std::vector<std::string> const &GetStrings() const { return m_Strings; }
+  void ClearStrings() { m_Strings.clear(); }
+  void AppendString(std::string value) { m_Strings.push_back(std::move(value)); }
+
+  // List: appends a string member (names may repeat) and returns it.
+  Orb_Property *CreatePropertyString(char const *name, char const *value);
+  std::vector<std::unique_ptr<Orb_Property>> const &GetMembers() const { return m_Members; }
+
+private:
+  Kind m_Kind;
+  std::string m_Name;
+  std::string m_Value;
+  std::vector<std::string> m_Strings;
+  std::vector<std::unique_ptr<Orb_Property>> m_Members;
+};
+
+// The properties of one host object, in creation order. Names are unique:
+// creating a property of an existing name replaces it at its place.
+class LUM_PLATFORM_API Orb_PropertyHolder {
+public:
+  Orb_PropertyHolder() = default;
+  Orb_PropertyHolder(Orb_PropertyHolder const &) = delete;
+  Orb_PropertyHolder &operator=(Orb_PropertyHolder const &) = delete;
+  ~Orb_PropertyHolder();
+
+  // The property of that name, or null.
+  Orb_Property *GetPropertyByName(char const *name) const;
+
+  Orb_Property *CreatePropertyString(char const *name, char const *value);
+  Orb_Property *CreatePropertyStringList(char const *name);
+  Orb_Property *CreatePropertyList(char const *name);
+
+  // Deleting an absent property does nothing. The pointer form accepts only
+  // a property of this holder and otherwise does nothing.
+  void DeleteProperty(char const *name);
+  void DeleteProperty(Orb_Property *property);
+
+  std::vector<std::unique_ptr<Orb_Property>> const &GetProperties() const { return m_Properties; }
+
+  // Copies every property of `other` onto this holder, replacing those of the
+  // same names.
+  void CopyPropertiesFrom(Orb_PropertyHolder const &other);
+
+private:
+  Orb_Property *Insert(std::unique_ptr<Orb_Property> property);
+
+  std::vector<std::unique_ptr<Orb_Property>> m_Properties;
+};

@@ -1,0 +1,86 @@
+#pragma once
+
+#include "Lum_TdmTraits.h"
+
+#include "Orb_Templates.h"
+#include "Port_String.h"
+
+#include <cstdint>
+#include <memory>
+#include <vector>
+
+class Lum_TlmLibrary;
+class PM_PIC;
+
+// Client of a host view. It stamps the view with the format version
+// (TDS_TDM_VERSION), refuses to load views of too old or too new a format,
+// and keeps the list of type libraries that the view's blocks draw from
+// (TDS_VIEW_TYPE_LIBS), which it builds on first use, writes back at every
+// commit and gives back when it is destroyed.
+class LUM_TDM_API Lum_TdmView : public Orb_ViewT<Lum_TdmTraits> {
+public:
+  // On creation (isNew true) stamps the view 3.1 and removes
+  // LUM_DONT_CREATE_UNUSED_PINS. On load reads the stamp: 0.0 to 0.2 and
+  // unreadable stamps are too old, 3.2 and above or 4.0 and above too new;
+  // either is reported through the message manager and then thrown as
+  // Lum_ExceptionCorruptDatabase with the name of the design manager that
+  // holds the view. A view without a stamp is accepted as version 0.0.
+  Lum_TdmView(Lum_TdmModel *model, Orb_View *view, bool isNew);
+  // Gives back every non-local library of the list, once per entry.
+  ~Lum_TdmView() override;
+
+  // The current format: version 3, revision 1.
+  static void GetTdmVersion(unsigned int &version, unsigned int &revision);
+  // The format the view was loaded with (0.0 when it had no stamp), or the
+  // current one for a view made in this session.
+  void GetTdmLoadedDesignVersion(unsigned int &version, unsigned int &revision) const;
+
+  // Appends the view's libraries, in list order, after what `libraries`
+  // holds (a non-empty vector draws a debug warning).
+  void GetLibraries(std::vector<Lum_TlmLibrary const *> &libraries) const;
+  // The first library of exactly that name (case-sensitive), or null.
+  Lum_TlmLibrary const *GetLibrary(Port::StringBase<char> name) const;
+  // The local library if it is in the list, or null; never obtains it.
+  Lum_TlmLibrary const *GetLocalLibrary() const;
+
+  void Dbg() const { DbgImpl(); }
+
+  void DebugDumpCallback(Port::Stream *stream, int indent) const override;
+
+  // Commits the whole view: itself, its networks, its block tree and, when it
+  // is a user design, its design. A failure leaves what was committed.
+  virtual void CommitAll();
+  virtual void TraverseAndCommitToOrb();
+  // The local library, obtained from the type-library component and added at
+  // the end of the list if it is not there yet.
+  virtual Lum_TlmLibrary const *AddLocalLibrary() const;
+  virtual std::uint64_t DbgMySize() const;
+  virtual std::uint64_t DbgClassSize() const;
+  virtual std::uint64_t DbgSecondarySize() const;
+
+protected:
+  // Adds a library to the list unless this very library is there already,
+  // registering it with the type registry unless it is the local library.
+  // Null throws Lum_ExceptionInvalidLibrary ("Null library pointer
+  // specified.") and changes nothing.
+  void SetLibrary(Lum_TlmLibrary const *library) const;
+
+  // Builds the library list if needed, then writes the stamp and the list.
+  virtual void CommitToOrb();
+  // Loads a library of the list; by default from the type-library component.
+  virtual Lum_TlmLibrary const *LoadLibrary(char const *name, PM_PIC const &personality) const;
+  virtual void DbgImpl() const;
+
+private:
+  std::vector<Lum_TlmLibrary const *> &GetLibraryList() const;
+  void GetDevicePic(PM_PIC &personality) const;
+  static bool IsLocalLibrary(Lum_TlmLibrary const *library);
+  void CheckTdmVersion();
+  void WriteTdmProperties();
+  char const *GetDesignMgrName() const;
+
+  std::uint32_t m_Version;
+  std::uint32_t m_Revision;
+  // Owned; null until the list is first needed (const operations build it).
+  mutable std::unique_ptr<std::vector<Lum_TlmLibrary const *>> m_pLibrary;
+};

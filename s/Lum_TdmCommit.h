@@ -1,0 +1,25 @@
+#pragma once
+
+// The commit walk over one kind of children.
+
+#include "Orb_Derived.h"
+
+#include <cassert>
+#include <vector>
+
+// Commits each host child in host order through its client, which is
+// specialized on the spot when it has none. The bridge table is fetched once
+// for the loop.
+template <class Client, class Host>
+void Lum_TdmCommitEach(Orb_Context *context, Orb_Kind kind, std::vector<Host *> const &children) {
+  if (children.empty())
+    return;
+  Orb_BridgeHandle const bridge = context->GetBridgeHandle(kind);
+  for (std::size_t i = 0; i < children.size(); ++i) {
+    Orb_ClientObject *client = bridge[children[i]->GetBridgeId()];
+    if (!client)
+      client = context->Specialize(children[i]);
+    assert(client && "the client model made no client for a host object");
+    static_cast<Client *>(client)->TraverseAndCommitToOrb();
+  }
+}

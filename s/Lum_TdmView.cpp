@@ -1,0 +1,317 @@
+#include "Lum_TdmView.h"
+
+#include "Lum_TdmBlock.h"
+#include "Lum_TdmCommit.h"
+#include "Lum_TdmDbg.h"
+#include "Lum_TdmDesign.h"
+#include "Lum_TdmModel.h"
+#include "Lum_TdmNetwork.h"
+
+#include "Lum_Exception.h"
+#include "Lum_Tlm.h"
+#include "Lum_TlmTypeID.h"
+#include "PM_PIC.h"
+#include "Port_MsgManData.h"
+
+#include <cstdint>
+#include <string>
+
+namespace {
+
+char const kSourcePath[] = "../s/Lum_TdmView";
+char const kRevision[] = "$Revision: 1.1 $";
+
+// The format this software writes.
+constexpr unsigned kTdmVersion = 3;
+constexpr unsigned kTdmRevision = 1;
+// Marks the version fields while the constructor runs.
+constexpr std::uint32_t kUnsetVersion = 0xFFFF;
+
+char const kVersionProperty[] = "TDS_TDM_VERSION";
+char const kLibrariesProperty[] = "TDS_VIEW_TYPE_LIBS";
+char const kDevicePmProperty[] = "TDS_DEVICE_PM";
+char const kDevicePartProperty[] = "TDS_DEVICE_PART";
+char const kDontCreatePinsProperty[] = "LUM_DONT_CREATE_UNUSED_PINS";
+
+// The entries of TDS_VIEW_TYPE_LIBS: a string list, or a lone string taken
+// as one entry.
+std::vector<std::string> LibraryEntries(Orb_Property const *property) {
+  if (!property)
+    return {};
+  if (property->GetKind() == Orb_Property::STRING_LIST)
+    return property->GetStrings();
+  if (property->GetKind() == Orb_Property::STRING)
+    return {property->GetValue()};
+  return {};
+}
+
+} // namespace
+
+Lum_TdmView::Lum_TdmView(Lum_TdmModel *model, Orb_View *view, bool isNew)
+    : Orb_ViewT<Lum_TdmTraits>(model, view), m_Version(kUnsetVersion), m_Revision(kUnsetVersion) {
+  if (isNew) {
+    m_Version = kTdmVersion;
+    m_Revision = kTdmRevision;
+    WriteTdmProperties();
+  } else {
+    CheckTdmVersion();
+  }
+}
+
+Lum_TdmView::~Lum_TdmView() {
+  if (!m_pLibrary)
+    return;
+  // One release per entry: a library listed twice was loaded twice.
+  for (Lum_TlmLibrary const *library : *m_pLibrary)
+    if (!IsLocalLibrary(library))
+      Lum_TlmLibrary::ReleaseLibrary(library);
+  m_pLibrary.reset();
+}
+
+void Lum_TdmView::GetTdmVersion(unsigned int &version, unsigned int &revision) {
+  version = kTdmVersion;
+  revision = kTdmRevision;
+}
+
+void Lum_TdmView::GetTdmLoadedDesignVersion(unsigned int &version, unsigned int &revision) const {
+  version = m_Version;
+  revision = m_Revision;
+}
+
+char const *Lum_TdmView::GetDesignMgrName() const {
+  return GetOrbView()->GetParent()->GetParent()->GetName();
+}
+
+void Lum_TdmView::CheckTdmVersion() {
+  m_Version = 0;
+  m_Revision = 0;
+  Orb_Property const *stamp = GetPropertyByName(kVersionProperty);
+  if (!stamp)
+    return;
+  // Fields the parse does not reach stay 0; negative numbers wrap to their
+  // unsigned 32-bit value.
+  int version = 0;
+  int revision = 0;
+  Port::sscanf(stamp->GetStringValue(), "%d.%d", &version, &revision);
+  m_Version = static_cast<std::uint32_t>(version);
+  m_Revision = static_cast<std::uint32_t>(revision);
+
+  bool const tooOld = m_Version == 0 && m_Revision <= 2;
+  bool const tooNew = m_Version > kTdmVersion || (m_Version == kTdmVersion && m_Revision > kTdmRevision);
+  if (tooOld) {
+    Port_MsgManData::createObject("Lum", kSourcePath, __LINE__, kRevision)
+        .issueError("Tdm version is %d and the revision is %d. This is an old design that is no "
+                    "longer supported by the software.  Please convert your design.\n",
+                    static_cast<int>(m_Version), static_cast<int>(m_Revision));
+    throw Lum_ExceptionCorruptDatabase("Lum", kSourcePath, kRevision, __LINE__, GetDesignMgrName(),
+                                       "Old design that requires conversion.", false);
+  }
+  if (tooNew) {
+    Port_MsgManData::createObject("Lum", kSourcePath, __LINE__, kRevision)
+        .issueError("Tdm version is %d and the revision is %d.\nThis design was created by "
+                    "software with a newer version than this software.\nPlease use this design "
+                    "with the newer software.\n",
+                    static_cast<int>(m_Version), static_cast<int>(m_Revision));
+    throw Lum_ExceptionCorruptDatabase("Lum", kSourcePath, kRevision, __LINE__, GetDesignMgrName(),
+                                       "New design that requires newer software.", false);
+  }
+}
+
+void Lum_TdmView::WriteTdmProperties() {
+  if (GetPropertyByName(kDontCreatePinsProperty))
+    DeleteProperty(kDontCreatePinsProperty);
+
+  Port::StringBase<char> stamp;
+  stamp.doFormat("%d.%d", kTdmVersion, kTdmRevision);
+  Orb_Property *stampProperty = GetPropertyByName(kVersionProperty);
+  if (stampProperty && stampProperty->GetKind() == Orb_Property::STRING)
+    stampProperty->SetStringValue(stamp.str());
+  else
+    CreatePropertyString(kVersionProperty, stamp.c_str());
+
+  if (!m_pLibrary)
+    return;
+  Orb_Property *libraries = GetPropertyByName(kLibrariesProperty);
+  if (libraries && libraries->GetKind() == Orb_Property::STRING_LIST)
+    libraries->ClearStrings();
+  else
+    libraries = CreatePropertyStringList(kLibrariesProperty);
+  for (Lum_TlmLibrary const *library : *m_pLibrary) {
+    unsigned version = 0;
+    unsigned revision = 0;
+    library->GetTlmVersion(version, revision);
+    Port::StringBase<char> entry;
+    entry.doFormat("%s %d.%d", library->GetLibraryName(), static_cast<int>(version),
+                   static_cast<int>(revision));
+    for (Port::StringBase<char> const &qualifier :
+         {library->GetFirstQualifier(), library->GetSecondQualifier()}) {
+      if (!qualifier.empty()) {
+        entry += ' ';
+        entry += qualifier;
+      }
+    }
+    libraries->AppendString(entry.str());
+  }
+}
+
+// ---------------------------------------------------------------------------
+// Library list
+
+bool Lum_TdmView::IsLocalLibrary(Lum_TlmLibrary const *library) {
+  return library && Port::StringBase<char>(library->GetLibraryName()) ==
+                        Port::StringBase<char>(Lum_TlmLibrary::LOCAL_LIBRARY_NAME);
+}
+
+void Lum_TdmView::GetDevicePic(PM_PIC &personality) const {
+  Orb_Property const *pm = GetPropertyByName(kDevicePmProperty);
+  Orb_Property const *part = GetPropertyByName(kDevicePartProperty);
+  if (!pm || !part) {
+    std::string const message =
+        std::string("The view has no ") + (pm ? kDevicePartProperty : kDevicePmProperty) +
+        " property: the device personality is needed to load its type libraries.";
+    throw Lum_ExceptionInvalidLibrary("Lum", kSourcePath, kRevision, __LINE__, GetName(),
+                                      message.c_str(), false);
+  }
+  personality = PM_PIC(pm->GetStringValue(), part->GetStringValue(), nullptr);
+}
+
+std::vector<Lum_TlmLibrary const *> &Lum_TdmView::GetLibraryList() const {
+  if (m_pLibrary)
+    return *m_pLibrary;
+  // Stored before anything loads: AddLocalLibrary, called below, comes back
+  // here and must find this list.
+  m_pLibrary = std::make_unique<std::vector<Lum_TlmLibrary const *>>();
+
+  // The personality is built only when a library has to be loaded.
+  PM_PIC personality("", "", nullptr);
+  bool havePersonality = false;
+  for (std::string const &text : LibraryEntries(GetPropertyByName(kLibrariesProperty))) {
+    // The name is the first field; leading blanks are skipped.
+    Port::StringBase<char> const entry(text);
+    std::size_t begin = 0;
+    std::size_t end = 0;
+    if (!entry.NextTokenRange(0, " ", begin, end)) {
+      Port_MsgManData::debugStub("Warning:  view <%s> lists a type library without a name; the "
+                                 "entry is ignored.\n",
+                                 GetName());
+      continue;
+    }
+    std::string const name = text.substr(begin, end - begin);
+    if (name == Lum_TlmLibrary::LOCAL_LIBRARY_NAME) {
+      AddLocalLibrary();
+      continue;
+    }
+    if (!havePersonality) {
+      GetDevicePic(personality);
+      havePersonality = true;
+    }
+    Lum_TlmLibrary const *library = LoadLibrary(name.c_str(), personality);
+    if (!library)
+      throw Lum_ExceptionInvalidLibrary("Lum", kSourcePath, kRevision, __LINE__, name.c_str(),
+                                        "Null library pointer specified.", false);
+    m_pLibrary->push_back(library);
+    Lum_Tlm::pTypeIDRegistry->RegisterTypeLibrary(library);
+  }
+  return *m_pLibrary;
+}
+
+void Lum_TdmView::SetLibrary(Lum_TlmLibrary const *library) const {
+  if (!library)
+    throw Lum_ExceptionInvalidLibrary("Lum", kSourcePath, kRevision, __LINE__, "",
+                                      "Null library pointer specified.", false);
+  std::vector<Lum_TlmLibrary const *> &list = GetLibraryList();
+  for (Lum_TlmLibrary const *present : list)
+    if (present == library)
+      return;
+  list.push_back(library);
+  if (!IsLocalLibrary(library))
+    Lum_Tlm::pTypeIDRegistry->RegisterTypeLibrary(library);
+}
+
+Lum_TlmLibrary const *Lum_TdmView::LoadLibrary(char const *name, PM_PIC const &personality) const {
+  return Lum_TlmLibrary::LoadLibrary(Port::StringBase<char>(name), personality);
+}
+
+Lum_TlmLibrary const *Lum_TdmView::AddLocalLibrary() const {
+  if (Lum_TlmLibrary const *local = GetLocalLibrary())
+    return local;
+  PM_PIC personality("", "", nullptr);
+  GetDevicePic(personality);
+  Lum_TlmLibrary const *local =
+      Lum_TlmLibrary::GetLocalLibrary(GetOrbView()->GetModel(), personality);
+  SetLibrary(local);
+  return local;
+}
+
+void Lum_TdmView::GetLibraries(std::vector<Lum_TlmLibrary const *> &libraries) const {
+  if (!libraries.empty())
+    Port_MsgManData::debugStub("Warning:  passed in vector in not empty.\n");
+  std::vector<Lum_TlmLibrary const *> const &list = GetLibraryList();
+  libraries.insert(libraries.end(), list.begin(), list.end());
+}
+
+Lum_TlmLibrary const *Lum_TdmView::GetLibrary(Port::StringBase<char> name) const {
+  for (Lum_TlmLibrary const *library : GetLibraryList())
+    if (library && Port::StringBase<char>(library->GetLibraryName()) == name)
+      return library;
+  return nullptr;
+}
+
+Lum_TlmLibrary const *Lum_TdmView::GetLocalLibrary() const {
+  return GetLibrary(Port::StringBase<char>(Lum_TlmLibrary::LOCAL_LIBRARY_NAME));
+}
+
+// ---------------------------------------------------------------------------
+// Commit
+
+void Lum_TdmView::CommitToOrb() {
+  GetLibraryList();
+  WriteTdmProperties();
+}
+
+void Lum_TdmView::CommitAll() { TraverseAndCommitToOrb(); }
+
+void Lum_TdmView::TraverseAndCommitToOrb() {
+  CommitToOrb();
+  Lum_TdmCommitEach<Lum_TdmNetwork>(GetContext(), Orb_Kind::Network, GetOrbView()->GetNetworks());
+  if (Lum_TdmBlock *top = GetBlock())
+    top->TraverseAndCommitToOrb();
+  if (Lum_TdmDesign::IsUserDesign(*GetOrbView()->GetParent()))
+    GetParent()->TraverseAndCommitToOrb();
+}
+
+// ---------------------------------------------------------------------------
+// Diagnostics
+
+std::uint64_t Lum_TdmView::DbgMySize() const { return DbgClassSize() + DbgSecondarySize(); }
+
+std::uint64_t Lum_TdmView::DbgClassSize() const { return sizeof(Lum_TdmView); }
+
+std::uint64_t Lum_TdmView::DbgSecondarySize() const { return 0; }
+
+void Lum_TdmView::DbgImpl() const {
+  Lum_TdmDbgFrame<Lum_TdmView>(
+      [this] {
+        Orb_Debug::Printf("m_Version = <%d>, m_Revision = <%d>\n", static_cast<int>(m_Version),
+                          static_cast<int>(m_Revision));
+        // Reads the list as it stands: a dump never builds it.
+        std::size_t const count = m_pLibrary ? m_pLibrary->size() : 0;
+        Orb_Debug::Printf("(std::vector<const Lum_TlmLibrary *> *) m_pLibrary = <0x%x> (# = %d):\n",
+                          reinterpret_cast<std::uintptr_t>(m_pLibrary.get()),
+                          static_cast<int>(count));
+        for (std::size_t i = 0; i < count; ++i) {
+          Lum_TlmLibrary const *library = (*m_pLibrary)[i];
+          Orb_Debug::Printf("  (Lum_TlmLibrary *) = <0x%x>, (%s)\n",
+                            reinterpret_cast<std::uintptr_t>(library),
+                            library ? library->GetLibraryName() : "");
+        }
+      },
+      [this] { Orb_ViewDerived::Dbg(); });
+}
+
+void Lum_TdmView::DebugDumpCallback(Port::Stream *stream, int indent) const {
+  Lum_TdmDbgCallbackFrame(stream, indent, "Lum_TdmView Data\n", [&] {
+    Orb_Debug::Printf(stream, indent, "m_Version = <%d>\n", static_cast<int>(m_Version));
+    Orb_Debug::Printf(stream, indent, "m_Revision = <%d>\n", static_cast<int>(m_Revision));
+  });
+}
