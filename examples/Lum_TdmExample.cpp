@@ -1,1 +1,154 @@
-int main() { return 0; }
+// Builds a small typed design, saves its design database, reopens it in a
+// fresh client model and prints what it found.
+//
+// Usage: Lum_TdmExample [directory]   (default: a new temporary directory)
+
+#include "Lum_TdmBlock.h"
+#include "Lum_TdmDesign.h"
+#include "Lum_TdmDesignMgr.h"
+#include "Lum_TdmModel.h"
+#include "Lum_TdmNetwork.h"
+#include "Lum_TdmPin.h"
+#include "Lum_TdmSignal.h"
+#include "Lum_TdmView.h"
+
+#include "Lum_Tlm.h"
+#include "Port_Exception.h"
+
+#include <cstdio>
+#include <cstdlib>
+#include <filesystem>
+#include <string>
+#include <vector>
+
+namespace {
+
+// Writes a type library with two type blocks to <directory>/CELLS.tlm.
+void WriteCellLibrary(std::string const &directory) {
+  Lum_TlmModel model("CELLS", "CELLS", "", false);
+  Lum_TlmLibrary *library = model.CreateLibrary("CELLS", 2, 1, "generic");
+  Lum_TlmBlock *nand = library->CreateTypeBlock("NAND2");
+  nand->CreatePin("A", Orb_Pin::PIN_INPUT);
+  nand->CreatePin("B", Orb_Pin::PIN_INPUT);
+  nand->CreatePin("Y", Orb_Pin::PIN_OUTPUT);
+  Lum_TlmBlock *dff = library->CreateTypeBlock("DFF");
+  dff->CreatePin("D", Orb_Pin::PIN_INPUT);
+  dff->CreatePin("CK", Orb_Pin::PIN_INPUT);
+  dff->CreatePin("Q", Orb_Pin::PIN_OUTPUT);
+  library->Save((directory + "/CELLS.tlm").c_str());
+}
+
+// Builds design "counter" with view "netlist" and saves it.
+void WriteDesign(std::string const &path) {
+  Lum_TdmModel model("example", "example_db", path.c_str());
+  Lum_TdmDesignMgr *designMgr = model.CreateDesignMgr("work");
+  Lum_TdmDesign *design = designMgr->CreateDesign("counter");
+  Lum_TdmView *view = design->CreateView("netlist");
+  view->CreatePropertyString("TDS_DEVICE_PM", "generic");
+  view->CreatePropertyString("TDS_DEVICE_PART", "part0");
+  view->CreatePropertyStringList("TDS_VIEW_TYPE_LIBS")->AppendString("CELLS");
+
+  Lum_TdmBlock *top = view->CreateTopBlock("counter");
+  Lum_TdmPin *clock = top->CreatePin("clk", Orb_Pin::PIN_INPUT);
+  Lum_TdmPin *out = top->CreatePin("q", Orb_Pin::PIN_OUTPUT);
+  Lum_TdmSignal *clockNet = top->CreateSignal("clk_net");
+  Lum_TdmSignal *outNet = top->CreateSignal("q_net");
+  clock->GetOrbPin()->Connect(clockNet->GetOrbSignal());
+  out->GetOrbPin()->Connect(outNet->GetOrbSignal());
+
+  for (char const *name : {"bit0", "bit1"}) {
+    Lum_TdmBlock *bit = top->CreateBlock(name, 0);
+    bit->CreatePin("CK", Orb_Pin::PIN_INPUT)->GetOrbPin()->Connect(clockNet->GetOrbSignal());
+    bit->CreatePin("Q", Orb_Pin::PIN_OUTPUT);
+  }
+  top->GetBlockByName("bit1")->GetPinByName("Q")->GetOrbPin()->Connect(outNet->GetOrbSignal());
+
+  Lum_TdmNetwork *clocks = view->CreateNetwork("clocks");
+  clocks->GetOrbNetwork()->AddSignal(clockNet->GetOrbSignal());
+
+  view->CommitAll();
+  model.Save(path.c_str());
+}
+
+void PrintBlock(Lum_TdmBlock *block, int depth) {
+  std::printf("%*sblock %s\n", depth * 2, "", block->GetName());
+  for (std::size_t i = 0; i < block->GetPins().size(); ++i) {
+    Lum_TdmPin *pin = block->GetPin(i);
+    Orb_Signal const *signal = pin->GetSignal();
+    std::printf("%*s  pin %s (%s)%s%s\n", depth * 2, "", pin->GetName(),
+                Orb_PinDirectionName(pin->GetDirection()), signal ? " -> " : "",
+                signal ? signal->GetName() : "");
+  }
+  for (std::size_t i = 0; i < block->GetSignals().size(); ++i)
+    std::printf("%*s  signal %s\n", depth * 2, "", block->GetSignal(i)->GetName());
+  for (std::size_t i = 0; i < block->GetBlocks().size(); ++i)
+    PrintBlock(block->GetBlock(i), depth + 1);
+}
+
+// Reopens the database in a fresh model and prints it.
+void ReadDesign(std::string const &path) {
+  Lum_TdmModel model("reader", "example_db", path.c_str());
+  model.Open(path.c_str());
+  Orb_Model *host = model.GetOrbModel();
+  for (Orb_DesignMgr *designMgr : host->GetDesignMgrs()) {
+    std::printf("design manager %s\n", designMgr->GetName());
+    for (Orb_Design *hostDesign : designMgr->GetDesigns()) {
+      auto *design = static_cast<Lum_TdmDesign *>(model.GetClient(hostDesign));
+      std::printf(" design %s (%s)\n", design->GetName(),
+                  design->IsUserDesign() ? "user design" : "not a user design");
+      for (Orb_View *hostView : hostDesign->GetViews()) {
+        auto *view = static_cast<Lum_TdmView *>(model.GetClient(hostView));
+        unsigned version = 0;
+        unsigned revision = 0;
+        view->GetTdmLoadedDesignVersion(version, revision);
+        std::printf(" view %s, format %u.%u\n", view->GetName(), version, revision);
+        std::vector<Lum_TlmLibrary const *> libraries;
+        view->GetLibraries(libraries);
+        for (Lum_TlmLibrary const *library : libraries) {
+          library->GetTlmVersion(version, revision);
+          std::printf("  type library %s %u.%u\n", library->GetLibraryName(), version, revision);
+        }
+        if (Lum_TdmBlock *top = view->GetBlock())
+          PrintBlock(top, 1);
+        for (std::size_t i = 0; i < hostView->GetNetworks().size(); ++i) {
+          Lum_TdmNetwork *network = view->GetNetwork(i);
+          std::printf("  network %s:", network->GetName());
+          for (Orb_Signal *signal : network->GetSignals())
+            std::printf(" %s", signal->GetName());
+          std::printf("\n");
+        }
+      }
+    }
+  }
+}
+
+} // namespace
+
+int main(int argc, char **argv) {
+  try {
+    std::string directory;
+    if (argc > 1) {
+      directory = argv[1];
+      std::filesystem::create_directories(directory);
+    } else {
+      std::string pattern = (std::filesystem::temp_directory_path() / "lum_example_XXXXXX").string();
+      if (!::mkdtemp(pattern.data())) {
+        std::perror("mkdtemp");
+        return 1;
+      }
+      directory = pattern;
+    }
+    std::string const database = directory + "/counter.odb";
+    WriteCellLibrary(directory);
+    Lum_TlmCatalog::AddSearchDirectory(directory.c_str());
+    WriteDesign(database);
+    std::printf("saved %s\n", database.c_str());
+    ReadDesign(database);
+    return 0;
+  } catch (Port::Exception const &e) {
+    std::fprintf(stderr, "error: %s\n", e.what());
+  } catch (std::exception const &e) {
+    std::fprintf(stderr, "error: %s\n", e.what());
+  }
+  return 1;
+}

@@ -47,18 +47,22 @@ constexpr char const *kLocalLibraryCompanion = "Lum_TlmLocalLibrary";
 } // namespace Lum_TlmNames
 
 // The client model of a type library's host model. It specializes every host
-// object into the component's classes and destroys them on deletion.
+// object into the component's classes and destroys them on deletion. Both
+// constructors subscribe to every event; neither loads anything.
 class LUM_PLATFORM_API Lum_TlmModel : public Orb_ModelT<Lum_TlmTraits> {
 public:
   // A new, empty library model (owns its host model).
   Lum_TlmModel(char const *name, char const *dbName, char const *path, bool readOnly);
-  // Attached to an existing host model.
+  // Attached to an existing host model, which the caller keeps alive longer
+  // than this model. Objects already in it are specialized on demand.
   explicit Lum_TlmModel(Orb_Model *model);
   ~Lum_TlmModel() override;
 
-  // Creates the library (the model's design manager). Throws Orb_Exception
-  // for a duplicate name and Lum_ExceptionInvalidLibrary for a name that is
-  // empty or holds a space or a ":".
+  // Creates the library (the model's design manager) and stores its version
+  // and its non-empty qualifiers. Throws Orb_Exception for a duplicate name
+  // and Lum_ExceptionInvalidLibrary for a name that is empty or holds a space
+  // or a ":" (a view's library list could not give it back); nothing is
+  // created then.
   Lum_TlmLibrary *CreateLibrary(char const *name, unsigned version, unsigned revision,
                                 char const *firstQualifier = "", char const *secondQualifier = "");
   // The first library of the model, or null.
@@ -80,7 +84,9 @@ public:
   void SyncEventDeleteNetwork(Orb_Network *o) override;
 };
 
-// A type library: the client of its model's design manager.
+// A type library: the client of its model's design manager. Made and
+// destroyed by its model's events; destroying it removes it from the
+// catalog.
 class LUM_PLATFORM_API Lum_TlmLibrary : public Orb_DesignMgrT<Lum_TlmTraits> {
 public:
   // The name of a design database's local library.
@@ -90,23 +96,29 @@ public:
   ~Lum_TlmLibrary() override;
 
   char const *GetLibraryName() const { return GetName(); }
+  // The stored "version.revision"; fields that are absent or unreadable
+  // give 0.
   void GetTlmVersion(unsigned &version, unsigned &revision) const;
+  // The stored qualifiers, empty when absent.
   virtual Port::StringBase<char> GetFirstQualifier() const;
   virtual Port::StringBase<char> GetSecondQualifier() const;
 
-  // The type block of that name, or null.
+  // The type block of that name (exact bytes), or null. O(1).
   Lum_TlmBlock const *GetTypeBlock(Port::StringBase<char> const &name) const;
   Lum_TlmBlock *GetTypeBlock(Port::StringBase<char> const &name);
 
   // Type blocks in creation order.
   std::vector<Lum_TlmBlock *> GetTypeBlocks() const;
 
-  // Adds a type block (a design of that name with its "type" view and top
-  // block). Throws Lum_ExceptionInvalidTypeBlock for a name that is empty or
-  // holds a ":", Orb_Exception for a duplicate.
+  // Adds a type block (a design of that name, marked as a library design,
+  // with its "type" view and a top block of the same name); the caller adds
+  // its pins with CreatePin. Throws Lum_ExceptionInvalidTypeBlock for a name
+  // that is empty or holds a ":" (a block's stored type could not name it)
+  // and Orb_Exception for a duplicate; nothing is created then.
   Lum_TlmBlock *CreateTypeBlock(char const *name);
 
-  // Saves the library's host model to a library file.
+  // Saves the library's host model to a library file; throws Orb_Exception
+  // when the file cannot be written (the previous file stays).
   void Save(char const *path) const;
 
   // Loads a library by name for a personality: from the catalog, else from
@@ -118,15 +130,22 @@ public:
   static Lum_TlmLibrary const *LoadLibrary(Port::StringBase<char> const &name,
                                            PM_PIC const &personality);
   // Gives back a reference taken by LoadLibrary. A library read from a file
-  // is unloaded with its last reference. Null, the local library and a
-  // library that holds no reference are ignored.
+  // is unloaded with its last reference. Null, the local library, a library
+  // not in the catalog and one that holds no reference are ignored; the
+  // pointer itself is never read, so a library already destroyed is safe.
   static void ReleaseLibrary(Lum_TlmLibrary const *library);
-  // The local library of a design database, made on first request and kept
-  // with the host model (saved and reopened with it). Never released.
+  // The local library of a design database: the one kept with the host model
+  // if any, else the one saved with it (taken from the opened database),
+  // else a new empty one (version 1.0). It lives as long as the host model,
+  // is saved and reopened with it, and is never counted or released. The
+  // personality does not select anything: a database has one local library.
+  // Throws Lum_ExceptionInvalidLibrary for a null model and
+  // Lum_ExceptionCorruptDatabase when the saved local library lacks its
+  // design manager.
   static Lum_TlmLibrary *GetLocalLibrary(Orb_Model *model, PM_PIC const &personality);
 };
 
-// The client of a type block design. Marks itself as a library design.
+// The client of a type block design.
 class LUM_PLATFORM_API Lum_TlmDesign : public Orb_DesignT<Lum_TlmTraits> {
 public:
   Lum_TlmDesign(Lum_TlmModel *model, Orb_Design *design);
@@ -150,11 +169,15 @@ public:
   // Library name, ":", type block name.
   Port::StringBase<char> GetUniqueTag() const;
 
-  // Whether the type block has a hierarchy for that view name, and its host
-  // top block (null when none).
+  // Whether the type block has a hierarchy for that view name: a view of
+  // its design other than "type" that has a top block. GetHier gives that
+  // host top block, or null.
   bool HasHier(Port::StringBase<char> viewName) const;
   Orb_Block *GetHier(Port::StringBase<char> viewName) const;
-  // Creates the hierarchy for a view name and returns its top block.
+  // Creates the hierarchy for a view name (the view and its top block, named
+  // like the type block) and returns the top block's client. Throws
+  // Orb_Exception when the design already has a view of that name ("type"
+  // included).
   Lum_TlmBlock *CreateHier(char const *viewName);
 };
 
@@ -175,19 +198,26 @@ public:
       : Orb_NetworkT<Lum_TlmTraits>(model, network) {}
 };
 
-// The catalog of libraries and the search path for library files.
+// The process-wide catalog of libraries and the search path for library
+// files. Like the host model it is used from one thread at a time.
 class LUM_PLATFORM_API Lum_TlmCatalog {
 public:
   // Makes an in-memory library loadable by its name. The caller keeps it
-  // alive until it is unregistered (its destruction unregisters it). A name
-  // already in the catalog throws Lum_ExceptionInvalidLibrary.
+  // alive while it is registered and while references that LoadLibrary gave
+  // out are held (its destruction unregisters it). Null,
+  // the local library's name, or a name already in the catalog (registered
+  // or read from a file) throws Lum_ExceptionInvalidLibrary.
   static void Register(Lum_TlmLibrary *library);
+  // Removes a registered in-memory library, whatever its references. A
+  // library that is not registered (or was read from a file) is ignored.
   static void Unregister(Lum_TlmLibrary const *library);
 
   // Library directories, searched in the order added, before those of the
-  // environment variable LUM_TLM_PATH (colon-separated).
+  // environment variable LUM_TLM_PATH (colon-separated, read at each lookup).
+  // Null and empty directories are ignored.
   static void AddSearchDirectory(char const *directory);
   static void ClearSearchDirectories();
+  // The directories searched, in order, joined by ":".
   static std::string GetSearchPath();
 
   // References held on the library of that name (0 when not in the catalog),

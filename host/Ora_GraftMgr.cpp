@@ -1,11 +1,124 @@
 #include "Ora_GraftMgr.h"
 
+#include "Orb_Exception.h"
+
+#include <string>
+#include <utility>
+#include <vector>
+
+namespace {
+
+char const *const kSource = "host/Ora_GraftMgr";
+
+// One graft: the copies made so far, keyed by their sources, so that
+// connections are resolved in constant time per pin.
+struct GraftRun {
+  Ora_GraftMgr &manager;
+  Orb_Block const *source;
+  Orb_Block *destination;
+  // The manager's back reference maps, or null when those are off.
+  std::unordered_map<Orb_Block const *, Orb_Block const *> *blockSources;
+  std::unordered_map<Orb_Network const *, Orb_Network const *> *networkSources;
+  std::unordered_map<Orb_Pin const *, Orb_Pin *> pinCopies;
+  // Copied signals in creation order, so that connections are made in a
+  // reproducible order.
+  std::vector<std::pair<Orb_Signal const *, Orb_Signal *>> signalCopies;
+};
+
+void CopySignals(GraftRun &run, Orb_Block const *source, Orb_Block *copy) {
+  Orb_View *view = copy->GetView();
+  for (Orb_Signal const *signal : source->GetSignals()) {
+    Orb_Signal *signalCopy = copy->CreateSignal(signal->GetName());
+    signalCopy->CopyPropertiesFrom(*signal);
+    run.signalCopies.emplace_back(signal, signalCopy);
+    Orb_Network const *network = signal->GetNetwork();
+    if (!network)
+      continue;
+    Orb_Network *target = view->GetNetworkByName(network->GetName());
+    if (!target) {
+      target = view->CreateNetwork(network->GetName());
+      target->CopyPropertiesFrom(*network);
+      if (run.networkSources)
+        (*run.networkSources)[target] = network;
+    }
+    target->AddSignal(signalCopy);
+  }
+}
+
+void CopyBlock(GraftRun &run, Orb_Block const *source, Orb_Block *parent) {
+  Orb_Block *copy = parent->CreateBlock(source->GetName(), 0);
+  copy->CopyPropertiesFrom(*source);
+  if (run.blockSources)
+    (*run.blockSources)[copy] = source;
+  for (Orb_Pin const *pin : source->GetPins()) {
+    Orb_Pin *pinCopy = copy->CreatePin(pin->GetName(), pin->GetDirection());
+    run.manager.CopyPinProperties(pin, pinCopy);
+    run.pinCopies.emplace(pin, pinCopy);
+  }
+  CopySignals(run, source, copy);
+  for (Orb_Block const *child : source->GetBlocks())
+    CopyBlock(run, child, copy);
+}
+
+void ConnectCopies(GraftRun &run) {
+  // Walking each copied signal's source pins reproduces its connection order.
+  // Pins outside the source subtree have no copy and stay behind. The pairs
+  // are collected first: a destination pin may still hang on a source signal
+  // of the same view, and connecting it would change the list being walked.
+  std::vector<std::pair<Orb_Pin *, Orb_Signal *>> connections;
+  for (auto const &[signal, signalCopy] : run.signalCopies) {
+    for (Orb_Pin const *pin : signal->GetPins()) {
+      Orb_Pin *pinCopy = nullptr;
+      if (pin->GetParent() == run.source) {
+        pinCopy = run.destination->GetPinByName(pin->GetName());
+      } else {
+        auto it = run.pinCopies.find(pin);
+        if (it != run.pinCopies.end())
+          pinCopy = it->second;
+      }
+      if (pinCopy)
+        connections.emplace_back(pinCopy, signalCopy);
+    }
+  }
+  for (auto const &[pin, signal] : connections)
+    pin->Connect(signal);
+}
+
+} // namespace
+
 Ora_GraftMgr::Ora_GraftMgr(bool blockBackReferences, bool networkBackReferences)
     : m_BlockBackReferences(blockBackReferences), m_NetworkBackReferences(networkBackReferences) {}
 
 Ora_GraftMgr::~Ora_GraftMgr() = default;
 
-bool Ora_GraftMgr::Graft(Orb_Block const * /*source*/, Orb_Block * /*destination*/) { return true; }
+bool Ora_GraftMgr::Graft(Orb_Block const *source, Orb_Block *destination) {
+  if (!source || !destination)
+    throw Orb_Exception(kSource, __LINE__, source ? source->GetName() : "",
+                        "Graft needs a source and a destination block.");
+  if (source == destination)
+    throw Orb_Exception(kSource, __LINE__, source->GetName(),
+                        "A block cannot be grafted onto itself.");
+  // Copying into the source's own subtree would walk what it is creating.
+  for (Orb_Block const *b = destination->GetParent(); b; b = b->GetParent())
+    if (b == source)
+      throw Orb_Exception(kSource, __LINE__, destination->GetName(),
+                          (std::string("The destination block lies inside the source block <") +
+                           source->GetName() + ">.")
+                              .c_str());
+
+  GraftRun run{*this,
+               source,
+               destination,
+               m_BlockBackReferences ? &m_BlockSources : nullptr,
+               m_NetworkBackReferences ? &m_NetworkSources : nullptr,
+               {},
+               {}};
+  CopySignals(run, source, destination);
+  for (Orb_Block const *child : source->GetBlocks())
+    CopyBlock(run, child, destination);
+  ConnectCopies(run);
+  return true;
+}
 
 void Ora_GraftMgr::CopyPinProperties(Orb_Pin const *source, Orb_Pin *destination) {
   destination->CopyPropertiesFrom(*source);

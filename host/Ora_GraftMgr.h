@@ -23,11 +23,15 @@ public:
   virtual ~Ora_GraftMgr();
 
   // With back references on, the manager remembers the source of each block
-  // or network it copies, for as long as the manager lives (not saved).
+  // or network it copies, for as long as the manager lives (not saved). A
+  // network that a graft joined but did not create has no source.
   void SetBlockBackReferences(bool on) { m_BlockBackReferences = on; }
   void SetNetworkBackReferences(bool on) { m_NetworkBackReferences = on; }
 
-  // Returns true when done.
+  // Returns true when done. A null block, a source equal to the destination
+  // or a destination inside the source throws Orb_Exception before anything
+  // is copied. Connections are made once every copy exists, so a graft that
+  // fails part way leaves its copies unconnected.
   bool Graft(Orb_Block const *source, Orb_Block *destination);
 
   // Gives a copied pin its source's properties. Override to filter.

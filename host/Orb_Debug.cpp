@@ -28,6 +28,9 @@ void Orb_Debug::Printf(Port::Stream *stream, int indent, char const *format, ...
   std::string text(indent > 0 ? static_cast<std::size_t>(indent) * 2 : 0, ' ');
   text += Port::vformat(format, args);
   va_end(args);
+  // Without a stream of its own the text follows the redirected output.
+  if (!stream)
+    stream = g_pDebugOutput;
   if (stream)
     stream->Write(text);
   else

@@ -264,7 +264,7 @@ Orb_Model::~Orb_Model() {
   m_Companions.clear();
   m_LoadedCompanions.clear();
   for (Orb_DesignMgr *designMgr : std::vector<Orb_DesignMgr *>(m_DesignMgrs.Items()))
-    Free(designMgr);
+    Free(designMgr, false);
 }
 
 Orb_DesignMgr *Orb_Model::CreateDesignMgr(char const *name) {
@@ -469,40 +469,44 @@ void Orb_Model::Unlink(Orb_Persistent *object) {
   }
 }
 
-void Orb_Model::Free(Orb_Persistent *object) {
+void Orb_Model::Free(Orb_Persistent *object, bool keepLinks) {
   switch (object->GetKind()) {
   case Orb_Kind::DesignMgr:
     for (Orb_Design *design : static_cast<Orb_DesignMgr *>(object)->GetDesigns())
-      Free(design);
+      Free(design, false);
     break;
   case Orb_Kind::Design:
     for (Orb_View *view : static_cast<Orb_Design *>(object)->GetViews())
-      Free(view);
+      Free(view, false);
     break;
   case Orb_Kind::View: {
     auto *view = static_cast<Orb_View *>(object);
-    // Networks first, so that freeing the signals has no membership to undo.
     for (Orb_Network *network : view->GetNetworks())
-      Free(network);
+      Free(network, false);
     if (view->m_pTopBlock)
-      Free(view->m_pTopBlock);
+      Free(view->m_pTopBlock, false);
     break;
   }
   case Orb_Kind::Block: {
     auto *block = static_cast<Orb_Block *>(object);
-    for (Orb_Pin *pin : block->GetPins())
-      Free(pin);
+    // Signals before pins: a signal lets go of all its pins at once, so the
+    // pins connected to it (often its children's) have nothing to undo.
     for (Orb_Signal *signal : block->GetSignals())
-      Free(signal);
+      Free(signal, keepLinks);
+    for (Orb_Pin *pin : block->GetPins())
+      Free(pin, keepLinks);
     for (Orb_Block *child : block->GetBlocks())
-      Free(child);
+      Free(child, keepLinks);
     break;
   }
   case Orb_Kind::Pin:
-    static_cast<Orb_Pin *>(object)->Connect(nullptr);
+    if (keepLinks)
+      static_cast<Orb_Pin *>(object)->Connect(nullptr);
     break;
   case Orb_Kind::Signal: {
     auto *signal = static_cast<Orb_Signal *>(object);
+    if (!keepLinks)
+      break;
     for (Orb_Pin *pin : signal->m_Pins)
       pin->m_pSignal = nullptr;
     if (signal->m_pNetwork)
@@ -511,6 +515,8 @@ void Orb_Model::Free(Orb_Persistent *object) {
   }
   case Orb_Kind::Network: {
     auto *network = static_cast<Orb_Network *>(object);
+    if (!keepLinks)
+      break;
     for (Orb_Signal *signal : network->m_Signals)
       signal->m_pNetwork = nullptr;
     break;
@@ -524,9 +530,25 @@ void Orb_Model::Free(Orb_Persistent *object) {
 
 void Orb_Persistent::DebugDump(Port::Stream *stream, int indent) const {
   Orb_Debug::Printf(stream, indent, "%s <%s>\n", Orb_KindName(m_Kind), m_Name.c_str());
-  for (auto const &property : GetProperties())
-    Orb_Debug::Printf(stream, indent + 1, "%s = <%s>\n", property->GetName(),
-                      property->GetStringValue());
+  for (auto const &property : GetProperties()) {
+    switch (property->GetKind()) {
+    case Orb_Property::STRING:
+      Orb_Debug::Printf(stream, indent + 1, "%s = <%s>\n", property->GetName(),
+                        property->GetStringValue());
+      break;
+    case Orb_Property::STRING_LIST:
+      Orb_Debug::Printf(stream, indent + 1, "%s (string list):\n", property->GetName());
+      for (auto const &value : property->GetStrings())
+        Orb_Debug::Printf(stream, indent + 2, "<%s>\n", value.c_str());
+      break;
+    case Orb_Property::LIST:
+      Orb_Debug::Printf(stream, indent + 1, "%s (list):\n", property->GetName());
+      for (auto const &member : property->GetMembers())
+        Orb_Debug::Printf(stream, indent + 2, "%s = <%s>\n", member->GetName(),
+                          member->GetStringValue());
+      break;
+    }
+  }
   for (Orb_ModelDerived *context : m_pModel->GetContexts())
     if (Orb_ClientObject *client = context->GetClient(this))
       client->DebugDumpCallback(stream, indent + 1);

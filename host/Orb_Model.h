@@ -106,6 +106,7 @@ public:
 
 private:
   friend class Orb_Model;
+  friend class Orb_ModelIO;
   friend class Orb_Block;
   Orb_Pin(Orb_Model *model, Orb_Block *parent, std::string name, PIN_DIRECTION direction);
   PIN_DIRECTION m_Direction;
@@ -124,6 +125,7 @@ public:
 
 private:
   friend class Orb_Model;
+  friend class Orb_ModelIO;
   friend class Orb_Block;
   friend class Orb_Pin;
   friend class Orb_Network;
@@ -145,6 +147,7 @@ public:
 
 private:
   friend class Orb_Model;
+  friend class Orb_ModelIO;
   friend class Orb_View;
   Orb_Network(Orb_Model *model, Orb_View *parent, std::string name);
   std::vector<Orb_Signal *> m_Signals;
@@ -184,6 +187,7 @@ public:
 
 private:
   friend class Orb_Model;
+  friend class Orb_ModelIO;
   friend class Orb_View;
   Orb_Block(Orb_Model *model, Orb_Persistent *parent, Orb_View *view, std::string name);
   Orb_View *m_pView;
@@ -208,6 +212,7 @@ public:
 
 private:
   friend class Orb_Model;
+  friend class Orb_ModelIO;
   friend class Orb_Design;
   Orb_View(Orb_Model *model, Orb_Design *parent, std::string name);
   Orb_Block *m_pTopBlock = nullptr;
@@ -224,6 +229,7 @@ public:
 
 private:
   friend class Orb_Model;
+  friend class Orb_ModelIO;
   friend class Orb_DesignMgr;
   Orb_Design(Orb_Model *model, Orb_DesignMgr *parent, std::string name);
   Orb_NamedList<Orb_View> m_Views;
@@ -238,6 +244,7 @@ public:
 
 private:
   friend class Orb_Model;
+  friend class Orb_ModelIO;
   Orb_DesignMgr(Orb_Model *model, std::string name);
   Orb_NamedList<Orb_Design> m_Designs;
 };
@@ -328,8 +335,10 @@ private:
   void FireDeleteTree(Orb_Persistent *object);
   // Removes the object from its parent's containers.
   void Unlink(Orb_Persistent *object);
-  // Frees the object and its subtree without events.
-  void Free(Orb_Persistent *object);
+  // Frees the object and its subtree without events. Connections and network
+  // memberships never leave a view, so when a whole view goes (keepLinks
+  // false) nothing inside it needs unhooking.
+  void Free(Orb_Persistent *object, bool keepLinks = true);
 
   std::string m_Name;
   std::string m_DbName;

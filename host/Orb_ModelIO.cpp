@@ -1,12 +1,897 @@
 // Saving and opening design databases.
+//
+// A design database is a magic line followed by records. A record is a tag
+// byte, fields each preceded by one space, and a newline. Numbers are decimal;
+// strings are "<length>:<bytes>", so every byte but NUL survives. Design
+// managers, designs, views and blocks end with an 'E' record; properties
+// follow the record of the object they belong to. Pins and signals are
+// numbered per view in the order they are written, and a view's connections
+// and networks, written after its block tree, refer to them by number.
+// Companion models follow the design managers, each as an embedded model
+// section. A 'Z' record ends every model section, so a cut file shows.
+//
+//   Orb design database          magic line
+//   V <version>                  format version
+//   M <name> <dbName>            model
+//   D <name> ... E               design manager
+//   G <name> ... E               design
+//   W <name> ... E               view
+//   B <name> ... E               block (a view's top block, or a child block)
+//   I <direction> <name>         pin (0 input, 1 output, 2 bidirectional)
+//   S <name>                     signal
+//   C <signal> <n> <pin>...      pins connected to a signal, in connection order
+//   N <name> <n> <signal>...     network and its signals, in order
+//   P <name> <value>             string property
+//   L <name> <n> <value>...      string list property
+//   Q <name> <n> (<name> <value>)...  list property
+//   K <key>, then M ... Z        companion model section
+//   Z                            end of a model section
 
-#include "Orb_Exception.h"
 #include "Orb_Model.h"
 
-void Orb_Model::Save(char const *path) const {
-  throw Orb_Exception("host/Orb_ModelIO", __LINE__, path, "Save is not implemented yet.");
+#include "Orb_Derived.h"
+#include "Orb_Exception.h"
+
+#include <algorithm>
+#include <cerrno>
+#include <charconv>
+#include <cstdint>
+#include <cstring>
+#include <fcntl.h>
+#include <map>
+#include <string>
+#include <string_view>
+#include <unistd.h>
+#include <unordered_set>
+#include <vector>
+
+namespace {
+
+char const *const kSource = "host/Orb_ModelIO";
+constexpr std::string_view kMagic = "Orb design database\n";
+constexpr std::uint64_t kFormatVersion = 1;
+constexpr std::size_t kBufferSize = std::size_t(1) << 16;
+static_assert(Orb_Pin::PIN_INPUT == 0 && Orb_Pin::PIN_OUTPUT == 1 &&
+                  Orb_Pin::PIN_BIDIRECTIONAL == 2,
+              "design databases store pin directions by these numbers");
+
+std::string Quote(std::string_view text) { return "'" + std::string(text) + "'"; }
+
+// Writes a temporary file next to the target through a buffer. Commit syncs
+// it and renames it over the target; until then the destructor removes it,
+// so a failed save leaves the target as it was.
+class ByteWriter {
+public:
+  explicit ByteWriter(std::string const &path);
+  ByteWriter(ByteWriter const &) = delete;
+  ByteWriter &operator=(ByteWriter const &) = delete;
+  ~ByteWriter();
+
+  void Raw(std::string_view data);
+  void Tag(char tag) { Raw(std::string_view(&tag, 1)); }
+  void Num(std::uint64_t value);
+  void Str(std::string_view text);
+  void End() { Raw("\n"); }
+  // A whole record of a tag and one string.
+  void Named(char tag, std::string_view name) {
+    Tag(tag);
+    Str(name);
+    End();
+  }
+
+  // Throws Orb_Exception naming the target if the data cannot be made
+  // durable or the rename fails.
+  void Commit();
+
+private:
+  [[noreturn]] void Fail(char const *step, int error) const;
+  void Flush();
+
+  std::string m_Path;
+  std::string m_TempPath;
+  int m_Fd = -1;
+  bool m_Committed = false;
+  std::string m_Buffer;
+};
+
+ByteWriter::ByteWriter(std::string const &path) : m_Path(path) {
+  // O_EXCL with a fresh suffix on collision: a stale file of a crashed save
+  // or a concurrent save to the same target is never reused.
+  for (unsigned attempt = 0; m_Fd < 0; ++attempt) {
+    m_TempPath = path + ".tmp." + std::to_string(::getpid()) + "." + std::to_string(attempt);
+    m_Fd = ::open(m_TempPath.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, 0666);
+    if (m_Fd < 0 && (errno != EEXIST || attempt == 100))
+      Fail("cannot create the temporary file", errno);
+  }
+  m_Buffer.reserve(kBufferSize);
 }
 
-void Orb_Model::Open(char const *path) {
-  throw Orb_Exception("host/Orb_ModelIO", __LINE__, path, "Open is not implemented yet.");
+ByteWriter::~ByteWriter() {
+  if (m_Fd >= 0)
+    ::close(m_Fd);
+  if (!m_Committed)
+    ::unlink(m_TempPath.c_str());
+}
+
+void ByteWriter::Fail(char const *step, int error) const {
+  std::string const message = "Cannot save design database " + Quote(m_Path) + ": " + step + " " +
+                              Quote(m_TempPath) + ": " + std::strerror(error) + ".";
+  throw Orb_Exception(kSource, __LINE__, m_Path.c_str(), message.c_str());
+}
+
+void ByteWriter::Raw(std::string_view data) {
+  if (m_Buffer.size() + data.size() > kBufferSize)
+    Flush();
+  m_Buffer.append(data);
+}
+
+void ByteWriter::Num(std::uint64_t value) {
+  char digits[24];
+  digits[0] = ' ';
+  auto const result = std::to_chars(digits + 1, digits + sizeof digits, value);
+  Raw(std::string_view(digits, static_cast<std::size_t>(result.ptr - digits)));
+}
+
+void ByteWriter::Str(std::string_view text) {
+  Num(text.size());
+  Raw(":");
+  Raw(text);
+}
+
+void ByteWriter::Flush() {
+  char const *data = m_Buffer.data();
+  std::size_t left = m_Buffer.size();
+  while (left > 0) {
+    ssize_t const written = ::write(m_Fd, data, left);
+    if (written < 0) {
+      if (errno == EINTR)
+        continue;
+      Fail("cannot write", errno);
+    }
+    data += written;
+    left -= static_cast<std::size_t>(written);
+  }
+  m_Buffer.clear();
+}
+
+void ByteWriter::Commit() {
+  Flush();
+  if (::fsync(m_Fd) != 0)
+    Fail("cannot flush", errno);
+  int const fd = m_Fd;
+  m_Fd = -1;
+  if (::close(fd) != 0)
+    Fail("cannot close", errno);
+  if (::rename(m_TempPath.c_str(), m_Path.c_str()) != 0)
+    Fail("cannot rename", errno);
+  m_Committed = true;
+}
+
+// Reads a design database through a buffer, field by field. Every failure
+// throws Orb_Exception naming the file and, for broken data, the offset.
+class ByteReader {
+public:
+  explicit ByteReader(std::string const &path);
+  ByteReader(ByteReader const &) = delete;
+  ByteReader &operator=(ByteReader const &) = delete;
+  ~ByteReader();
+
+  // The next byte, or -1 at the end of the file.
+  int Get() {
+    if (m_Pos == m_Size && !Fill())
+      return -1;
+    return static_cast<unsigned char>(m_Buffer[m_Pos++]);
+  }
+
+  // A record's tag; the end of the file here means the file was cut.
+  char Tag();
+  std::uint64_t Num();
+  void Str(std::string &out);
+  void End() { Expect('\n', "end of record"); }
+
+  [[noreturn]] void Refuse(std::string const &what) const;
+  [[noreturn]] void Truncated() const;
+  [[noreturn]] void Corrupt(std::string const &what) const;
+
+private:
+  bool Fill();
+  void Expect(char expected, char const *what);
+  std::uint64_t Digits();
+
+  std::string m_Path;
+  int m_Fd = -1;
+  std::vector<char> m_Buffer;
+  std::size_t m_Pos = 0;
+  std::size_t m_Size = 0;
+  std::uint64_t m_BufferOffset = 0;
+};
+
+ByteReader::ByteReader(std::string const &path) : m_Path(path), m_Buffer(kBufferSize) {
+  m_Fd = ::open(path.c_str(), O_RDONLY | O_CLOEXEC);
+  if (m_Fd < 0)
+    Refuse(std::string("cannot be opened: ") + std::strerror(errno));
+}
+
+ByteReader::~ByteReader() {
+  if (m_Fd >= 0)
+    ::close(m_Fd);
+}
+
+bool ByteReader::Fill() {
+  m_BufferOffset += m_Size;
+  m_Pos = m_Size = 0;
+  for (;;) {
+    ssize_t const got = ::read(m_Fd, m_Buffer.data(), m_Buffer.size());
+    if (got >= 0) {
+      m_Size = static_cast<std::size_t>(got);
+      return got > 0;
+    }
+    if (errno != EINTR)
+      Refuse(std::string("cannot be read: ") + std::strerror(errno));
+  }
+}
+
+void ByteReader::Refuse(std::string const &what) const {
+  std::string const message = "Design database " + Quote(m_Path) + " " + what + ".";
+  throw Orb_Exception(kSource, __LINE__, m_Path.c_str(), message.c_str());
+}
+
+void ByteReader::Truncated() const {
+  Refuse("is truncated at byte " + std::to_string(m_BufferOffset + m_Pos));
+}
+
+void ByteReader::Corrupt(std::string const &what) const {
+  Refuse("is corrupt at byte " + std::to_string(m_BufferOffset + m_Pos) + ": " + what);
+}
+
+char ByteReader::Tag() {
+  int const c = Get();
+  if (c < 0)
+    Truncated();
+  return static_cast<char>(c);
+}
+
+void ByteReader::Expect(char expected, char const *what) {
+  int const c = Get();
+  if (c < 0)
+    Truncated();
+  if (c != static_cast<unsigned char>(expected))
+    Corrupt(std::string("expected ") + what);
+}
+
+std::uint64_t ByteReader::Digits() {
+  std::uint64_t value = 0;
+  bool any = false;
+  for (;;) {
+    if (m_Pos == m_Size && !Fill())
+      Truncated();
+    char const c = m_Buffer[m_Pos];
+    if (c < '0' || c > '9')
+      break;
+    auto const digit = static_cast<std::uint64_t>(c - '0');
+    if (value > (UINT64_MAX - digit) / 10)
+      Corrupt("number too large");
+    value = value * 10 + digit;
+    any = true;
+    ++m_Pos;
+  }
+  if (!any)
+    Corrupt("expected a number");
+  return value;
+}
+
+std::uint64_t ByteReader::Num() {
+  Expect(' ', "a field");
+  return Digits();
+}
+
+void ByteReader::Str(std::string &out) {
+  Expect(' ', "a field");
+  std::uint64_t left = Digits();
+  Expect(':', "':' after a string length");
+  out.clear();
+  // Appended as the bytes arrive: a corrupt length cannot make us allocate
+  // more than the file holds.
+  while (left > 0) {
+    if (m_Pos == m_Size && !Fill())
+      Truncated();
+    std::size_t const take =
+        static_cast<std::size_t>(std::min<std::uint64_t>(left, m_Size - m_Pos));
+    char const *data = m_Buffer.data() + m_Pos;
+    if (std::memchr(data, '\0', take))
+      Corrupt("NUL byte in a string");
+    out.append(data, take);
+    m_Pos += take;
+    left -= take;
+  }
+}
+
+} // namespace
+
+// Reads and writes model sections. A friend of the host classes, it builds
+// objects directly in their containers, without events.
+class Orb_ModelIO {
+public:
+  static void Save(Orb_Model const &model, std::string const &path);
+  static void Open(Orb_Model &model, std::string const &path);
+
+private:
+  // What one model section built: design managers not yet in the model
+  // (freed with the section unless committed) and companion models.
+  struct Section {
+    explicit Section(Orb_Model &target) : model(target) {}
+    Section(Section const &) = delete;
+    Section &operator=(Section const &) = delete;
+    ~Section() { FreeDesignMgrs(model, designMgrs.Items()); }
+
+    Orb_Model &model;
+    Orb_NamedList<Orb_DesignMgr> designMgrs;
+    std::map<std::string, std::unique_ptr<Orb_Model>> companions;
+  };
+
+  explicit Orb_ModelIO(ByteWriter *out) : m_pOut(out) {}
+  explicit Orb_ModelIO(ByteReader *in) : m_pIn(in) {}
+
+  static void FreeDesignMgrs(Orb_Model &model, std::vector<Orb_DesignMgr *> const &designMgrs);
+  // Moves the section's design managers into its model, without events.
+  static std::vector<Orb_DesignMgr *> Commit(Section &section);
+  static void Rollback(Orb_Model &model, std::vector<Orb_DesignMgr *> const &loaded,
+                       std::vector<std::string> const &companionKeys);
+
+  void WriteModel(Orb_Model const &model);
+  void WriteDesignMgr(Orb_DesignMgr const *designMgr);
+  void WriteView(Orb_View const *view);
+  void WriteBlock(Orb_Block const *block);
+  void WriteProperties(Orb_PropertyHolder const *holder);
+
+  void ReadHeader();
+  void ReadModel(Section &section);
+  void ReadCompanion(Section &section);
+  void ReadDesignMgr(Orb_DesignMgr *designMgr);
+  void ReadDesign(Orb_Design *design);
+  void ReadView(Orb_View *view);
+  void ReadBlock(Orb_Block *block);
+  void ReadConnections();
+  Orb_Network *ReadNetwork(Orb_View *view);
+  // Reads a property record into `holder` if `tag` starts one.
+  bool ReadProperty(char tag, Orb_PropertyHolder *holder);
+  std::string ReadName(char const *kind);
+  Orb_Pin *PinAt(std::uint64_t index) const;
+  Orb_Signal *SignalAt(std::uint64_t index) const;
+  [[noreturn]] void Unexpected(char tag, char const *where) const;
+  [[noreturn]] void Duplicate(char const *kind, std::string const &name,
+                              Orb_Persistent const *parent) const;
+
+  ByteWriter *m_pOut = nullptr;
+  ByteReader *m_pIn = nullptr;
+
+  // Saving: numbers of the current view's pins and signals by bridge id, and
+  // its signals in number order.
+  std::vector<std::uint64_t> m_PinNumber;
+  std::vector<std::uint64_t> m_SignalNumber;
+  std::uint64_t m_PinCount = 0;
+  std::vector<Orb_Signal const *> m_ViewSignals;
+
+  // Opening: the current view's pins and signals in number order.
+  std::vector<Orb_Pin *> m_Pins;
+  std::vector<Orb_Signal *> m_Signals;
+  std::string m_Text;
+};
+
+// ---------------------------------------------------------------------------
+// Saving
+
+void Orb_Model::Save(char const *path) const {
+  std::string const target = path ? path : "";
+  if (target.empty())
+    throw Orb_Exception(kSource, __LINE__, m_Name.c_str(),
+                        ("Cannot save model " + Quote(m_Name) + ": no file path given.").c_str());
+  if (m_ReadOnly)
+    throw Orb_Exception(kSource, __LINE__, target.c_str(),
+                        ("Cannot save design database " + Quote(target) + ": model " +
+                         Quote(m_Name) + " is read-only.")
+                            .c_str());
+  Orb_ModelIO::Save(*this, target);
+}
+
+void Orb_ModelIO::Save(Orb_Model const &model, std::string const &path) {
+  ByteWriter out(path);
+  Orb_ModelIO io(&out);
+  out.Raw(kMagic);
+  out.Tag('V');
+  out.Num(kFormatVersion);
+  out.End();
+  io.WriteModel(model);
+  out.Commit();
+}
+
+void Orb_ModelIO::WriteModel(Orb_Model const &model) {
+  auto const pins = static_cast<unsigned>(Orb_Kind::Pin);
+  auto const signals = static_cast<unsigned>(Orb_Kind::Signal);
+  if (m_PinNumber.size() < model.m_NextBridgeId[pins])
+    m_PinNumber.resize(model.m_NextBridgeId[pins]);
+  if (m_SignalNumber.size() < model.m_NextBridgeId[signals])
+    m_SignalNumber.resize(model.m_NextBridgeId[signals]);
+
+  m_pOut->Tag('M');
+  m_pOut->Str(model.m_Name);
+  m_pOut->Str(model.m_DbName);
+  m_pOut->End();
+  for (Orb_DesignMgr const *designMgr : model.m_DesignMgrs.Items())
+    WriteDesignMgr(designMgr);
+
+  // A companion read by Open that nobody claimed yet is kept as well; a live
+  // companion of the same key wins.
+  std::map<std::string_view, Orb_Model const *> companions;
+  for (auto const &[key, companion] : model.m_Companions)
+    if (Orb_Model const *companionModel = companion ? companion->GetModelToSave() : nullptr)
+      companions.emplace(key, companionModel);
+  for (auto const &[key, companionModel] : model.m_LoadedCompanions)
+    companions.emplace(key, companionModel.get());
+  for (auto const &[key, companionModel] : companions) {
+    m_pOut->Named('K', key);
+    WriteModel(*companionModel);
+  }
+  m_pOut->Tag('Z');
+  m_pOut->End();
+}
+
+void Orb_ModelIO::WriteDesignMgr(Orb_DesignMgr const *designMgr) {
+  m_pOut->Named('D', designMgr->GetNameString());
+  WriteProperties(designMgr);
+  for (Orb_Design const *design : designMgr->GetDesigns()) {
+    m_pOut->Named('G', design->GetNameString());
+    WriteProperties(design);
+    for (Orb_View const *view : design->GetViews())
+      WriteView(view);
+    m_pOut->Raw("E\n");
+  }
+  m_pOut->Raw("E\n");
+}
+
+void Orb_ModelIO::WriteView(Orb_View const *view) {
+  m_pOut->Named('W', view->GetNameString());
+  WriteProperties(view);
+  m_PinCount = 0;
+  m_ViewSignals.clear();
+  if (view->GetBlock())
+    WriteBlock(view->GetBlock());
+  for (std::size_t s = 0; s < m_ViewSignals.size(); ++s) {
+    std::vector<Orb_Pin *> const &pins = m_ViewSignals[s]->GetPins();
+    if (pins.empty())
+      continue;
+    m_pOut->Tag('C');
+    m_pOut->Num(s);
+    m_pOut->Num(pins.size());
+    for (Orb_Pin const *pin : pins)
+      m_pOut->Num(m_PinNumber[pin->GetBridgeId()]);
+    m_pOut->End();
+  }
+  for (Orb_Network const *network : view->GetNetworks()) {
+    m_pOut->Tag('N');
+    m_pOut->Str(network->GetNameString());
+    m_pOut->Num(network->GetSignals().size());
+    for (Orb_Signal const *signal : network->GetSignals())
+      m_pOut->Num(m_SignalNumber[signal->GetBridgeId()]);
+    m_pOut->End();
+    WriteProperties(network);
+  }
+  m_pOut->Raw("E\n");
+}
+
+void Orb_ModelIO::WriteBlock(Orb_Block const *block) {
+  m_pOut->Named('B', block->GetNameString());
+  WriteProperties(block);
+  for (Orb_Pin const *pin : block->GetPins()) {
+    m_PinNumber[pin->GetBridgeId()] = m_PinCount++;
+    m_pOut->Tag('I');
+    m_pOut->Num(pin->GetDirection());
+    m_pOut->Str(pin->GetNameString());
+    m_pOut->End();
+    WriteProperties(pin);
+  }
+  for (Orb_Signal const *signal : block->GetSignals()) {
+    m_SignalNumber[signal->GetBridgeId()] = m_ViewSignals.size();
+    m_ViewSignals.push_back(signal);
+    m_pOut->Named('S', signal->GetNameString());
+    WriteProperties(signal);
+  }
+  for (Orb_Block const *child : block->GetBlocks())
+    WriteBlock(child);
+  m_pOut->Raw("E\n");
+}
+
+void Orb_ModelIO::WriteProperties(Orb_PropertyHolder const *holder) {
+  for (auto const &property : holder->GetProperties()) {
+    switch (property->GetKind()) {
+    case Orb_Property::STRING:
+      m_pOut->Tag('P');
+      m_pOut->Str(property->GetName());
+      m_pOut->Str(property->GetValue());
+      break;
+    case Orb_Property::STRING_LIST:
+      m_pOut->Tag('L');
+      m_pOut->Str(property->GetName());
+      m_pOut->Num(property->GetStrings().size());
+      for (std::string const &value : property->GetStrings())
+        m_pOut->Str(value);
+      break;
+    case Orb_Property::LIST:
+      m_pOut->Tag('Q');
+      m_pOut->Str(property->GetName());
+      m_pOut->Num(property->GetMembers().size());
+      for (auto const &member : property->GetMembers()) {
+        m_pOut->Str(member->GetName());
+        m_pOut->Str(member->GetValue());
+      }
+      break;
+    }
+    m_pOut->End();
+  }
+}
+
+// ---------------------------------------------------------------------------
+// Opening
+
+void Orb_Model::Open(char const *path) { Orb_ModelIO::Open(*this, path ? path : ""); }
+
+void Orb_ModelIO::Open(Orb_Model &model, std::string const &path) {
+  Section section(model);
+  {
+    ByteReader in(path);
+    Orb_ModelIO io(&in);
+    io.ReadHeader();
+    io.ReadModel(section);
+    if (in.Get() >= 0)
+      in.Corrupt("data after the end record");
+  }
+
+  std::vector<Orb_DesignMgr *> const loaded = Commit(section);
+  // A companion already in the model, live or waiting, wins over the copy
+  // in the file.
+  std::vector<std::string> companionKeys;
+  for (auto &[key, companion] : section.companions) {
+    if (model.m_Companions.count(key) || model.m_LoadedCompanions.count(key))
+      continue;
+    model.m_LoadedCompanions.emplace(key, std::move(companion));
+    companionKeys.push_back(key);
+  }
+
+  try {
+    for (Orb_DesignMgr *designMgr : loaded)
+      model.AnnounceLoadTree(designMgr);
+    // Index loop: a handler may subscribe another context.
+    for (std::size_t i = 0; i < model.m_Subscribers.size(); ++i)
+      model.m_Subscribers[i]->SyncEventSpecializeModelOnLoad(&model);
+  } catch (...) {
+    Rollback(model, loaded, companionKeys);
+    throw;
+  }
+}
+
+void Orb_ModelIO::FreeDesignMgrs(Orb_Model &model, std::vector<Orb_DesignMgr *> const &designMgrs) {
+  for (Orb_DesignMgr *designMgr : designMgrs)
+    model.Free(designMgr);
+}
+
+std::vector<Orb_DesignMgr *> Orb_ModelIO::Commit(Section &section) {
+  std::vector<Orb_DesignMgr *> loaded = section.designMgrs.Items();
+  section.designMgrs = Orb_NamedList<Orb_DesignMgr>();
+  for (Orb_DesignMgr *designMgr : loaded)
+    section.model.m_DesignMgrs.Add(designMgr);
+  return loaded;
+}
+
+void Orb_ModelIO::Rollback(Orb_Model &model, std::vector<Orb_DesignMgr *> const &loaded,
+                           std::vector<std::string> const &companionKeys) {
+  // A handler may itself have deleted a loaded design manager.
+  std::unordered_set<Orb_DesignMgr *> const live(model.m_DesignMgrs.Items().begin(),
+                                                 model.m_DesignMgrs.Items().end());
+  for (Orb_DesignMgr *designMgr : loaded) {
+    if (!live.count(designMgr))
+      continue;
+    try {
+      model.Delete(designMgr);
+    } catch (...) {
+      // The handler's exception is the one the caller must see.
+    }
+  }
+  for (std::string const &key : companionKeys)
+    model.m_LoadedCompanions.erase(key);
+}
+
+void Orb_ModelIO::ReadHeader() {
+  for (std::size_t i = 0; i < kMagic.size(); ++i) {
+    int const c = m_pIn->Get();
+    if (c < 0 && i > 0)
+      m_pIn->Truncated();
+    if (c != static_cast<unsigned char>(kMagic[i]))
+      m_pIn->Refuse("is not a design database");
+  }
+  if (m_pIn->Tag() != 'V')
+    m_pIn->Corrupt("expected the format version");
+  std::uint64_t const version = m_pIn->Num();
+  m_pIn->End();
+  if (version == 0 || version > kFormatVersion)
+    m_pIn->Refuse("has format version " + std::to_string(version) +
+                  ", which this build cannot read (it reads version " +
+                  std::to_string(kFormatVersion) + ")");
+  // The model's own names are informational: Open keeps the target's.
+  if (m_pIn->Tag() != 'M')
+    m_pIn->Corrupt("expected the model record");
+  m_pIn->Str(m_Text);
+  m_pIn->Str(m_Text);
+  m_pIn->End();
+}
+
+void Orb_ModelIO::ReadModel(Section &section) {
+  for (;;) {
+    char const tag = m_pIn->Tag();
+    if (tag == 'D') {
+      std::string name = ReadName("design manager");
+      m_pIn->End();
+      if (section.model.m_DesignMgrs.Find(name))
+        m_pIn->Refuse("holds design manager " + Quote(name) + ", which the model already has");
+      if (section.designMgrs.Find(name))
+        Duplicate("design manager", name, nullptr);
+      auto *designMgr = new Orb_DesignMgr(&section.model, std::move(name));
+      section.designMgrs.Add(designMgr);
+      ReadDesignMgr(designMgr);
+    } else if (tag == 'K') {
+      ReadCompanion(section);
+    } else if (tag == 'Z') {
+      m_pIn->End();
+      return;
+    } else {
+      Unexpected(tag, "model");
+    }
+  }
+}
+
+void Orb_ModelIO::ReadCompanion(Section &section) {
+  std::string key;
+  m_pIn->Str(key);
+  m_pIn->End();
+  if (section.companions.count(key))
+    m_pIn->Corrupt("second companion section " + Quote(key));
+  if (m_pIn->Tag() != 'M')
+    m_pIn->Corrupt("expected the model record of companion " + Quote(key));
+  std::string name;
+  std::string dbName;
+  m_pIn->Str(name);
+  m_pIn->Str(dbName);
+  m_pIn->End();
+  auto companion = std::make_unique<Orb_Model>(name.c_str(), dbName.c_str(), "", false);
+  {
+    Section inner(*companion);
+    ReadModel(inner);
+    Commit(inner);
+    for (auto &[innerKey, innerModel] : inner.companions)
+      companion->m_LoadedCompanions.emplace(innerKey, std::move(innerModel));
+  }
+  section.companions.emplace(std::move(key), std::move(companion));
+}
+
+void Orb_ModelIO::ReadDesignMgr(Orb_DesignMgr *designMgr) {
+  Orb_PropertyHolder *holder = designMgr;
+  for (;;) {
+    char const tag = m_pIn->Tag();
+    if (ReadProperty(tag, holder))
+      continue;
+    if (tag == 'G') {
+      std::string name = ReadName("design");
+      m_pIn->End();
+      if (designMgr->m_Designs.Find(name))
+        Duplicate("design", name, designMgr);
+      auto *design = new Orb_Design(designMgr->GetModel(), designMgr, std::move(name));
+      designMgr->m_Designs.Add(design);
+      ReadDesign(design);
+      holder = nullptr;
+    } else if (tag == 'E') {
+      m_pIn->End();
+      return;
+    } else {
+      Unexpected(tag, "design manager");
+    }
+  }
+}
+
+void Orb_ModelIO::ReadDesign(Orb_Design *design) {
+  Orb_PropertyHolder *holder = design;
+  for (;;) {
+    char const tag = m_pIn->Tag();
+    if (ReadProperty(tag, holder))
+      continue;
+    if (tag == 'W') {
+      std::string name = ReadName("view");
+      m_pIn->End();
+      if (design->m_Views.Find(name))
+        Duplicate("view", name, design);
+      auto *view = new Orb_View(design->GetModel(), design, std::move(name));
+      design->m_Views.Add(view);
+      ReadView(view);
+      holder = nullptr;
+    } else if (tag == 'E') {
+      m_pIn->End();
+      return;
+    } else {
+      Unexpected(tag, "design");
+    }
+  }
+}
+
+void Orb_ModelIO::ReadView(Orb_View *view) {
+  m_Pins.clear();
+  m_Signals.clear();
+  Orb_PropertyHolder *holder = view;
+  for (;;) {
+    char const tag = m_pIn->Tag();
+    if (ReadProperty(tag, holder))
+      continue;
+    if (tag == 'B') {
+      std::string name = ReadName("block");
+      m_pIn->End();
+      if (view->m_pTopBlock)
+        m_pIn->Corrupt("second top block in view " + Quote(view->GetNameString()));
+      view->m_pTopBlock = new Orb_Block(view->GetModel(), view, view, std::move(name));
+      ReadBlock(view->m_pTopBlock);
+      holder = nullptr;
+    } else if (tag == 'C') {
+      ReadConnections();
+      holder = nullptr;
+    } else if (tag == 'N') {
+      holder = ReadNetwork(view);
+    } else if (tag == 'E') {
+      m_pIn->End();
+      return;
+    } else {
+      Unexpected(tag, "view");
+    }
+  }
+}
+
+void Orb_ModelIO::ReadBlock(Orb_Block *block) {
+  Orb_Model *model = block->GetModel();
+  Orb_PropertyHolder *holder = block;
+  for (;;) {
+    char const tag = m_pIn->Tag();
+    if (ReadProperty(tag, holder))
+      continue;
+    if (tag == 'I') {
+      std::uint64_t const code = m_pIn->Num();
+      std::string name = ReadName("pin");
+      m_pIn->End();
+      if (code > Orb_Pin::PIN_BIDIRECTIONAL)
+        m_pIn->Corrupt("unknown direction of pin " + Quote(name));
+      auto const direction = static_cast<Orb_Pin::PIN_DIRECTION>(code);
+      if (block->m_Pins.Find(name))
+        Duplicate("pin", name, block);
+      auto *pin = new Orb_Pin(model, block, std::move(name), direction);
+      block->m_Pins.Add(pin);
+      m_Pins.push_back(pin);
+      holder = pin;
+    } else if (tag == 'S') {
+      std::string name = ReadName("signal");
+      m_pIn->End();
+      if (block->m_Signals.Find(name))
+        Duplicate("signal", name, block);
+      auto *signal = new Orb_Signal(model, block, std::move(name));
+      block->m_Signals.Add(signal);
+      m_Signals.push_back(signal);
+      holder = signal;
+    } else if (tag == 'B') {
+      std::string name = ReadName("block");
+      m_pIn->End();
+      if (block->m_Blocks.Find(name))
+        Duplicate("block", name, block);
+      auto *child = new Orb_Block(model, block, block->m_pView, std::move(name));
+      block->m_Blocks.Add(child);
+      ReadBlock(child);
+      holder = nullptr;
+    } else if (tag == 'E') {
+      m_pIn->End();
+      return;
+    } else {
+      Unexpected(tag, "block");
+    }
+  }
+}
+
+void Orb_ModelIO::ReadConnections() {
+  Orb_Signal *signal = SignalAt(m_pIn->Num());
+  for (std::uint64_t n = m_pIn->Num(); n > 0; --n) {
+    Orb_Pin *pin = PinAt(m_pIn->Num());
+    if (pin->GetSignal())
+      m_pIn->Corrupt("pin " + Quote(pin->GetNameString()) + " is connected twice");
+    pin->Connect(signal);
+  }
+  m_pIn->End();
+}
+
+Orb_Network *Orb_ModelIO::ReadNetwork(Orb_View *view) {
+  std::string name = ReadName("network");
+  if (view->m_Networks.Find(name))
+    Duplicate("network", name, view);
+  auto *network = new Orb_Network(view->GetModel(), view, std::move(name));
+  view->m_Networks.Add(network);
+  for (std::uint64_t n = m_pIn->Num(); n > 0; --n) {
+    Orb_Signal *signal = SignalAt(m_pIn->Num());
+    if (signal->GetNetwork())
+      m_pIn->Corrupt("signal " + Quote(signal->GetNameString()) + " is in two networks");
+    network->AddSignal(signal);
+  }
+  m_pIn->End();
+  return network;
+}
+
+bool Orb_ModelIO::ReadProperty(char tag, Orb_PropertyHolder *holder) {
+  if (tag != 'P' && tag != 'L' && tag != 'Q')
+    return false;
+  if (!holder)
+    m_pIn->Corrupt("property record without an object");
+  std::string name;
+  m_pIn->Str(name);
+  std::size_t const before = holder->GetProperties().size();
+  Orb_Property *property = nullptr;
+  if (tag == 'P') {
+    m_pIn->Str(m_Text);
+    property = holder->CreatePropertyString(name.c_str(), "");
+    property->SetStringValue(m_Text);
+  } else if (tag == 'L') {
+    property = holder->CreatePropertyStringList(name.c_str());
+    for (std::uint64_t n = m_pIn->Num(); n > 0; --n) {
+      m_pIn->Str(m_Text);
+      property->AppendString(m_Text);
+    }
+  } else {
+    property = holder->CreatePropertyList(name.c_str());
+    std::string memberName;
+    for (std::uint64_t n = m_pIn->Num(); n > 0; --n) {
+      m_pIn->Str(memberName);
+      m_pIn->Str(m_Text);
+      property->CreatePropertyString(memberName.c_str(), m_Text.c_str());
+    }
+  }
+  m_pIn->End();
+  if (holder->GetProperties().size() == before)
+    m_pIn->Corrupt("second property named " + Quote(name));
+  return true;
+}
+
+std::string Orb_ModelIO::ReadName(char const *kind) {
+  std::string name;
+  m_pIn->Str(name);
+  if (name.empty())
+    m_pIn->Corrupt(std::string("empty ") + kind + " name");
+  return name;
+}
+
+Orb_Pin *Orb_ModelIO::PinAt(std::uint64_t index) const {
+  if (index >= m_Pins.size())
+    m_pIn->Corrupt("connection to pin " + std::to_string(index) + " of a view with " +
+                   std::to_string(m_Pins.size()) + " pins");
+  return m_Pins[index];
+}
+
+Orb_Signal *Orb_ModelIO::SignalAt(std::uint64_t index) const {
+  if (index >= m_Signals.size())
+    m_pIn->Corrupt("reference to signal " + std::to_string(index) + " of a view with " +
+                   std::to_string(m_Signals.size()) + " signals");
+  return m_Signals[index];
+}
+
+void Orb_ModelIO::Unexpected(char tag, char const *where) const {
+  auto const byte = static_cast<unsigned char>(tag);
+  std::string const shown =
+      byte > ' ' && byte < 0x7f ? Quote(std::string(1, tag)) : "byte " + std::to_string(byte);
+  m_pIn->Corrupt("unexpected record " + shown + " in a " + where);
+}
+
+void Orb_ModelIO::Duplicate(char const *kind, std::string const &name,
+                            Orb_Persistent const *parent) const {
+  std::string what = std::string("second ") + kind + " named " + Quote(name);
+  if (parent)
+    what += std::string(" in ") + Orb_KindName(parent->GetKind()) + " " +
+            Quote(parent->GetNameString());
+  m_pIn->Corrupt(what);
 }

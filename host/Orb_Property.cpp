@@ -65,6 +65,9 @@ void Orb_PropertyHolder::DeleteProperty(Orb_Property *property) {
 }
 
 void Orb_PropertyHolder::CopyPropertiesFrom(Orb_PropertyHolder const &other) {
+  // Onto itself, replacing a list would empty the very list being copied.
+  if (&other == this)
+    return;
   for (auto const &source : other.m_Properties) {
     Orb_Property *copy = nullptr;
     switch (source->GetKind()) {

@@ -24,8 +24,8 @@ public:
   std::string const &GetMessage() const { return m_Message; }
   bool GetFlag() const { return m_Flag; }
 
-  // One readable line: "<subsystem> error at <file>:<line> (<revision>):
-  // <object>: <message>".
+  // One readable line with every field: "<subsystem> error at <file>:<line>
+  // (<revision>): <<object>> <message>".
   char const *what() const noexcept override { return m_What.c_str(); }
 
 private:

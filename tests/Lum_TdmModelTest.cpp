@@ -1,1 +1,173 @@
+// The client model: which client class each host event builds, with which
+// creation flag, and how clients go away.
+
+#include "Lum_TdmTestSupport.h"
+
+#include "Lum_Exception.h"
+
 #include <gtest/gtest.h>
+
+using namespace lumtest;
+
+namespace {
+
+// Counts the client objects destroyed through the model's delete events.
+class CountingModel : public Lum_TdmModel {
+public:
+  using Lum_TdmModel::Lum_TdmModel;
+  void SyncEventDeleteBlock(Orb_Block *block) override {
+    if (GetClient(block))
+      ++m_BlocksDestroyed;
+    Lum_TdmModel::SyncEventDeleteBlock(block);
+  }
+  int m_BlocksDestroyed = 0;
+};
+
+class TdmModelTest : public ::testing::Test {
+protected:
+  TempDir m_Dir;
+};
+
+// Every kind created through the host gets its client of the right class in
+// the creation event, except design managers and networks, which the model
+// builds only on load.
+TEST_F(TdmModelTest, CreationEventsBuildTheClientClasses) {
+  Lum_TdmModel model("m", "db", "");
+  Orb_Model *host = model.GetOrbModel();
+
+  Orb_DesignMgr *dm = host->CreateDesignMgr("dm");
+  EXPECT_EQ(model.GetClient(dm), nullptr) << "design managers are specialized on load only";
+  Orb_Design *design = dm->CreateDesign("d");
+  Orb_View *view = design->CreateView("v");
+  Orb_Block *top = view->CreateTopBlock("top");
+  Orb_Block *child = top->CreateBlock("c", 0);
+  Orb_Pin *pin = child->CreatePin("p", Orb_Pin::PIN_INPUT);
+  Orb_Signal *signal = top->CreateSignal("s");
+  Orb_Network *network = view->CreateNetwork("n");
+  EXPECT_EQ(model.GetClient(network), nullptr) << "networks are specialized on load only";
+
+  EXPECT_NE(dynamic_cast<Lum_TdmDesign *>(model.GetClient(design)), nullptr);
+  EXPECT_NE(dynamic_cast<Lum_TdmView *>(model.GetClient(view)), nullptr);
+  EXPECT_NE(dynamic_cast<Lum_TdmBlock *>(model.GetClient(top)), nullptr);
+  EXPECT_NE(dynamic_cast<Lum_TdmBlock *>(model.GetClient(child)), nullptr);
+  EXPECT_NE(dynamic_cast<Lum_TdmPin *>(model.GetClient(pin)), nullptr);
+  EXPECT_NE(dynamic_cast<Lum_TdmSignal *>(model.GetClient(signal)), nullptr);
+
+  // The creation flag is visible in what the constructors did: a created
+  // design is marked and a created view stamped.
+  EXPECT_STREQ(design->GetPropertyByName("TDS_DESIGN_TYPE")->GetStringValue(),
+               "TDS_DESIGN_TYPE_USER");
+  EXPECT_STREQ(view->GetPropertyByName("TDS_TDM_VERSION")->GetStringValue(), "3.1");
+
+  // Design managers and networks come into being through the load event.
+  EXPECT_NE(dynamic_cast<Lum_TdmDesignMgr *>(model.Specialize(dm)), nullptr);
+  EXPECT_NE(dynamic_cast<Lum_TdmNetwork *>(model.Specialize(network)), nullptr);
+}
+
+// Opening a database builds every client through the load events: a loaded
+// view is checked, not stamped, and keeps its stored version.
+TEST_F(TdmModelTest, LoadEventsBuildTheClientClasses) {
+  TypedDesign design;
+  Lum_TdmBlock *top = design.m_pView->CreateTopBlock("top");
+  top->CreatePin("p", Orb_Pin::PIN_OUTPUT);
+  top->CreateSignal("s");
+  design.m_pView->CreateNetwork("n");
+  design.m_pView->CreatePropertyString("TDS_TDM_VERSION", "2.5");
+
+  auto reopened = SaveAndReopen(design.Model(), m_Dir.File("d.odb"));
+  Orb_Model *host = reopened->GetOrbModel();
+  EXPECT_EQ(reopened->GetClientCount(), 7u) << "one client per host object";
+  Lum_TdmView *view = FirstView(*reopened);
+  ASSERT_NE(view, nullptr);
+  unsigned version = 0, revision = 0;
+  view->GetTdmLoadedDesignVersion(version, revision);
+  EXPECT_EQ(version, 2u);
+  EXPECT_EQ(revision, 5u);
+  EXPECT_STREQ(view->GetPropertyByName("TDS_TDM_VERSION")->GetStringValue(), "2.5");
+  Orb_DesignMgr *dm = host->GetDesignMgrs().front();
+  EXPECT_NE(dynamic_cast<Lum_TdmDesignMgr *>(reopened->GetClient(dm)), nullptr);
+  Orb_View *hostView = view->GetOrbView();
+  EXPECT_NE(dynamic_cast<Lum_TdmNetwork *>(reopened->GetClient(hostView->GetNetworks().front())),
+            nullptr);
+  EXPECT_NE(dynamic_cast<Lum_TdmPin *>(reopened->GetClient(hostView->GetBlock()->GetPins().front())),
+            nullptr);
+  EXPECT_NE(
+      dynamic_cast<Lum_TdmSignal *>(reopened->GetClient(hostView->GetBlock()->GetSignals().front())),
+      nullptr);
+}
+
+// Deleting a host block destroys its client once, and its children's; a
+// host object without a client is deleted without any effect on clients.
+TEST_F(TdmModelTest, DeleteEventsDestroyClientsOnce) {
+  CountingModel model("m", "db", "");
+  Orb_Model *host = model.GetOrbModel();
+  Orb_View *view = host->CreateDesignMgr("dm")->CreateDesign("d")->CreateView("v");
+  Orb_Block *top = view->CreateTopBlock("top");
+  Orb_Block *child = top->CreateBlock("c", 0);
+  child->CreateBlock("g", 0);
+  child->CreatePin("p", Orb_Pin::PIN_INPUT);
+
+  delete model.GetClient(child->GetBlocks().front()); // discarded client
+  top->DeleteBlock(child);
+  EXPECT_EQ(model.m_BlocksDestroyed, 1) << "only the child still had a client";
+  EXPECT_NE(model.GetClient(top), nullptr);
+
+  std::size_t const before = model.GetClientCount();
+  Orb_Network *network = view->CreateNetwork("n"); // no client on create
+  view->DeleteNetwork(network);
+  EXPECT_EQ(model.GetClientCount(), before);
+}
+
+// A client constructor that throws during a load leaves no client and no
+// host object of the database behind.
+TEST_F(TdmModelTest, ThrowingConstructorLeavesNothing) {
+  TypedDesign design;
+  design.m_pView->CreateTopBlock("top")->CreatePin("p", Orb_Pin::PIN_INPUT);
+  design.m_pView->CreatePropertyString("TDS_TDM_VERSION", "9.0");
+  std::string const path = m_Dir.File("d.odb");
+  design.Model().Save(path.c_str());
+
+  Lum_TdmModel reopened("r", "r", "");
+  Port_MsgCapture capture;
+  EXPECT_THROW(reopened.Open(path.c_str()), Lum_ExceptionCorruptDatabase);
+  EXPECT_EQ(reopened.GetClientCount(), 0u);
+  EXPECT_TRUE(reopened.GetOrbModel()->GetDesignMgrs().empty());
+  EXPECT_EQ(reopened.GetOrbModel()->GetObjectCount(Orb_Kind::Pin), 0u);
+}
+
+// Both constructors subscribe; a model over a caller's host model gets that
+// host model's events and leaves it to the caller.
+TEST_F(TdmModelTest, BothConstructorsSubscribe) {
+  Lum_TdmModel own("name", "dbname", "path");
+  EXPECT_TRUE(own.IsSubscribed());
+  EXPECT_TRUE(own.OwnsOrbModel());
+  EXPECT_STREQ(own.GetOrbModel()->GetName(), "name");
+  EXPECT_STREQ(own.GetDbName(), "dbname");
+  EXPECT_STREQ(own.GetOrbModel()->GetPath(), "path");
+  EXPECT_FALSE(own.GetOrbModel()->IsReadOnly());
+
+  Orb_Model host("h", "hdb", "", false);
+  {
+    Lum_TdmModel attached(&host);
+    EXPECT_TRUE(attached.IsSubscribed());
+    EXPECT_FALSE(attached.OwnsOrbModel());
+    Orb_Design *design = host.CreateDesignMgr("dm")->CreateDesign("d");
+    EXPECT_NE(attached.GetClient(design), nullptr);
+  }
+  EXPECT_EQ(host.GetDesignMgrs().size(), 1u) << "the caller's host model outlives the client model";
+  EXPECT_TRUE(host.GetContexts().empty());
+}
+
+// The graft hooks do nothing, in any number and order.
+TEST_F(TdmModelTest, GraftHooksDoNothing) {
+  TypedDesign design;
+  std::size_t const clients = design.Model().GetClientCount();
+  design.Model().CleanupGraftProps();
+  design.Model().UnregisterGraftEventHandlers();
+  design.Model().RegisterGraftEventHandlers();
+  design.Model().RegisterGraftEventHandlers();
+  design.Model().CleanupGraftProps();
+  EXPECT_EQ(design.Model().GetClientCount(), clients);
+}
+
+} // namespace

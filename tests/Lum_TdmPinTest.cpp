@@ -1,1 +1,127 @@
+// Pins, signals and networks: the pin's type pin, and commits that write
+// nothing.
+
+#include "Lum_TdmTestSupport.h"
+
+#include "Lum_TlmTypeID.h"
+
 #include <gtest/gtest.h>
+
+using namespace lumtest;
+
+namespace {
+
+// A canonical text of every property of an object.
+std::string Properties(Orb_Persistent const *object) {
+  std::string text;
+  for (auto const &property : object->GetProperties()) {
+    text += std::string(property->GetName()) + "=" + property->GetValue() + ";";
+    for (auto const &entry : property->GetStrings())
+      text += "[" + entry + "]";
+    for (auto const &member : property->GetMembers())
+      text += "{" + std::string(member->GetName()) + "=" + member->GetValue() + "}";
+  }
+  return text;
+}
+
+class TdmPinTest : public ::testing::Test {
+protected:
+  TdmPinTest() : m_Library("LIBP", 1, 0) {
+    m_pTypeBlock = m_Library.AddTypeBlock("DFF", {"D", "Q"});
+    m_pTop = m_Design.m_pView->CreateTopBlock("top");
+  }
+
+  TempDir m_Dir;
+  TestLibrary m_Library;
+  Lum_TlmBlock *m_pTypeBlock = nullptr;
+  TypedDesign m_Design;
+  Lum_TdmBlock *m_pTop = nullptr;
+};
+
+// A pin has no type pin until one is set; the last SetTypePin wins, and
+// IsTypeOf asks the identifier about exactly that pointer.
+TEST_F(TdmPinTest, TypePinIsWhatWasSetLast) {
+  Lum_TdmPin *pin = m_pTop->CreatePin("D", Orb_Pin::PIN_INPUT);
+  Lum_TlmPin const *typeD = m_pTypeBlock->GetPinByName("D");
+  Lum_TlmPin const *typeQ = m_pTypeBlock->GetPinByName("Q");
+  Lum_TlmPinTypeID const untyped;
+  Lum_TlmPinTypeID const idD("LIBP", "DFF", "D");
+
+  EXPECT_EQ(pin->GetTypePin(), nullptr);
+  EXPECT_TRUE(pin->IsTypeOf(untyped));
+  EXPECT_FALSE(pin->IsTypeOf(idD));
+
+  pin->SetTypePin(typeD);
+  pin->SetTypePin(typeD);
+  EXPECT_EQ(pin->GetTypePin(), typeD);
+  EXPECT_TRUE(pin->IsTypeOf(idD));
+  EXPECT_FALSE(pin->IsTypeOf(untyped));
+
+  pin->SetTypePin(typeQ);
+  EXPECT_FALSE(pin->IsTypeOf(idD));
+  pin->SetTypePin(nullptr);
+  EXPECT_EQ(pin->GetTypePin(), nullptr);
+  EXPECT_TRUE(pin->IsTypeOf(untyped));
+}
+
+// A loaded pin has no type pin, and loading it gives its block a client.
+TEST_F(TdmPinTest, LoadedPinBringsItsBlockClient) {
+  m_pTop->CreatePin("D", Orb_Pin::PIN_INPUT)->SetTypePin(m_pTypeBlock->GetPinByName("D"));
+  auto reopened = SaveAndReopen(m_Design.Model(), m_Dir.File("d.odb"));
+  Orb_Block *top = FirstView(*reopened)->GetOrbView()->GetBlock();
+  Orb_Pin *pin = top->GetPins().front();
+  EXPECT_EQ(static_cast<Lum_TdmPin *>(reopened->GetClient(pin))->GetTypePin(), nullptr);
+
+  // Discard both clients; specializing the pin alone brings the block back.
+  delete reopened->GetClient(pin);
+  delete reopened->GetClient(top);
+  ASSERT_EQ(reopened->GetClient(top), nullptr);
+  ASSERT_NE(reopened->Specialize(pin), nullptr);
+  EXPECT_NE(reopened->GetClient(top), nullptr);
+}
+
+// Committing pins, signals and networks writes no property.
+TEST_F(TdmPinTest, CommitWritesNothingForPinsSignalsNetworks) {
+  Lum_TdmPin *pin = m_pTop->CreatePin("D", Orb_Pin::PIN_INPUT);
+  pin->SetTypePin(m_pTypeBlock->GetPinByName("D"));
+  pin->CreatePropertyString("USER", "kept");
+  Lum_TdmSignal *signal = m_pTop->CreateSignal("s");
+  Lum_TdmNetwork *network = m_Design.m_pView->CreateNetwork("n");
+  pin->GetOrbPin()->Connect(signal->GetOrbSignal());
+  network->GetOrbNetwork()->AddSignal(signal->GetOrbSignal());
+
+  std::string const before = Properties(pin->GetOrbObject()) + "|" +
+                             Properties(signal->GetOrbObject()) + "|" +
+                             Properties(network->GetOrbObject());
+  pin->TraverseAndCommitToOrb();
+  signal->TraverseAndCommitToOrb();
+  network->TraverseAndCommitToOrb();
+  m_Design.m_pView->CommitAll();
+  EXPECT_EQ(Properties(pin->GetOrbObject()) + "|" + Properties(signal->GetOrbObject()) + "|" +
+                Properties(network->GetOrbObject()),
+            before);
+  EXPECT_EQ(before, "USER=kept;||");
+}
+
+// The view's commit reaches every network, block, pin and signal, making
+// clients for those that had none.
+TEST_F(TdmPinTest, CommitSpecializesEveryObject) {
+  Lum_TdmBlock *child = m_pTop->CreateBlock("c", 0);
+  child->CreatePin("q", Orb_Pin::PIN_OUTPUT);
+  m_pTop->CreateSignal("s");
+  m_Design.m_pView->CreateNetwork("n");
+  Orb_Model *host = m_Design.Host();
+  for (Orb_Persistent *object :
+       std::vector<Orb_Persistent *>{child->GetOrbBlock()->GetPins().front(),
+                                     m_pTop->GetOrbBlock()->GetSignals().front(),
+                                     child->GetOrbBlock()})
+    delete m_Design.Model().GetClient(object);
+
+  m_Design.m_pView->CommitAll();
+  std::size_t objects = 0;
+  for (unsigned k = 0; k < Orb_KindCount; ++k)
+    objects += host->GetObjectCount(static_cast<Orb_Kind>(k));
+  EXPECT_EQ(m_Design.Model().GetClientCount(), objects) << "every host object has its client";
+}
+
+} // namespace

@@ -1,1 +1,421 @@
+// The view's format stamp and its type-library list.
+
+#include "Lum_TdmTestSupport.h"
+
+#include "Lum_Exception.h"
+#include "Lum_TlmTypeID.h"
+
 #include <gtest/gtest.h>
+
+#include <functional>
+
+using namespace lumtest;
+
+namespace {
+
+// A view whose library loading a test can replace, and whose protected list
+// operation it can call.
+class HookedView : public Lum_TdmView {
+public:
+  using Lum_TdmView::Lum_TdmView;
+  using Lum_TdmView::SetLibrary;
+  std::function<Lum_TlmLibrary const *(char const *)> m_Loader;
+
+protected:
+  Lum_TlmLibrary const *LoadLibrary(char const *name, PM_PIC const &personality) const override {
+    return m_Loader ? m_Loader(name) : Lum_TdmView::LoadLibrary(name, personality);
+  }
+};
+
+class HookedModel : public Lum_TdmModel {
+public:
+  using Lum_TdmModel::Lum_TdmModel;
+  void SyncEventSpecializeViewOnCreate(Orb_View *view) override { new HookedView(this, view, true); }
+  void SyncEventSpecializeViewOnLoad(Orb_View *view) override { new HookedView(this, view, false); }
+};
+
+// Subscribed before the library's model: puts a property on every new view
+// in the creation event.
+class PrePropertyModel : public Orb_ModelDerived {
+public:
+  explicit PrePropertyModel(Orb_Model *host) : Orb_ModelDerived(host) { SetEventNotifyAll(); }
+  void SyncEventSpecializeViewOnCreate(Orb_View *view) override {
+    view->CreatePropertyString("LUM_DONT_CREATE_UNUSED_PINS", "yes");
+  }
+};
+
+std::string Names(std::vector<Lum_TlmLibrary const *> const &libraries) {
+  std::string names;
+  for (Lum_TlmLibrary const *library : libraries)
+    names += (names.empty() ? "" : ",") + std::string(library ? library->GetLibraryName() : "null");
+  return names;
+}
+
+unsigned Registrations(char const *name) {
+  return Lum_Tlm::pTypeIDRegistry->GetRegistrationCount(name);
+}
+
+// ---------------------------------------------------------------------------
+// Stamp
+
+class TdmViewStampTest : public ::testing::Test {
+protected:
+  TempDir m_Dir;
+};
+
+// A new view is stamped with the current format and drops the pin switch,
+// even when it was put on the host view before the library saw it.
+TEST_F(TdmViewStampTest, NewViewIsStamped) {
+  Orb_Model host("h", "h", "", false);
+  PrePropertyModel first(&host);
+  Lum_TdmModel model(&host);
+  Orb_View *hostView = host.CreateDesignMgr("dm")->CreateDesign("d")->CreateView("v");
+  auto *view = static_cast<Lum_TdmView *>(model.GetClient(hostView));
+  ASSERT_NE(view, nullptr);
+  EXPECT_EQ(PropertyValue(view, "TDS_TDM_VERSION"), "3.1");
+  EXPECT_EQ(view->GetPropertyByName("LUM_DONT_CREATE_UNUSED_PINS"), nullptr);
+  EXPECT_EQ(view->GetPropertyByName("TDS_VIEW_TYPE_LIBS"), nullptr) << "no list on creation";
+  unsigned version = 0, revision = 0;
+  view->GetTdmLoadedDesignVersion(version, revision);
+  EXPECT_EQ(version, 3u);
+  EXPECT_EQ(revision, 1u);
+  Lum_TdmView::GetTdmVersion(version, revision);
+  EXPECT_EQ(version, 3u);
+  EXPECT_EQ(revision, 1u);
+}
+
+// A view loaded with an older stamp keeps it until its commit, which writes
+// the current stamp; the loaded version stays what was read.
+TEST_F(TdmViewStampTest, CommitRewritesAnOlderStamp) {
+  TypedDesign design;
+  design.m_pView->CreatePropertyString("TDS_TDM_VERSION", "2.5");
+  design.m_pView->CreatePropertyString("LUM_DONT_CREATE_UNUSED_PINS", "");
+  auto reopened = SaveAndReopen(design.Model(), m_Dir.File("d.odb"));
+  Lum_TdmView *view = FirstView(*reopened);
+  EXPECT_EQ(PropertyValue(view, "TDS_TDM_VERSION"), "2.5");
+  EXPECT_NE(view->GetPropertyByName("LUM_DONT_CREATE_UNUSED_PINS"), nullptr);
+
+  view->CommitAll();
+  view->CommitAll();
+  EXPECT_EQ(PropertyValue(view, "TDS_TDM_VERSION"), "3.1");
+  EXPECT_EQ(view->GetPropertyByName("LUM_DONT_CREATE_UNUSED_PINS"), nullptr);
+  unsigned version = 0, revision = 0;
+  view->GetTdmLoadedDesignVersion(version, revision);
+  EXPECT_EQ(version, 2u);
+  EXPECT_EQ(revision, 5u);
+  auto again = SaveAndReopen(*reopened, m_Dir.File("d2.odb"));
+  EXPECT_EQ(PropertyValue(FirstView(*again), "TDS_TDM_VERSION"), "3.1");
+}
+
+struct StampCase {
+  char const *stamp; // null: no stamp at all
+  enum { ACCEPTED, TOO_OLD, TOO_NEW } outcome;
+  unsigned version;
+  unsigned revision;
+};
+
+std::ostream &operator<<(std::ostream &out, StampCase const &c) {
+  return out << (c.stamp ? c.stamp : "(absent)");
+}
+
+class TdmViewStampTableTest : public ::testing::TestWithParam<StampCase> {
+protected:
+  TempDir m_Dir;
+};
+
+// Each stored stamp is accepted with its numbers or refused as too old or
+// too new: reported first, then thrown with the design manager's name.
+TEST_P(TdmViewStampTableTest, LoadClassifiesTheStamp) {
+  StampCase const c = GetParam();
+  std::string const path = m_Dir.File("d.odb");
+  {
+    TypedDesign design;
+    if (c.stamp)
+      design.m_pView->CreatePropertyString("TDS_TDM_VERSION", c.stamp);
+    else
+      design.m_pView->DeleteProperty("TDS_TDM_VERSION");
+    design.Model().Save(path.c_str());
+  }
+  Lum_TdmModel model("r", "r", "");
+  Port_MsgCapture capture;
+  if (c.outcome == StampCase::ACCEPTED) {
+    model.Open(path.c_str());
+    unsigned version = 99, revision = 99;
+    FirstView(model)->GetTdmLoadedDesignVersion(version, revision);
+    EXPECT_EQ(version, c.version);
+    EXPECT_EQ(revision, c.revision);
+    EXPECT_TRUE(capture.GetReports().empty());
+    return;
+  }
+  bool const old = c.outcome == StampCase::TOO_OLD;
+  try {
+    model.Open(path.c_str());
+    FAIL() << "stamp accepted";
+  } catch (Lum_ExceptionCorruptDatabase const &e) {
+    EXPECT_EQ(e.GetMessage(), old ? "Old design that requires conversion."
+                                  : "New design that requires newer software.");
+    EXPECT_EQ(e.GetObjectName(), "dm");
+    EXPECT_EQ(e.GetFile(), "../s/Lum_TdmView");
+    EXPECT_FALSE(e.GetFlag());
+  }
+  ASSERT_EQ(capture.GetReports().size(), 1u);
+  Port_MsgReport const &report = capture.GetReports().front();
+  EXPECT_EQ(report.severity, Port_MsgReport::ERROR);
+  EXPECT_EQ(report.subsystem, "Lum");
+  EXPECT_EQ(report.path, "../s/Lum_TdmView");
+  std::string const numbers = "Tdm version is " + std::to_string(static_cast<int>(c.version)) +
+                              " and the revision is " +
+                              std::to_string(static_cast<int>(c.revision)) + ".";
+  std::string const expected =
+      old ? numbers + " This is an old design that is no longer supported by the software.  "
+                      "Please convert your design.\n"
+          : numbers + "\nThis design was created by software with a newer version than this "
+                      "software.\nPlease use this design with the newer software.\n";
+  EXPECT_EQ(report.text, expected);
+  EXPECT_EQ(model.GetClientCount(), 0u);
+  EXPECT_TRUE(model.GetOrbModel()->GetDesignMgrs().empty());
+}
+
+INSTANTIATE_TEST_SUITE_P(
+    Stamps, TdmViewStampTableTest,
+    ::testing::Values(StampCase{nullptr, StampCase::ACCEPTED, 0, 0},
+                      StampCase{"0.0", StampCase::TOO_OLD, 0, 0},
+                      StampCase{"0.2", StampCase::TOO_OLD, 0, 2},
+                      StampCase{"0.3", StampCase::ACCEPTED, 0, 3},
+                      StampCase{"1.7", StampCase::ACCEPTED, 1, 7},
+                      StampCase{"2.9", StampCase::ACCEPTED, 2, 9},
+                      StampCase{"3", StampCase::ACCEPTED, 3, 0},
+                      StampCase{"3.0", StampCase::ACCEPTED, 3, 0},
+                      StampCase{"3.1", StampCase::ACCEPTED, 3, 1},
+                      StampCase{"3.2", StampCase::TOO_NEW, 3, 2},
+                      StampCase{"4.0", StampCase::TOO_NEW, 4, 0},
+                      StampCase{"-1.0", StampCase::TOO_NEW, 0xFFFFFFFFu, 0},
+                      StampCase{"", StampCase::TOO_OLD, 0, 0},
+                      StampCase{"abc", StampCase::TOO_OLD, 0, 0}));
+
+// ---------------------------------------------------------------------------
+// Library list
+
+class TdmViewLibraryTest : public ::testing::Test {
+protected:
+  TdmViewLibraryTest()
+      : m_LibA("LIBA", 1, 2), m_LibB("LIBB", 2, 0, "fast"), m_LibC("LIBC", 3, 4, "", "rev2"),
+        m_Design(std::make_unique<HookedModel>("m", "db", "")) {}
+
+  HookedView *View() { return static_cast<HookedView *>(m_Design.m_pView); }
+  void SetLibs(std::vector<char const *> const &entries) {
+    Orb_Property *libs = View()->CreatePropertyStringList("TDS_VIEW_TYPE_LIBS");
+    for (char const *entry : entries)
+      libs->AppendString(entry);
+  }
+  // Reopens the design so that the view builds its list from the property.
+  HookedView *Reopen() {
+    m_Reopened = std::make_unique<HookedModel>("r", "r", "");
+    std::string const path = m_Dir.File("d.odb");
+    m_Design.Model().Save(path.c_str());
+    m_Reopened->Open(path.c_str());
+    return static_cast<HookedView *>(FirstView(*m_Reopened));
+  }
+
+  TempDir m_Dir;
+  TestLibrary m_LibA;
+  TestLibrary m_LibB;
+  TestLibrary m_LibC;
+  TypedDesign m_Design;
+  std::unique_ptr<HookedModel> m_Reopened;
+};
+
+// Without TDS_VIEW_TYPE_LIBS the list is empty, needs no personality, and
+// the first commit writes an empty list next to the stamp.
+TEST_F(TdmViewLibraryTest, AbsentListIsEmpty) {
+  View()->DeleteProperty("TDS_DEVICE_PM");
+  EXPECT_EQ(View()->GetLibrary("LIBA"), nullptr);
+  std::vector<Lum_TlmLibrary const *> libraries;
+  View()->GetLibraries(libraries);
+  EXPECT_TRUE(libraries.empty());
+  View()->CommitAll();
+  Orb_Property const *written = View()->GetPropertyByName("TDS_VIEW_TYPE_LIBS");
+  ASSERT_NE(written, nullptr);
+  EXPECT_EQ(written->GetKind(), Orb_Property::STRING_LIST);
+  EXPECT_TRUE(written->GetStrings().empty());
+  EXPECT_EQ(PropertyValue(View(), "TDS_TDM_VERSION"), "3.1");
+}
+
+// Entries select libraries by their first field only; the commit writes each
+// library's current version and qualifiers, and a reopen reads them back.
+TEST_F(TdmViewLibraryTest, ListIsReadByNameAndWrittenInFull) {
+  SetLibs({"LIBA 9.9 old qualifiers", "LIBB", "LIBC 3.4 x"});
+  HookedView *view = Reopen();
+  EXPECT_EQ(view->GetLibrary("LIBB"), m_LibB.Get());
+  view->CommitAll();
+  EXPECT_EQ(ListValue(view, "TDS_VIEW_TYPE_LIBS"), "LIBA 1.2|LIBB 2.0 fast|LIBC 3.4 rev2");
+  std::vector<Lum_TlmLibrary const *> libraries;
+  view->GetLibraries(libraries);
+  EXPECT_EQ(Names(libraries), "LIBA,LIBB,LIBC");
+}
+
+// Both qualifiers, when present, follow the version with single blanks.
+TEST_F(TdmViewLibraryTest, EntryCarriesBothQualifiers) {
+  TestLibrary both("LIBQ", 7, 11, "q1", "q2");
+  SetLibs({"LIBQ"});
+  HookedView *view = Reopen();
+  view->CommitAll();
+  EXPECT_EQ(ListValue(view, "TDS_VIEW_TYPE_LIBS"), "LIBQ 7.11 q1 q2");
+  m_Reopened.reset(); // the view gives LIBQ back before LIBQ goes
+}
+
+// A library listed twice is loaded, registered, written and released twice.
+TEST_F(TdmViewLibraryTest, DuplicateEntryCountsTwice) {
+  SetLibs({"LIBA", "LIBA"});
+  unsigned const registered = Registrations("LIBA");
+  HookedView *view = Reopen();
+  std::vector<Lum_TlmLibrary const *> libraries;
+  view->GetLibraries(libraries);
+  EXPECT_EQ(Names(libraries), "LIBA,LIBA");
+  EXPECT_EQ(Lum_TlmCatalog::GetReferenceCount("LIBA"), 2u);
+  EXPECT_EQ(Registrations("LIBA"), registered + 2);
+  view->CommitAll();
+  EXPECT_EQ(ListValue(view, "TDS_VIEW_TYPE_LIBS"), "LIBA 1.2|LIBA 1.2");
+  m_Reopened.reset();
+  EXPECT_EQ(Lum_TlmCatalog::GetReferenceCount("LIBA"), 0u) << "both references given back";
+}
+
+// The local library is obtained for the design database, not loaded by
+// name; it stands once in the list, is neither registered nor released, and
+// its entry survives a commit and reopen.
+TEST_F(TdmViewLibraryTest, LocalLibraryIsObtainedOnce) {
+  char const *local = Lum_TlmLibrary::LOCAL_LIBRARY_NAME;
+  SetLibs({"LIBA", local, local});
+  HookedView *view = Reopen();
+  view->m_Loader = [local](char const *name) {
+    EXPECT_STRNE(name, local) << "the local library was loaded by name";
+    return Lum_TlmLibrary::LoadLibrary(name, PM_PIC("pm1", "part1", nullptr));
+  };
+  std::vector<Lum_TlmLibrary const *> libraries;
+  view->GetLibraries(libraries);
+  EXPECT_EQ(Names(libraries), std::string("LIBA,") + local);
+  EXPECT_EQ(view->GetLocalLibrary(), libraries.back());
+  EXPECT_EQ(libraries.back(),
+            Lum_TlmLibrary::GetLocalLibrary(view->GetOrbView()->GetModel(), PM_PIC("", "", nullptr)));
+  EXPECT_EQ(Registrations(local), 0u);
+  view->CommitAll();
+  EXPECT_EQ(ListValue(view, "TDS_VIEW_TYPE_LIBS"), std::string("LIBA 1.2|") + local + " 1.0");
+}
+
+// AddLocalLibrary appends the local library once; GetLocalLibrary never
+// obtains it.
+TEST_F(TdmViewLibraryTest, AddLocalLibraryAppendsOnce) {
+  SetLibs({"LIBA"});
+  HookedView *view = Reopen();
+  EXPECT_EQ(view->GetLocalLibrary(), nullptr);
+  Lum_TlmLibrary const *local = view->AddLocalLibrary();
+  ASSERT_NE(local, nullptr);
+  EXPECT_EQ(view->AddLocalLibrary(), local);
+  std::vector<Lum_TlmLibrary const *> libraries;
+  view->GetLibraries(libraries);
+  EXPECT_EQ(Names(libraries), std::string("LIBA,") + Lum_TlmLibrary::LOCAL_LIBRARY_NAME);
+}
+
+// SetLibrary appends and registers a new library once; null is refused.
+TEST_F(TdmViewLibraryTest, SetLibraryAddsOnceAndRefusesNull) {
+  unsigned const registered = Registrations("LIBB");
+  View()->SetLibrary(m_LibB.Get());
+  View()->SetLibrary(m_LibB.Get());
+  EXPECT_EQ(Registrations("LIBB"), registered + 1);
+  try {
+    View()->SetLibrary(nullptr);
+    FAIL() << "null accepted";
+  } catch (Lum_ExceptionInvalidLibrary const &e) {
+    EXPECT_EQ(e.GetMessage(), "Null library pointer specified.");
+    EXPECT_EQ(e.GetObjectName(), "");
+  }
+  std::vector<Lum_TlmLibrary const *> libraries;
+  View()->GetLibraries(libraries);
+  EXPECT_EQ(Names(libraries), "LIBB");
+}
+
+// A loader that yields null does not put null into the list.
+TEST_F(TdmViewLibraryTest, NullFromLoaderIsRefused) {
+  SetLibs({"LIBA", "LIBB"});
+  HookedView *view = Reopen();
+  view->m_Loader = [](char const *) -> Lum_TlmLibrary const * { return nullptr; };
+  EXPECT_THROW(view->GetLibrary("LIBA"), Lum_ExceptionInvalidLibrary);
+  view->m_Loader = nullptr;
+  std::vector<Lum_TlmLibrary const *> libraries;
+  view->GetLibraries(libraries);
+  EXPECT_TRUE(libraries.empty());
+}
+
+// Lookups compare names exactly.
+TEST_F(TdmViewLibraryTest, LookupIsCaseSensitive) {
+  SetLibs({"LIBA"});
+  HookedView *view = Reopen();
+  EXPECT_EQ(view->GetLibrary("LIBA"), m_LibA.Get());
+  EXPECT_EQ(view->GetLibrary("liba"), nullptr);
+  EXPECT_EQ(view->GetLibrary("LIBA "), nullptr);
+  EXPECT_EQ(view->GetLibrary("LIB"), nullptr);
+}
+
+// GetLibraries keeps what the caller's vector held, appends after it and
+// warns.
+TEST_F(TdmViewLibraryTest, GetLibrariesAppendsWithWarning) {
+  SetLibs({"LIBC"});
+  HookedView *view = Reopen();
+  std::vector<Lum_TlmLibrary const *> libraries{m_LibA.Get(), m_LibB.Get()};
+  Port_MsgCapture capture;
+  view->GetLibraries(libraries);
+  EXPECT_EQ(Names(libraries), "LIBA,LIBB,LIBC");
+  ASSERT_EQ(capture.GetReports().size(), 1u);
+  EXPECT_EQ(capture.GetReports()[0].severity, Port_MsgReport::DEBUG_WARNING);
+  EXPECT_EQ(capture.GetReports()[0].text, "Warning:  passed in vector in not empty.\n");
+}
+
+// A failure while the list is built keeps what entered it; the list is not
+// built again, and what it holds is released with the view.
+TEST_F(TdmViewLibraryTest, FailureMidListKeepsEarlierLibraries) {
+  SetLibs({"LIBA", "NOSUCHLIB", "LIBC"});
+  HookedView *view = Reopen();
+  try {
+    view->GetLibrary("LIBA");
+    FAIL() << "a missing library was not reported";
+  } catch (Lum_ExceptionInvalidLibrary const &e) {
+    EXPECT_EQ(e.GetObjectName(), "NOSUCHLIB");
+  }
+  EXPECT_EQ(view->GetLibrary("LIBA"), m_LibA.Get()) << "the list counts as built";
+  EXPECT_EQ(view->GetLibrary("LIBC"), nullptr);
+  EXPECT_EQ(Lum_TlmCatalog::GetReferenceCount("LIBA"), 1u);
+  EXPECT_EQ(Lum_TlmCatalog::GetReferenceCount("LIBC"), 0u);
+  m_Reopened.reset();
+  EXPECT_EQ(Lum_TlmCatalog::GetReferenceCount("LIBA"), 0u);
+}
+
+// Loading needs the device personality; its absence names the property.
+TEST_F(TdmViewLibraryTest, MissingPersonalityIsReported) {
+  SetLibs({"LIBA"});
+  View()->DeleteProperty("TDS_DEVICE_PART");
+  HookedView *view = Reopen();
+  try {
+    view->CommitAll();
+    FAIL() << "libraries loaded without a personality";
+  } catch (Lum_ExceptionInvalidLibrary const &e) {
+    EXPECT_EQ(e.GetObjectName(), "netlist");
+    EXPECT_NE(e.GetMessage().find("TDS_DEVICE_PART"), std::string::npos) << e.GetMessage();
+  }
+  EXPECT_EQ(ListValue(view, "TDS_VIEW_TYPE_LIBS"), "LIBA") << "a failed commit writes nothing";
+}
+
+// Blank entries are skipped with a warning; leading blanks before a name are
+// ignored.
+TEST_F(TdmViewLibraryTest, BlankEntriesAreSkipped) {
+  SetLibs({"", "  LIBB 2.0", "   "});
+  HookedView *view = Reopen();
+  Port_MsgCapture capture;
+  std::vector<Lum_TlmLibrary const *> libraries;
+  view->GetLibraries(libraries);
+  EXPECT_EQ(Names(libraries), "LIBB");
+  EXPECT_EQ(capture.GetReports().size(), 2u);
+  view->CommitAll();
+  EXPECT_EQ(ListValue(view, "TDS_VIEW_TYPE_LIBS"), "LIBB 2.0 fast");
+}
+
+} // namespace

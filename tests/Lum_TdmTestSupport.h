@@ -1,0 +1,136 @@
+#pragma once
+
+// Shared fixtures of the library's tests: temporary directories, a typed
+// design with one view, in-memory type libraries, and save-and-reopen.
+
+#include "Lum_TdmBlock.h"
+#include "Lum_TdmDesign.h"
+#include "Lum_TdmDesignMgr.h"
+#include "Lum_TdmModel.h"
+#include "Lum_TdmNetwork.h"
+#include "Lum_TdmPin.h"
+#include "Lum_TdmSignal.h"
+#include "Lum_TdmView.h"
+
+#include "Lum_Tlm.h"
+#include "Port_MsgManData.h"
+
+#include <gtest/gtest.h>
+
+#include <cstdlib>
+#include <filesystem>
+#include <memory>
+#include <string>
+#include <vector>
+
+namespace lumtest {
+
+// A directory that exists for one test.
+class TempDir {
+public:
+  TempDir() {
+    std::string pattern = (std::filesystem::temp_directory_path() / "lum_tdm_XXXXXX").string();
+    char *made = ::mkdtemp(pattern.data());
+    EXPECT_NE(made, nullptr);
+    m_Path = pattern;
+  }
+  ~TempDir() {
+    std::error_code ignored;
+    std::filesystem::remove_all(m_Path, ignored);
+  }
+  TempDir(TempDir const &) = delete;
+  TempDir &operator=(TempDir const &) = delete;
+
+  std::string File(std::string const &name) const { return (m_Path / name).string(); }
+  std::string Path() const { return m_Path.string(); }
+
+private:
+  std::filesystem::path m_Path;
+};
+
+// An in-memory type library, registered with the catalog for its lifetime.
+class TestLibrary {
+public:
+  TestLibrary(char const *name, unsigned version, unsigned revision, char const *firstQualifier = "",
+              char const *secondQualifier = "")
+      : m_Model(name, name, "", false) {
+    m_pLibrary = m_Model.CreateLibrary(name, version, revision, firstQualifier, secondQualifier);
+    Lum_TlmCatalog::Register(m_pLibrary);
+  }
+  ~TestLibrary() { Lum_TlmCatalog::Unregister(m_pLibrary); }
+  TestLibrary(TestLibrary const &) = delete;
+  TestLibrary &operator=(TestLibrary const &) = delete;
+
+  Lum_TlmLibrary *Get() const { return m_pLibrary; }
+  // Adds a type block with input pins of the given names.
+  Lum_TlmBlock *AddTypeBlock(char const *name, std::vector<char const *> const &pins = {}) {
+    Lum_TlmBlock *block = m_pLibrary->CreateTypeBlock(name);
+    for (char const *pin : pins)
+      block->CreatePin(pin, Orb_Pin::PIN_INPUT);
+    return block;
+  }
+
+private:
+  Lum_TlmModel m_Model;
+  Lum_TlmLibrary *m_pLibrary = nullptr;
+};
+
+// A design manager "dm", a design "top" and a view "netlist" with a device
+// personality, in a model of its own.
+struct TypedDesign {
+  explicit TypedDesign(std::unique_ptr<Lum_TdmModel> model = nullptr)
+      : m_Model(model ? std::move(model)
+                      : std::make_unique<Lum_TdmModel>("test", "testdb", "")) {
+    m_pDesignMgr = m_Model->CreateDesignMgr("dm");
+    m_pDesign = m_pDesignMgr->CreateDesign("top");
+    m_pView = m_pDesign->CreateView("netlist");
+    m_pView->CreatePropertyString("TDS_DEVICE_PM", "pm1");
+    m_pView->CreatePropertyString("TDS_DEVICE_PART", "part1");
+  }
+
+  Lum_TdmModel &Model() { return *m_Model; }
+  Orb_Model *Host() { return m_Model->GetOrbModel(); }
+
+  std::unique_ptr<Lum_TdmModel> m_Model;
+  Lum_TdmDesignMgr *m_pDesignMgr = nullptr;
+  Lum_TdmDesign *m_pDesign = nullptr;
+  Lum_TdmView *m_pView = nullptr;
+};
+
+// Saves the model to `path` and opens it in a fresh model.
+inline std::unique_ptr<Lum_TdmModel> SaveAndReopen(Lum_TdmModel &model, std::string const &path) {
+  model.Save(path.c_str());
+  auto reopened = std::make_unique<Lum_TdmModel>("reopened", "reopened", path.c_str());
+  reopened->Open(path.c_str());
+  return reopened;
+}
+
+// The first view of the first design of the first design manager.
+inline Lum_TdmView *FirstView(Lum_TdmModel &model) {
+  Orb_Model *host = model.GetOrbModel();
+  if (host->GetDesignMgrs().empty())
+    return nullptr;
+  Orb_DesignMgr *dm = host->GetDesignMgrs().front();
+  if (dm->GetDesigns().empty() || dm->GetDesigns().front()->GetViews().empty())
+    return nullptr;
+  return static_cast<Lum_TdmView *>(model.GetClient(dm->GetDesigns().front()->GetViews().front()));
+}
+
+// The string value of a property, or "<absent>".
+inline std::string PropertyValue(Orb_ClientObject const *object, char const *name) {
+  Orb_Property const *property = object->GetPropertyByName(name);
+  return property ? property->GetStringValue() : "<absent>";
+}
+
+// The entries of a string-list property joined with "|", or "<absent>".
+inline std::string ListValue(Orb_ClientObject const *object, char const *name) {
+  Orb_Property const *property = object->GetPropertyByName(name);
+  if (!property)
+    return "<absent>";
+  std::string joined;
+  for (std::string const &entry : property->GetStrings())
+    joined += (joined.empty() ? "" : "|") + entry;
+  return joined;
+}
+
+} // namespace lumtest
