@@ -1,7 +1,8 @@
 // Builds a small typed design, saves its design database, reopens it in a
 // fresh client model and prints what it found.
 //
-// Usage: Lum_TdmExample [directory]   (default: a new temporary directory)
+// Usage: Lum_TdmExample [directory]
+// Without a directory it works in a temporary one and removes it at the end.
 
 #include "Lum_TdmBlock.h"
 #include "Lum_TdmDesign.h"
@@ -13,7 +14,6 @@
 #include "Lum_TdmView.h"
 
 #include "Lum_Tlm.h"
-#include "Port_Exception.h"
 
 #include <cstdio>
 #include <cstdlib>
@@ -125,18 +125,22 @@ void ReadDesign(std::string const &path) {
 } // namespace
 
 int main(int argc, char **argv) {
+  std::string directory;
+  bool temporary = false;
+  int status = 1;
   try {
-    std::string directory;
     if (argc > 1) {
       directory = argv[1];
       std::filesystem::create_directories(directory);
     } else {
-      std::string pattern = (std::filesystem::temp_directory_path() / "lum_example_XXXXXX").string();
+      std::string pattern =
+          (std::filesystem::temp_directory_path() / "lum_example_XXXXXX").string();
       if (!::mkdtemp(pattern.data())) {
         std::perror("mkdtemp");
         return 1;
       }
       directory = pattern;
+      temporary = true;
     }
     std::string const database = directory + "/counter.odb";
     WriteCellLibrary(directory);
@@ -144,11 +148,15 @@ int main(int argc, char **argv) {
     WriteDesign(database);
     std::printf("saved %s\n", database.c_str());
     ReadDesign(database);
-    return 0;
-  } catch (Port::Exception const &e) {
-    std::fprintf(stderr, "error: %s\n", e.what());
+    status = 0;
   } catch (std::exception const &e) {
+    // Port::Exception's what() names the object and the source of the error.
     std::fprintf(stderr, "error: %s\n", e.what());
   }
-  return 1;
+  // A directory the example made for itself goes with it.
+  if (temporary) {
+    std::error_code ignored;
+    std::filesystem::remove_all(directory, ignored);
+  }
+  return status;
 }

@@ -105,12 +105,13 @@ std::string FindLibraryFile(std::string const &name, std::string const &personal
     return {};
   std::string const fileName = name + kFileSuffix;
   for (std::string const &directory : SearchDirectories()) {
+    std::filesystem::path const base(directory);
     if (!personality.empty()) {
-      std::string const candidate = directory + "/" + personality + "/" + fileName;
+      std::string candidate = (base / personality / fileName).string();
       if (IsFile(candidate))
         return candidate;
     }
-    std::string const candidate = directory + "/" + fileName;
+    std::string candidate = (base / fileName).string();
     if (IsFile(candidate))
       return candidate;
   }

@@ -32,22 +32,62 @@ Orb_ClientObject *Orb_Context::Specialize(Orb_Persistent *object) {
   return GetClient(object);
 }
 
-#define ORB_TYPED_BRIDGE(HostType, ClientType)                                                     \
-  ClientType *Orb_Context::GetClient(HostType const *object) const {                               \
-    return static_cast<ClientType *>(GetClient(static_cast<Orb_Persistent const *>(object)));      \
-  }                                                                                                \
-  ClientType *Orb_Context::Specialize(HostType *object) {                                          \
-    return static_cast<ClientType *>(Specialize(static_cast<Orb_Persistent *>(object)));           \
-  }
+Orb_DesignMgrDerived *Orb_Context::GetClient(Orb_DesignMgr const *object) const {
+  return static_cast<Orb_DesignMgrDerived *>(
+      GetClient(static_cast<Orb_Persistent const *>(object)));
+}
 
-ORB_TYPED_BRIDGE(Orb_DesignMgr, Orb_DesignMgrDerived)
-ORB_TYPED_BRIDGE(Orb_Design, Orb_DesignDerived)
-ORB_TYPED_BRIDGE(Orb_View, Orb_ViewDerived)
-ORB_TYPED_BRIDGE(Orb_Block, Orb_BlockDerived)
-ORB_TYPED_BRIDGE(Orb_Pin, Orb_PinDerived)
-ORB_TYPED_BRIDGE(Orb_Signal, Orb_SignalDerived)
-ORB_TYPED_BRIDGE(Orb_Network, Orb_NetworkDerived)
-#undef ORB_TYPED_BRIDGE
+Orb_DesignMgrDerived *Orb_Context::Specialize(Orb_DesignMgr *object) {
+  return static_cast<Orb_DesignMgrDerived *>(Specialize(static_cast<Orb_Persistent *>(object)));
+}
+
+Orb_DesignDerived *Orb_Context::GetClient(Orb_Design const *object) const {
+  return static_cast<Orb_DesignDerived *>(GetClient(static_cast<Orb_Persistent const *>(object)));
+}
+
+Orb_DesignDerived *Orb_Context::Specialize(Orb_Design *object) {
+  return static_cast<Orb_DesignDerived *>(Specialize(static_cast<Orb_Persistent *>(object)));
+}
+
+Orb_ViewDerived *Orb_Context::GetClient(Orb_View const *object) const {
+  return static_cast<Orb_ViewDerived *>(GetClient(static_cast<Orb_Persistent const *>(object)));
+}
+
+Orb_ViewDerived *Orb_Context::Specialize(Orb_View *object) {
+  return static_cast<Orb_ViewDerived *>(Specialize(static_cast<Orb_Persistent *>(object)));
+}
+
+Orb_BlockDerived *Orb_Context::GetClient(Orb_Block const *object) const {
+  return static_cast<Orb_BlockDerived *>(GetClient(static_cast<Orb_Persistent const *>(object)));
+}
+
+Orb_BlockDerived *Orb_Context::Specialize(Orb_Block *object) {
+  return static_cast<Orb_BlockDerived *>(Specialize(static_cast<Orb_Persistent *>(object)));
+}
+
+Orb_PinDerived *Orb_Context::GetClient(Orb_Pin const *object) const {
+  return static_cast<Orb_PinDerived *>(GetClient(static_cast<Orb_Persistent const *>(object)));
+}
+
+Orb_PinDerived *Orb_Context::Specialize(Orb_Pin *object) {
+  return static_cast<Orb_PinDerived *>(Specialize(static_cast<Orb_Persistent *>(object)));
+}
+
+Orb_SignalDerived *Orb_Context::GetClient(Orb_Signal const *object) const {
+  return static_cast<Orb_SignalDerived *>(GetClient(static_cast<Orb_Persistent const *>(object)));
+}
+
+Orb_SignalDerived *Orb_Context::Specialize(Orb_Signal *object) {
+  return static_cast<Orb_SignalDerived *>(Specialize(static_cast<Orb_Persistent *>(object)));
+}
+
+Orb_NetworkDerived *Orb_Context::GetClient(Orb_Network const *object) const {
+  return static_cast<Orb_NetworkDerived *>(GetClient(static_cast<Orb_Persistent const *>(object)));
+}
+
+Orb_NetworkDerived *Orb_Context::Specialize(Orb_Network *object) {
+  return static_cast<Orb_NetworkDerived *>(Specialize(static_cast<Orb_Persistent *>(object)));
+}
 
 std::size_t Orb_Context::GetClientCount() const {
   std::size_t count = 0;
@@ -173,23 +213,8 @@ Orb_ModelDerived *Orb_ClientObject::GetClientOrbModel() const {
 
 void Orb_ClientObject::DbgHost() const {
   Orb_Debug::Printf("%s <%s>\n", Orb_KindName(m_pOrbObject->GetKind()), m_pOrbObject->GetName());
-  for (auto const &property : m_pOrbObject->GetProperties()) {
-    switch (property->GetKind()) {
-    case Orb_Property::STRING:
-      Orb_Debug::Printf("  %s = <%s>\n", property->GetName(), property->GetStringValue());
-      break;
-    case Orb_Property::STRING_LIST:
-      Orb_Debug::Printf("  %s (string list):\n", property->GetName());
-      for (auto const &value : property->GetStrings())
-        Orb_Debug::Printf("    <%s>\n", value.c_str());
-      break;
-    case Orb_Property::LIST:
-      Orb_Debug::Printf("  %s (list):\n", property->GetName());
-      for (auto const &member : property->GetMembers())
-        Orb_Debug::Printf("    %s = <%s>\n", member->GetName(), member->GetStringValue());
-      break;
-    }
-  }
+  // A null stream follows the printer's own output.
+  m_pOrbObject->DumpProperties(nullptr, 1);
 }
 
 Orb_BlockDerived *Orb_PinDerived::GetParent() const {

@@ -39,7 +39,9 @@ public:
   Orb_Property *CreatePropertyStringList(char const *name) {
     return m_pOrbObject->CreatePropertyStringList(name);
   }
-  Orb_Property *CreatePropertyList(char const *name) { return m_pOrbObject->CreatePropertyList(name); }
+  Orb_Property *CreatePropertyList(char const *name) {
+    return m_pOrbObject->CreatePropertyList(name);
+  }
   void DeleteProperty(char const *name) { m_pOrbObject->DeleteProperty(name); }
   void DeleteProperty(Orb_Property *property) { m_pOrbObject->DeleteProperty(property); }
 

@@ -9,6 +9,7 @@
 
 #include <algorithm>
 #include <cassert>
+#include <new>
 #include <string>
 
 namespace {
@@ -18,7 +19,8 @@ char const *const kSource = "host/Orb_Model";
 void ThrowDuplicate(Orb_Persistent const *parent, char const *kind, char const *name) {
   std::string message = std::string("A ") + kind + " of this name already exists";
   if (parent)
-    message += std::string(" in ") + Orb_KindName(parent->GetKind()) + " <" + parent->GetName() + ">";
+    message +=
+        std::string(" in ") + Orb_KindName(parent->GetKind()) + " <" + parent->GetName() + ">";
   message += ".";
   throw Orb_Exception(kSource, __LINE__, name, message.c_str());
 }
@@ -83,13 +85,18 @@ void Orb_Pin::Connect(Orb_Signal *signal) {
   if (signal && signal->GetParent()->GetView() != GetParent()->GetView())
     throw Orb_Exception(kSource, __LINE__, GetName(),
                         "A pin can only connect to a signal of its own view.");
-  if (m_pSignal) {
-    auto &pins = m_pSignal->m_Pins;
-    pins.erase(std::find(pins.begin(), pins.end(), this));
-  }
+  Disconnect();
   m_pSignal = signal;
   if (signal)
     signal->m_Pins.push_back(this);
+}
+
+void Orb_Pin::Disconnect() noexcept {
+  if (!m_pSignal)
+    return;
+  auto &pins = m_pSignal->m_Pins;
+  pins.erase(std::find(pins.begin(), pins.end(), this));
+  m_pSignal = nullptr;
 }
 
 Orb_Signal::Orb_Signal(Orb_Model *model, Orb_Block *parent, std::string name)
@@ -263,7 +270,8 @@ Orb_Model::~Orb_Model() {
   // before this model's objects.
   m_Companions.clear();
   m_LoadedCompanions.clear();
-  for (Orb_DesignMgr *designMgr : std::vector<Orb_DesignMgr *>(m_DesignMgrs.Items()))
+  // Free leaves the containers alone, so the list can be walked as it is.
+  for (Orb_DesignMgr *designMgr : m_DesignMgrs.Items())
     Free(designMgr, false);
 }
 
@@ -328,10 +336,14 @@ unsigned Orb_Model::AllocateBridgeId(Orb_Kind kind) {
   return m_NextBridgeId[k]++;
 }
 
-void Orb_Model::ReleaseBridgeId(Orb_Kind kind, unsigned id) {
+void Orb_Model::ReleaseBridgeId(Orb_Kind kind, unsigned id) noexcept {
   auto const k = static_cast<unsigned>(kind);
   --m_ObjectCount[k];
-  m_FreeBridgeIds[k].push_back(id);
+  // Runs in destructors. Without memory the id is just never reused.
+  try {
+    m_FreeBridgeIds[k].push_back(id);
+  } catch (std::bad_alloc const &) {
+  }
 }
 
 template <class T> T *Orb_Model::Announce(T *object) {
@@ -501,7 +513,7 @@ void Orb_Model::Free(Orb_Persistent *object, bool keepLinks) {
   }
   case Orb_Kind::Pin:
     if (keepLinks)
-      static_cast<Orb_Pin *>(object)->Connect(nullptr);
+      static_cast<Orb_Pin *>(object)->Disconnect();
     break;
   case Orb_Kind::Signal: {
     auto *signal = static_cast<Orb_Signal *>(object);
@@ -530,25 +542,7 @@ void Orb_Model::Free(Orb_Persistent *object, bool keepLinks) {
 
 void Orb_Persistent::DebugDump(Port::Stream *stream, int indent) const {
   Orb_Debug::Printf(stream, indent, "%s <%s>\n", Orb_KindName(m_Kind), m_Name.c_str());
-  for (auto const &property : GetProperties()) {
-    switch (property->GetKind()) {
-    case Orb_Property::STRING:
-      Orb_Debug::Printf(stream, indent + 1, "%s = <%s>\n", property->GetName(),
-                        property->GetStringValue());
-      break;
-    case Orb_Property::STRING_LIST:
-      Orb_Debug::Printf(stream, indent + 1, "%s (string list):\n", property->GetName());
-      for (auto const &value : property->GetStrings())
-        Orb_Debug::Printf(stream, indent + 2, "<%s>\n", value.c_str());
-      break;
-    case Orb_Property::LIST:
-      Orb_Debug::Printf(stream, indent + 1, "%s (list):\n", property->GetName());
-      for (auto const &member : property->GetMembers())
-        Orb_Debug::Printf(stream, indent + 2, "%s = <%s>\n", member->GetName(),
-                          member->GetStringValue());
-      break;
-    }
-  }
+  DumpProperties(stream, indent + 1);
   for (Orb_ModelDerived *context : m_pModel->GetContexts())
     if (Orb_ClientObject *client = context->GetClient(this))
       client->DebugDumpCallback(stream, indent + 1);

@@ -109,6 +109,7 @@ private:
   friend class Orb_ModelIO;
   friend class Orb_Block;
   Orb_Pin(Orb_Model *model, Orb_Block *parent, std::string name, PIN_DIRECTION direction);
+  void Disconnect() noexcept;
   PIN_DIRECTION m_Direction;
   Orb_Signal *m_pSignal = nullptr;
 };
@@ -323,7 +324,7 @@ private:
   friend class Orb_ModelIO;
 
   unsigned AllocateBridgeId(Orb_Kind kind);
-  void ReleaseBridgeId(Orb_Kind kind, unsigned id);
+  void ReleaseBridgeId(Orb_Kind kind, unsigned id) noexcept;
 
   // Fires OnCreate for a new object; on a throw deletes it and rethrows.
   template <class T> T *Announce(T *object);

@@ -1,5 +1,7 @@
 #include "Orb_Property.h"
 
+#include "Orb_Debug.h"
+
 #include <algorithm>
 #include <string_view>
 
@@ -83,6 +85,28 @@ void Orb_PropertyHolder::CopyPropertiesFrom(Orb_PropertyHolder const &other) {
       copy = CreatePropertyList(source->GetName());
       for (auto const &member : source->GetMembers())
         copy->CreatePropertyString(member->GetName(), member->GetStringValue());
+      break;
+    }
+  }
+}
+
+void Orb_PropertyHolder::DumpProperties(Port::Stream *stream, int indent) const {
+  for (auto const &property : m_Properties) {
+    switch (property->GetKind()) {
+    case Orb_Property::STRING:
+      Orb_Debug::Printf(stream, indent, "%s = <%s>\n", property->GetName(),
+                        property->GetStringValue());
+      break;
+    case Orb_Property::STRING_LIST:
+      Orb_Debug::Printf(stream, indent, "%s (string list):\n", property->GetName());
+      for (auto const &value : property->GetStrings())
+        Orb_Debug::Printf(stream, indent + 1, "<%s>\n", value.c_str());
+      break;
+    case Orb_Property::LIST:
+      Orb_Debug::Printf(stream, indent, "%s (list):\n", property->GetName());
+      for (auto const &member : property->GetMembers())
+        Orb_Debug::Printf(stream, indent + 1, "%s = <%s>\n", member->GetName(),
+                          member->GetStringValue());
       break;
     }
   }

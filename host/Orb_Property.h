@@ -6,6 +6,10 @@
 #include <string>
 #include <vector>
 
+namespace Port {
+class Stream;
+}
+
 // A named property of a host object: a string, a list of strings, or a list
 // of named string members. Values are arbitrary bytes without NUL.
 class LUM_PLATFORM_API Orb_Property {
@@ -64,6 +68,10 @@ public:
   void DeleteProperty(Orb_Property *property);
 
   std::vector<std::unique_ptr<Orb_Property>> const &GetProperties() const { return m_Properties; }
+
+  // Prints every property through the debug printer, one per line (list
+  // entries and members indented one level deeper).
+  void DumpProperties(Port::Stream *stream, int indent) const;
 
   // Copies every property of `other` onto this holder, replacing those of the
   // same names.

@@ -12,6 +12,8 @@ public:
   Orb_SortFtor(Orb_SortFtor const &other)
       : m_pDelegate(other.m_pDelegate == &other ? this : other.m_pDelegate) {}
   Orb_SortFtor &operator=(Orb_SortFtor const &other) {
+    if (this == &other)
+      return *this;
     m_pDelegate = other.m_pDelegate == &other ? this : other.m_pDelegate;
     return *this;
   }

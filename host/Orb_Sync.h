@@ -26,8 +26,12 @@ public:
   virtual void SyncEventSpecializeModel(Orb_Model * /*m*/) {}
   virtual void SyncEventDeleteModel(Orb_Model * /*m*/) {}
 
-  virtual void SyncEventSpecializeDesignMgrOnCreate(Orb_DesignMgr *o) { SyncEventSpecializeDesignMgr(o); }
-  virtual void SyncEventSpecializeDesignMgrOnLoad(Orb_DesignMgr *o) { SyncEventSpecializeDesignMgr(o); }
+  virtual void SyncEventSpecializeDesignMgrOnCreate(Orb_DesignMgr *o) {
+    SyncEventSpecializeDesignMgr(o);
+  }
+  virtual void SyncEventSpecializeDesignMgrOnLoad(Orb_DesignMgr *o) {
+    SyncEventSpecializeDesignMgr(o);
+  }
   virtual void SyncEventSpecializeDesignMgr(Orb_DesignMgr * /*o*/) {}
   virtual void SyncEventDeleteDesignMgr(Orb_DesignMgr * /*o*/) {}
 

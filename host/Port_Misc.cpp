@@ -15,15 +15,13 @@ namespace Port {
 
 Stream::~Stream() = default;
 
-void FileStream::Write(char const *data, std::size_t size) {
-  std::fwrite(data, 1, size, m_pFile);
-}
+void FileStream::Write(char const *data, std::size_t size) { std::fwrite(data, 1, size, m_pFile); }
 
 Exception::Exception(char const *subsystem, char const *file, char const *revision, int line,
                      char const *objectName, char const *message, bool flag)
     : m_Subsystem(subsystem ? subsystem : ""), m_File(file ? file : ""),
-      m_Revision(revision ? revision : ""), m_Line(line), m_ObjectName(objectName ? objectName : ""),
-      m_Message(message ? message : ""), m_Flag(flag) {
+      m_Revision(revision ? revision : ""), m_Line(line),
+      m_ObjectName(objectName ? objectName : ""), m_Message(message ? message : ""), m_Flag(flag) {
   m_What = m_Subsystem + " error at " + m_File + ":" + std::to_string(m_Line);
   if (!m_Revision.empty())
     m_What += " (" + m_Revision + ")";

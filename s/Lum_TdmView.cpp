@@ -97,7 +97,8 @@ void Lum_TdmView::CheckTdmVersion() {
   m_Revision = static_cast<std::uint32_t>(revision);
 
   bool const tooOld = m_Version == 0 && m_Revision <= 2;
-  bool const tooNew = m_Version > kTdmVersion || (m_Version == kTdmVersion && m_Revision > kTdmRevision);
+  bool const tooNew =
+      m_Version > kTdmVersion || (m_Version == kTdmVersion && m_Revision > kTdmRevision);
   if (tooOld) {
     Port_MsgManData::createObject("Lum", kSourcePath, __LINE__, kRevision)
         .issueError("Tdm version is %d and the revision is %d. This is an old design that is no "

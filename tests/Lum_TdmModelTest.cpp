@@ -89,11 +89,12 @@ TEST_F(TdmModelTest, LoadEventsBuildTheClientClasses) {
   Orb_View *hostView = view->GetOrbView();
   EXPECT_NE(dynamic_cast<Lum_TdmNetwork *>(reopened->GetClient(hostView->GetNetworks().front())),
             nullptr);
-  EXPECT_NE(dynamic_cast<Lum_TdmPin *>(reopened->GetClient(hostView->GetBlock()->GetPins().front())),
-            nullptr);
   EXPECT_NE(
-      dynamic_cast<Lum_TdmSignal *>(reopened->GetClient(hostView->GetBlock()->GetSignals().front())),
+      dynamic_cast<Lum_TdmPin *>(reopened->GetClient(hostView->GetBlock()->GetPins().front())),
       nullptr);
+  EXPECT_NE(dynamic_cast<Lum_TdmSignal *>(
+                reopened->GetClient(hostView->GetBlock()->GetSignals().front())),
+            nullptr);
 }
 
 // Deleting a host block destroys its client once, and its children's; a

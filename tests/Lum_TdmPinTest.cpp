@@ -111,10 +111,9 @@ TEST_F(TdmPinTest, CommitSpecializesEveryObject) {
   m_pTop->CreateSignal("s");
   m_Design.m_pView->CreateNetwork("n");
   Orb_Model *host = m_Design.Host();
-  for (Orb_Persistent *object :
-       std::vector<Orb_Persistent *>{child->GetOrbBlock()->GetPins().front(),
-                                     m_pTop->GetOrbBlock()->GetSignals().front(),
-                                     child->GetOrbBlock()})
+  for (Orb_Persistent *object : std::vector<Orb_Persistent *>{
+           child->GetOrbBlock()->GetPins().front(), m_pTop->GetOrbBlock()->GetSignals().front(),
+           child->GetOrbBlock()})
     delete m_Design.Model().GetClient(object);
 
   m_Design.m_pView->CommitAll();

@@ -51,8 +51,8 @@ private:
 // An in-memory type library, registered with the catalog for its lifetime.
 class TestLibrary {
 public:
-  TestLibrary(char const *name, unsigned version, unsigned revision, char const *firstQualifier = "",
-              char const *secondQualifier = "")
+  TestLibrary(char const *name, unsigned version, unsigned revision,
+              char const *firstQualifier = "", char const *secondQualifier = "")
       : m_Model(name, name, "", false) {
     m_pLibrary = m_Model.CreateLibrary(name, version, revision, firstQualifier, secondQualifier);
     Lum_TlmCatalog::Register(m_pLibrary);
@@ -79,8 +79,7 @@ private:
 // personality, in a model of its own.
 struct TypedDesign {
   explicit TypedDesign(std::unique_ptr<Lum_TdmModel> model = nullptr)
-      : m_Model(model ? std::move(model)
-                      : std::make_unique<Lum_TdmModel>("test", "testdb", "")) {
+      : m_Model(model ? std::move(model) : std::make_unique<Lum_TdmModel>("test", "testdb", "")) {
     m_pDesignMgr = m_Model->CreateDesignMgr("dm");
     m_pDesign = m_pDesignMgr->CreateDesign("top");
     m_pView = m_pDesign->CreateView("netlist");

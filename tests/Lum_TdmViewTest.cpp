@@ -7,6 +7,7 @@
 
 #include <gtest/gtest.h>
 
+#include <cctype>
 #include <functional>
 
 using namespace lumtest;
@@ -30,7 +31,9 @@ protected:
 class HookedModel : public Lum_TdmModel {
 public:
   using Lum_TdmModel::Lum_TdmModel;
-  void SyncEventSpecializeViewOnCreate(Orb_View *view) override { new HookedView(this, view, true); }
+  void SyncEventSpecializeViewOnCreate(Orb_View *view) override {
+    new HookedView(this, view, true);
+  }
   void SyncEventSpecializeViewOnLoad(Orb_View *view) override { new HookedView(this, view, false); }
 };
 
@@ -178,20 +181,23 @@ TEST_P(TdmViewStampTableTest, LoadClassifiesTheStamp) {
 
 INSTANTIATE_TEST_SUITE_P(
     Stamps, TdmViewStampTableTest,
-    ::testing::Values(StampCase{nullptr, StampCase::ACCEPTED, 0, 0},
-                      StampCase{"0.0", StampCase::TOO_OLD, 0, 0},
-                      StampCase{"0.2", StampCase::TOO_OLD, 0, 2},
-                      StampCase{"0.3", StampCase::ACCEPTED, 0, 3},
-                      StampCase{"1.7", StampCase::ACCEPTED, 1, 7},
-                      StampCase{"2.9", StampCase::ACCEPTED, 2, 9},
-                      StampCase{"3", StampCase::ACCEPTED, 3, 0},
-                      StampCase{"3.0", StampCase::ACCEPTED, 3, 0},
-                      StampCase{"3.1", StampCase::ACCEPTED, 3, 1},
-                      StampCase{"3.2", StampCase::TOO_NEW, 3, 2},
-                      StampCase{"4.0", StampCase::TOO_NEW, 4, 0},
-                      StampCase{"-1.0", StampCase::TOO_NEW, 0xFFFFFFFFu, 0},
-                      StampCase{"", StampCase::TOO_OLD, 0, 0},
-                      StampCase{"abc", StampCase::TOO_OLD, 0, 0}));
+    ::testing::Values(
+        StampCase{nullptr, StampCase::ACCEPTED, 0, 0}, StampCase{"0.0", StampCase::TOO_OLD, 0, 0},
+        StampCase{"0.2", StampCase::TOO_OLD, 0, 2}, StampCase{"0.3", StampCase::ACCEPTED, 0, 3},
+        StampCase{"1.7", StampCase::ACCEPTED, 1, 7}, StampCase{"2.9", StampCase::ACCEPTED, 2, 9},
+        StampCase{"3", StampCase::ACCEPTED, 3, 0}, StampCase{"3.0", StampCase::ACCEPTED, 3, 0},
+        StampCase{"3.1", StampCase::ACCEPTED, 3, 1}, StampCase{"3.2", StampCase::TOO_NEW, 3, 2},
+        StampCase{"4.0", StampCase::TOO_NEW, 4, 0},
+        StampCase{"-1.0", StampCase::TOO_NEW, 0xFFFFFFFFu, 0},
+        StampCase{"", StampCase::TOO_OLD, 0, 0}, StampCase{"abc", StampCase::TOO_OLD, 0, 0}),
+    [](::testing::TestParamInfo<StampCase> const &caseInfo) {
+      if (!caseInfo.param.stamp)
+        return std::string("absent");
+      std::string name = *caseInfo.param.stamp ? "stamp_" : "empty";
+      for (char const *c = caseInfo.param.stamp; *c; ++c)
+        name += std::isalnum(static_cast<unsigned char>(*c)) ? *c : '_';
+      return name;
+    });
 
 // ---------------------------------------------------------------------------
 // Library list
@@ -295,8 +301,8 @@ TEST_F(TdmViewLibraryTest, LocalLibraryIsObtainedOnce) {
   view->GetLibraries(libraries);
   EXPECT_EQ(Names(libraries), std::string("LIBA,") + local);
   EXPECT_EQ(view->GetLocalLibrary(), libraries.back());
-  EXPECT_EQ(libraries.back(),
-            Lum_TlmLibrary::GetLocalLibrary(view->GetOrbView()->GetModel(), PM_PIC("", "", nullptr)));
+  EXPECT_EQ(libraries.back(), Lum_TlmLibrary::GetLocalLibrary(view->GetOrbView()->GetModel(),
+                                                              PM_PIC("", "", nullptr)));
   EXPECT_EQ(Registrations(local), 0u);
   view->CommitAll();
   EXPECT_EQ(ListValue(view, "TDS_VIEW_TYPE_LIBS"), std::string("LIBA 1.2|") + local + " 1.0");
