@@ -3,8 +3,6 @@
 
 #include "Lum_TdmTestSupport.h"
 
-#include "Lum_Exception.h"
-
 #include <gtest/gtest.h>
 
 using namespace lumtest;
@@ -117,23 +115,6 @@ TEST_F(TdmModelTest, DeleteEventsDestroyClientsOnce) {
   Orb_Network *network = view->CreateNetwork("n"); // no client on create
   view->DeleteNetwork(network);
   EXPECT_EQ(model.GetClientCount(), before);
-}
-
-// A client constructor that throws during a load leaves no client and no
-// host object of the database behind.
-TEST_F(TdmModelTest, ThrowingConstructorLeavesNothing) {
-  TypedDesign design;
-  design.m_pView->CreateTopBlock("top")->CreatePin("p", Orb_Pin::PIN_INPUT);
-  design.m_pView->CreatePropertyString("TDS_TDM_VERSION", "9.0");
-  std::string const path = m_Dir.File("d.odb");
-  design.Model().Save(path.c_str());
-
-  Lum_TdmModel reopened("r", "r", "");
-  Port_MsgCapture capture;
-  EXPECT_THROW(reopened.Open(path.c_str()), Lum_ExceptionCorruptDatabase);
-  EXPECT_EQ(reopened.GetClientCount(), 0u);
-  EXPECT_TRUE(reopened.GetOrbModel()->GetDesignMgrs().empty());
-  EXPECT_EQ(reopened.GetOrbModel()->GetObjectCount(Orb_Kind::Pin), 0u);
 }
 
 // Both constructors subscribe; a model over a caller's host model gets that

@@ -1,41 +1,35 @@
 #pragma once
 
 // Shared helpers of the host's own tests: a client model that records every
-// event it receives and every client it destroys, in order.
+// event it receives and every client it destroys, and a dump of host objects.
 
 #include "Orb_Debug.h"
 #include "Orb_Templates.h"
 
 #include <cstddef>
-#include <functional>
+#include <memory>
+#include <stdexcept>
 #include <string>
 #include <vector>
 
 namespace HostTest {
 
-// What happened, in order. It outlives the model and its clients, because
-// the host base destroys the remaining clients after the derived model is
-// gone and they still write here.
-struct EventLog {
-  std::vector<std::string> lines;
+// What happened, in order. It outlives the model and its clients: the host
+// base destroys the remaining clients after the derived model is gone.
+using EventLog = std::vector<std::string>;
 
-  void Add(std::string line) { lines.push_back(std::move(line)); }
-  void Clear() { lines.clear(); }
-  // All lines joined by "; ", for comparing a whole sequence at once.
-  std::string Joined() const {
-    std::string text;
-    for (std::string const &line : lines)
-      text += (text.empty() ? "" : "; ") + line;
-    return text;
-  }
-};
+// The items joined by `separator`, for comparing a whole sequence at once.
+inline std::string Joined(std::vector<std::string> const &items, char const *separator = "; ") {
+  std::string text;
+  for (std::string const &item : items)
+    text += (text.empty() ? "" : separator) + item;
+  return text;
+}
 
-// "kind name", as every log line names its object.
 inline std::string Describe(Orb_Persistent const *object) {
   return std::string(Orb_KindName(object->GetKind())) + " " + object->GetName();
 }
 
-struct RecTraits;
 class RecModel;
 template <class Base, class Host> class RecClient;
 
@@ -50,38 +44,34 @@ struct RecTraits {
   using Network = RecClient<Orb_NetworkT<RecTraits>, Orb_Network>;
 };
 
-using RecDesignMgr = RecTraits::DesignMgr;
-using RecDesign = RecTraits::Design;
-using RecView = RecTraits::View;
-using RecBlock = RecTraits::Block;
-using RecPin = RecTraits::Pin;
-using RecSignal = RecTraits::Signal;
-using RecNetwork = RecTraits::Network;
-
-// Records its specialization and delete events as "create|load|delete kind
-// name" and makes a RecClient in each specialization event. Subscribes to
-// all events unless told not to.
+// Logs "create|load|delete kind name" (with " +properties" when the object
+// already has some) and "load model name", and makes a RecClient in each
+// specialization event. Subscribes to all events unless told not to.
 class RecModel : public Orb_ModelT<RecTraits> {
 public:
-  explicit RecModel(EventLog *log, bool subscribe = true)
-      : Orb_ModelT<RecTraits>("rec", "recdb", "", false), m_pLog(log) {
+  explicit RecModel(EventLog *eventLog)
+      : Orb_ModelT<RecTraits>("rec", "recdb", "", false), log(eventLog) {
+    SetEventNotifyAll();
+  }
+  RecModel(EventLog *eventLog, Orb_Model *model, bool subscribe = true)
+      : Orb_ModelT<RecTraits>(model), log(eventLog) {
     if (subscribe)
       SetEventNotifyAll();
   }
-  RecModel(EventLog *log, Orb_Model *model, bool subscribe = true)
-      : Orb_ModelT<RecTraits>(model), m_pLog(log) {
-    if (subscribe)
-      SetEventNotifyAll();
+
+  EventLog *log;
+  // The client of an object of this name, or the load event of a model of
+  // this name, throws.
+  std::string refuse;
+  void ThrowIfRefused(std::string const &name) const {
+    if (name == refuse)
+      throw std::runtime_error("refused " + name);
   }
 
-  EventLog *GetLog() const { return m_pLog; }
-
-  // Runs in every specialization event before the client is made.
-  std::function<void(Orb_Persistent *, bool create)> onSpecialize;
-  // Runs inside every client's constructor, after the host base registered
-  // it; may throw to test a failing constructor.
-  std::function<void(Orb_Persistent *)> inClientConstructor;
-
+  void SyncEventSpecializeModelOnLoad(Orb_Model *model) override {
+    log->push_back(std::string("load model ") + model->GetName());
+    ThrowIfRefused(model->GetName());
+  }
 #define HOSTTEST_EVENTS(Kind)                                                                      \
   void SyncEventSpecialize##Kind##OnCreate(Orb_##Kind *o) override {                               \
     Make<RecTraits::Kind>(o, true);                                                                \
@@ -90,7 +80,7 @@ public:
     Make<RecTraits::Kind>(o, false);                                                               \
   }                                                                                                \
   void SyncEventDelete##Kind(Orb_##Kind *o) override {                                             \
-    m_pLog->Add("delete " + Describe(o));                                                          \
+    log->push_back("delete " + Describe(o));                                                       \
     delete GetClient(o);                                                                           \
   }
   HOSTTEST_EVENTS(DesignMgr)
@@ -103,78 +93,130 @@ public:
 #undef HOSTTEST_EVENTS
 
 private:
+  // A template, so that the client classes are complete when it is made.
   template <class Client, class Host> void Make(Host *object, bool create) {
-    m_pLog->Add((create ? "create " : "load ") + Describe(object));
-    if (onSpecialize)
-      onSpecialize(object, create);
+    log->push_back((create ? "create " : "load ") + Describe(object) +
+                   (object->GetProperties().empty() ? "" : " +properties"));
     new Client(this, object, create);
   }
-
-  EventLog *m_pLog;
 };
 
-// A client of any kind. It remembers how it was made and how many properties
-// its host object had at that moment, and logs "~kind name" when destroyed;
-// reading the name there proves the host object still exists.
+// A client of any kind. It logs "~kind name" when destroyed; reading the
+// name there proves the host object still exists.
 template <class Base, class Host> class RecClient : public Base {
 public:
   RecClient(RecModel *model, Host *object, bool create)
-      : Base(model, object), m_pLog(model->GetLog()), m_Created(create),
-        m_PropertiesAtBirth(object->GetProperties().size()) {
-    if (model->inClientConstructor)
-      model->inClientConstructor(object);
+      : Base(model, object), m_pLog(model->log), m_Created(create) {
+    // Thrown after the host base registered the client, which must undo that.
+    model->ThrowIfRefused(object->GetNameString());
   }
-  ~RecClient() override { m_pLog->Add("~" + Describe(this->GetOrbObject())); }
+  ~RecClient() override { m_pLog->push_back("~" + Describe(this->GetOrbObject())); }
 
   void DebugDumpCallback(Port::Stream *stream, int indent) const override {
     Orb_Debug::Printf(stream, indent, "rec client (%s)\n", m_Created ? "created" : "loaded");
   }
 
-  bool WasCreated() const { return m_Created; }
-  std::size_t GetPropertiesAtBirth() const { return m_PropertiesAtBirth; }
-
 private:
   EventLog *m_pLog;
   bool m_Created;
-  std::size_t m_PropertiesAtBirth;
 };
 
-// Names of objects in order, blank-separated: one line shows a whole order.
+// Holds a model to save with its owner's; sets *freed when the owner destroys it.
+struct TestCompanion : Orb_ModelCompanion {
+  explicit TestCompanion(std::unique_ptr<Orb_Model> held, bool *flag = nullptr)
+      : model(std::move(held)), freed(flag) {}
+  ~TestCompanion() override {
+    if (freed)
+      *freed = true;
+  }
+  Orb_Model const *GetModelToSave() const override { return model.get(); }
+  std::unique_ptr<Orb_Model> model;
+  bool *freed;
+};
+
+// Host objects of every kind in the model, reachable or not.
+inline std::size_t ObjectCount(Orb_Model const &model) {
+  std::size_t count = 0;
+  for (unsigned k = 0; k < Orb_KindCount; ++k)
+    count += model.GetObjectCount(static_cast<Orb_Kind>(k));
+  return count;
+}
+
+// Names of objects in order, blank-separated.
 template <class T> std::string Names(std::vector<T *> const &objects) {
   std::string text;
   for (T const *object : objects)
-    text += (text.empty() ? "" : " ") + std::string(object->GetName());
+    text += (text.empty() ? "" : " ") + object->GetNameString();
   return text;
 }
 
-// A property holder's contents as "name=value" items: string lists as
-// name[a,b], lists as name{m:v,m:v}.
+// Properties as "name=value", string lists as name[a,b], lists as
+// name{m:v,m:v}.
 inline std::string PropertiesOf(Orb_PropertyHolder const &holder) {
-  std::string text;
+  std::vector<std::string> properties;
   for (auto const &property : holder.GetProperties()) {
-    text += (text.empty() ? "" : " ") + std::string(property->GetName());
-    switch (property->GetKind()) {
-    case Orb_Property::STRING:
-      text += "=" + property->GetValue();
-      break;
-    case Orb_Property::STRING_LIST: {
-      std::string items;
-      for (std::string const &value : property->GetStrings())
-        items += (items.empty() ? "" : ",") + value;
-      text += "[" + items + "]";
-      break;
-    }
-    case Orb_Property::LIST: {
-      std::string items;
-      for (auto const &member : property->GetMembers())
-        items +=
-            (items.empty() ? "" : ",") + std::string(member->GetName()) + ":" + member->GetValue();
-      text += "{" + items + "}";
-      break;
-    }
-    }
+    std::vector<std::string> items = property->GetStrings();
+    for (auto const &member : property->GetMembers())
+      items.push_back(std::string(member->GetName()) + ":" + member->GetValue());
+    // By kind: STRING, STRING_LIST, LIST.
+    char const *const opening[] = {"=", "[", "{"}, *const closing[] = {"", "]", "}"};
+    properties.push_back(std::string(property->GetName()) + opening[property->GetKind()] +
+                         property->GetValue() + Joined(items, ",") + closing[property->GetKind()]);
   }
-  return text;
+  return Joined(properties, " ");
+}
+
+// Path of a pin, signal or block through its blocks, as "top/u1/i".
+inline std::string PathIn(Orb_Persistent const *object) {
+  Orb_Persistent const *parent = object->GetParentObject();
+  return parent && parent->GetKind() == Orb_Kind::Block ? PathIn(parent) + "/" + object->GetName()
+                                                        : object->GetName();
+}
+
+// An object and everything below it, one line per object with its
+// properties, direction and connections, children indented.
+inline std::string Dump(Orb_Persistent const *object, std::size_t depth = 0) {
+  std::string out = std::string(depth, ' ') + Describe(object);
+  std::string const properties = PropertiesOf(*object);
+  out += properties.empty() ? "" : " <" + properties + ">";
+  std::vector<Orb_Persistent const *> children;
+  auto add = [&children](auto const &items) {
+    children.insert(children.end(), items.begin(), items.end());
+  };
+  if (auto const *designMgr = dynamic_cast<Orb_DesignMgr const *>(object))
+    add(designMgr->GetDesigns());
+  if (auto const *design = dynamic_cast<Orb_Design const *>(object))
+    add(design->GetViews());
+  if (auto const *view = dynamic_cast<Orb_View const *>(object)) {
+    if (view->GetBlock())
+      children.push_back(view->GetBlock());
+    add(view->GetNetworks());
+  }
+  if (auto const *block = dynamic_cast<Orb_Block const *>(object)) {
+    add(block->GetPins());
+    add(block->GetSignals());
+    add(block->GetBlocks());
+  }
+  if (auto const *pin = dynamic_cast<Orb_Pin const *>(object))
+    out += std::string(" ") + Orb_PinDirectionName(pin->GetDirection()) +
+           (pin->GetSignal() ? " -> " + PathIn(pin->GetSignal()) : "");
+  if (auto const *signal = dynamic_cast<Orb_Signal const *>(object))
+    for (Orb_Pin const *pin : signal->GetPins())
+      out += " <- " + PathIn(pin);
+  if (auto const *network = dynamic_cast<Orb_Network const *>(object))
+    for (Orb_Signal const *signal : network->GetSignals())
+      out += " " + PathIn(signal);
+  out += "\n";
+  for (Orb_Persistent const *child : children)
+    out += Dump(child, depth + 1);
+  return out;
+}
+
+inline std::string Dump(Orb_Model const &model) {
+  std::string out;
+  for (Orb_DesignMgr const *designMgr : model.GetDesignMgrs())
+    out += Dump(designMgr);
+  return out;
 }
 
 } // namespace HostTest

@@ -7,314 +7,157 @@
 
 #include <cstdio>
 #include <string>
-#include <tuple>
-#include <vector>
 
 namespace {
 
 using namespace HostTest;
 
-std::string Props(Orb_PropertyHolder const &holder) {
-  std::string const text = PropertiesOf(holder);
-  return text.empty() ? "" : "<" + text + ">";
-}
-
-// A block's contents: its signals, then each child block with its
-// properties, its pins (direction, properties) and, recursively, its contents.
-std::string Contents(Orb_Block const *block) {
-  std::string text;
-  auto add = [&text](std::string const &item) { text += (text.empty() ? "" : " ") + item; };
-  for (Orb_Signal const *signal : block->GetSignals())
-    add(signal->GetName() + Props(*signal));
-  for (Orb_Block const *child : block->GetBlocks()) {
-    std::string pins;
-    for (Orb_Pin const *pin : child->GetPins())
-      pins += (pins.empty() ? "" : " ") + pin->GetNameString() + ":" +
-              Orb_PinDirectionName(pin->GetDirection()) + Props(*pin);
-    add(child->GetName() + Props(*child) + "(" + pins + "){" + Contents(child) + "}");
-  }
-  return text;
-}
-
-// Path of `block` below `root`, as "u1/leaf".
-std::string PathBelow(Orb_Block const *root, Orb_Block const *block) {
-  std::string path;
-  for (; block && block != root; block = block->GetParent()) {
-    if (!path.empty())
-      path.insert(0, "/");
-    path.insert(0, block->GetNameString());
-  }
-  return path;
-}
-
-// Every signal below `root` (pre-order) as "path:pins", its pins in
-// connection order; a pin of `root` itself shows its bare name.
-std::string Connections(Orb_Block const *root, Orb_Block const *block = nullptr) {
-  block = block ? block : root;
-  std::string text;
-  std::string const prefix = block == root ? "" : PathBelow(root, block) + "/";
-  for (Orb_Signal const *signal : block->GetSignals()) {
-    text += (text.empty() ? "" : " ") + prefix + signal->GetName() + ":";
-    char const *separator = "";
-    for (Orb_Pin const *pin : signal->GetPins()) {
-      text += separator;
-      separator = ",";
-      if (pin->GetParent() != root)
-        text += PathBelow(root, pin->GetParent()) + ".";
-      text += pin->GetName();
-    }
-  }
-  for (Orb_Block const *child : block->GetBlocks()) {
-    std::string const more = Connections(root, child);
-    text += more.empty() || text.empty() ? more : " " + more;
-  }
-  return text;
-}
-
-// Source: a type library's hierarchy H (pins A, B, C; signals sa, sb, mid;
-// child u1 with a leaf, child u2) in its own host model. Destination: block
-// "inst" (pins A, B) of a design whose view already has a network VCC.
+// Source: hierarchy H (pins A, B, C; children u1 with leaf, u2; networks VCC, GND) in a
+// library model. Destination: block "inst" (pins A, B) in a view that has a network VCC.
 class GraftTest : public ::testing::Test {
 protected:
   void SetUp() override {
     Orb_View *libView = lib.CreateDesignMgr("lib")->CreateDesign("cell")->CreateView("hier");
     h = libView->CreateTopBlock("H");
-    Orb_Pin *a = h->CreatePin("A", Orb_Pin::PIN_INPUT);
-    Orb_Pin *b = h->CreatePin("B", Orb_Pin::PIN_OUTPUT);
-    Orb_Pin *c = h->CreatePin("C", Orb_Pin::PIN_INPUT);
     Orb_Signal *sa = h->CreateSignal("sa");
     sa->CreatePropertyString("W", "1");
     Orb_Signal *sb = h->CreateSignal("sb");
     Orb_Signal *mid = h->CreateSignal("mid");
-
-    u1 = h->CreateBlock("u1", 0);
+    Connected(h, "A", Orb_Pin::PIN_INPUT, sa);
+    Connected(h, "B", Orb_Pin::PIN_OUTPUT, sb);
+    u1 = h->CreateBlock("u1");
     u1->CreatePropertyString("KIND", "and");
     u1->CreatePropertyStringList("TAGS")->AppendString("a");
     Orb_Property *attr = u1->CreatePropertyList("ATTR");
     attr->CreatePropertyString("k", "1");
     attr->CreatePropertyString("k", "2");
-    Orb_Pin *u1i = u1->CreatePin("i", Orb_Pin::PIN_INPUT);
-    u1i->CreatePropertyString("CAP", "3");
-    Orb_Pin *u1o = u1->CreatePin("o", Orb_Pin::PIN_OUTPUT);
-    Orb_Signal *inner = u1->CreateSignal("inner");
-    leaf = u1->CreateBlock("leaf", 0);
-    Orb_Pin *x = leaf->CreatePin("x", Orb_Pin::PIN_BIDIRECTIONAL);
-    Orb_Block *u2 = h->CreateBlock("u2", 0);
-    Orb_Pin *u2i = u2->CreatePin("i", Orb_Pin::PIN_INPUT);
-    Orb_Pin *u2o = u2->CreatePin("o", Orb_Pin::PIN_OUTPUT);
-
-    for (auto [pin, signal] : std::vector<std::pair<Orb_Pin *, Orb_Signal *>>{
-             {a, sa}, {u1i, sa}, {c, sa}, {b, sb}, {u2o, sb}, {u1o, mid}, {u2i, mid}, {x, inner}})
-      pin->Connect(signal);
+    Connected(u1, "i", Orb_Pin::PIN_INPUT, sa)->CreatePropertyString("CAP", "3");
+    Connected(u1, "o", Orb_Pin::PIN_OUTPUT, mid);
+    Connected(h, "C", Orb_Pin::PIN_INPUT, sa);
+    leaf = u1->CreateBlock("leaf");
+    Connected(leaf, "x", Orb_Pin::PIN_BIDIRECTIONAL, u1->CreateSignal("inner"));
+    Orb_Block *u2 = h->CreateBlock("u2");
+    Connected(u2, "i", Orb_Pin::PIN_INPUT, mid);
+    Connected(u2, "o", Orb_Pin::PIN_OUTPUT, sb);
     libView->CreateNetwork("VCC")->AddSignal(sb);
     gnd = libView->CreateNetwork("GND");
     gnd->CreatePropertyString("ROLE", "ground");
-    gnd->AddSignal(inner);
+    gnd->AddSignal(u1->GetSignalByName("inner"));
 
     view = design.GetOrbModel()->CreateDesignMgr("dm")->CreateDesign("chip")->CreateView("hier");
     top = view->CreateTopBlock("top");
     inst = AddInstance("inst");
     vcc = view->CreateNetwork("VCC");
     vcc->CreatePropertyString("ROLE", "supply");
-    log.Clear();
+    log.clear();
   }
 
+  static Orb_Pin *Connected(Orb_Block *block, char const *name, Orb_Pin::PIN_DIRECTION direction,
+                            Orb_Signal *signal) {
+    Orb_Pin *pin = block->CreatePin(name, direction);
+    pin->Connect(signal);
+    return pin;
+  }
   Orb_Block *AddInstance(char const *name) {
-    Orb_Block *block = top->CreateBlock(name, 0);
+    Orb_Block *block = top->CreateBlock(name);
     block->CreatePin("A", Orb_Pin::PIN_INPUT);
     block->CreatePin("B", Orb_Pin::PIN_OUTPUT);
     return block;
   }
 
   Orb_Model lib{"lib", "libdb", "", true};
-  Orb_Block *h = nullptr;
-  Orb_Block *u1 = nullptr;
-  Orb_Block *leaf = nullptr;
-  Orb_Network *gnd = nullptr;
-
+  Orb_Block *h = nullptr, *u1 = nullptr, *leaf = nullptr;
   EventLog log;
   RecModel design{&log};
   Orb_View *view = nullptr;
-  Orb_Block *top = nullptr;
-  Orb_Block *inst = nullptr;
-  Orb_Network *vcc = nullptr;
+  Orb_Block *top = nullptr, *inst = nullptr;
+  Orb_Network *gnd = nullptr, *vcc = nullptr;
 };
 
-char const *const kCopiedContents =
-    "sa<W=1> sb mid u1<KIND=and TAGS[a] ATTR{k:1,k:2}>(i:input<CAP=3> o:output)"
-    "{inner leaf(x:bidirectional){}} u2(i:input o:output){}";
+// H onto inst: H's pins map to inst's of the same name, so sa loses C, which inst lacks.
+char const *const kGrafted = "block inst\n"
+                             " pin A input -> top/inst/sa\n"
+                             " pin B output -> top/inst/sb\n"
+                             " signal sa <W=1> <- top/inst/A <- top/inst/u1/i\n"
+                             " signal sb <- top/inst/B <- top/inst/u2/o\n"
+                             " signal mid <- top/inst/u1/o <- top/inst/u2/i\n"
+                             " block u1 <KIND=and TAGS[a] ATTR{k:1,k:2}>\n"
+                             "  pin i <CAP=3> input -> top/inst/sa\n"
+                             "  pin o output -> top/inst/mid\n"
+                             "  signal inner <- top/inst/u1/leaf/x\n"
+                             "  block leaf\n"
+                             "   pin x bidirectional -> top/inst/u1/inner\n"
+                             " block u2\n"
+                             "  pin i input -> top/inst/mid\n"
+                             "  pin o output -> top/inst/sb\n";
 
-// Across host models: signals, child blocks, pins with directions and every
-// kind of property are copied; the source stays as it was.
-TEST_F(GraftTest, CopiesStructurePinsAndProperties) {
-  std::string const sourceBefore = Contents(h);
+// Structure, properties and connections are copied across models and survive save/reopen.
+TEST_F(GraftTest, CopiesStructureAndConnectionsAndSurvivesReopen) {
+  std::string const sourceBefore = Dump(h);
   EXPECT_TRUE(Ora_GraftMgr(false, false).Graft(h, inst));
-  EXPECT_EQ(Contents(inst), kCopiedContents);
-  EXPECT_EQ(Contents(h), sourceBefore);
-  EXPECT_EQ(Names(inst->GetPins()), "A B");
-  EXPECT_TRUE(inst->GetProperties().empty());
-}
+  EXPECT_EQ(Dump(inst), kGrafted);
+  EXPECT_EQ(Dump(h), sourceBefore);
 
-// Connections among copies are reproduced in order; the source block's own
-// pins stand for the destination's pins of the same name (C has none).
-TEST_F(GraftTest, ReproducesConnectionsAndMapsOwnPins) {
-  EXPECT_EQ(Connections(h), "sa:A,u1.i,C sb:B,u2.o mid:u1.o,u2.i u1/inner:u1/leaf.x");
-  Ora_GraftMgr(false, false).Graft(h, inst);
-  EXPECT_EQ(Connections(inst), "sa:A,u1.i sb:B,u2.o mid:u1.o,u2.i u1/inner:u1/leaf.x");
-}
-
-// A copied signal joins the destination view's network of its network's
-// name, which is created (with the source network's properties) when absent
-// and found again by a later graft; an existing network keeps its own.
-TEST_F(GraftTest, JoinsOrCreatesNetworks) {
-  Ora_GraftMgr(false, false).Graft(h, inst);
-  Orb_Block *second = AddInstance("inst2");
-  Ora_GraftMgr(false, false).Graft(h, second);
-
-  EXPECT_EQ(Names(view->GetNetworks()), "VCC GND");
-  Orb_Network *copiedGnd = view->GetNetworkByName("GND");
-  ASSERT_NE(copiedGnd, nullptr);
-  EXPECT_EQ(PropertiesOf(*copiedGnd), "ROLE=ground");
-  EXPECT_EQ(PropertiesOf(*vcc), "ROLE=supply");
-  EXPECT_EQ(Names(vcc->GetSignals()), "sb sb");
-  EXPECT_EQ(vcc->GetSignals()[1], second->GetSignalByName("sb"));
-  EXPECT_EQ(copiedGnd->GetSignals().at(0)->GetParent(), inst->GetBlockByName("u1"));
-  EXPECT_EQ(inst->GetSignalByName("sa")->GetNetwork(), nullptr);
-}
-
-// What the graft made is stored: a saved and reopened design shows the same
-// copies, connections and network memberships.
-TEST_F(GraftTest, SurvivesSaveAndReopen) {
-  Ora_GraftMgr(false, false).Graft(h, inst);
   std::string const path = ::testing::TempDir() + "Ora_GraftMgrTest_roundtrip.db";
   design.Save(path.c_str());
   Orb_Model reopened("reopened", "db", "", false);
   reopened.Open(path.c_str());
   std::remove(path.c_str());
-
-  Orb_View *again =
-      reopened.GetDesignMgrByName("dm")->GetDesignByName("chip")->GetViewByName("hier");
-  Orb_Block *instAgain = again->GetBlock()->GetBlockByName("inst");
-  ASSERT_NE(instAgain, nullptr);
-  EXPECT_EQ(Contents(instAgain), kCopiedContents);
-  EXPECT_EQ(Connections(instAgain), Connections(inst));
-  EXPECT_EQ(Names(again->GetNetworks()), "VCC GND");
-  EXPECT_EQ(again->GetNetworkByName("GND")->GetSignals().at(0)->GetParent()->GetName(),
-            std::string("u1"));
-  EXPECT_EQ(again->GetNetworkByName("VCC")->GetSignals().at(0)->GetParent(), instAgain);
+  EXPECT_EQ(Dump(reopened), Dump(*design.GetOrbModel()));
 }
 
-// Each copy is created (OnCreate fires, pre-order) before it gets the
-// source's properties: it has none at creation, and what a creation
-// handler deletes is there afterwards.
+// Each copy is created (OnCreate, pre-order) before it gets the source's properties.
 TEST_F(GraftTest, CopiesAreCreatedBeforeTheyGetProperties) {
-  design.onSpecialize = [](Orb_Persistent *object, bool) {
-    for (char const *name : {"KIND", "CAP", "W", "ROLE"})
-      object->DeleteProperty(name);
-  };
   Ora_GraftMgr(false, false).Graft(h, inst);
-  EXPECT_EQ(log.Joined(), "create signal sa; create signal sb; create signal mid; "
-                          "create block u1; create pin i; create pin o; create signal inner; "
-                          "create network GND; create block leaf; create pin x; "
-                          "create block u2; create pin i; create pin o");
-  EXPECT_EQ(Contents(inst), kCopiedContents);
-
-  Orb_Block *u1Copy = inst->GetBlockByName("u1");
-  auto *blockClient = static_cast<RecBlock *>(design.GetClient(u1Copy));
-  auto *pinClient = static_cast<RecPin *>(design.GetClient(u1Copy->GetPinByName("i")));
-  auto *signalClient = static_cast<RecSignal *>(design.GetClient(inst->GetSignalByName("sa")));
-  auto *networkClient = static_cast<RecNetwork *>(design.GetClient(view->GetNetworkByName("GND")));
-  ASSERT_TRUE(blockClient && pinClient && signalClient && networkClient);
-  EXPECT_EQ(blockClient->GetPropertiesAtBirth(), 0u);
-  EXPECT_EQ(pinClient->GetPropertiesAtBirth(), 0u);
-  EXPECT_EQ(signalClient->GetPropertiesAtBirth(), 0u);
-  EXPECT_EQ(networkClient->GetPropertiesAtBirth(), 0u);
-  EXPECT_EQ(PropertiesOf(*view->GetNetworkByName("GND")), "ROLE=ground");
+  EXPECT_EQ(Joined(log), "create signal sa; create signal sb; create signal mid; "
+                         "create block u1; create pin i; create pin o; create signal inner; "
+                         "create network GND; create block leaf; create pin x; "
+                         "create block u2; create pin i; create pin o");
 }
 
-class GraftBackReferenceTest : public GraftTest,
-                               public ::testing::WithParamInterface<std::tuple<bool, bool>> {};
+// Signals join same-named networks (made if absent); back references name sources when on.
+TEST_F(GraftTest, NetworksAndBackReferences) {
+  Ora_GraftMgr networksOnly(false, false);
+  networksOnly.SetNetworkBackReferences(true);
+  networksOnly.Graft(h, inst);
+  Ora_GraftMgr blocksOnly(true, false);
+  Orb_Block *second = AddInstance("inst2");
+  blocksOnly.Graft(h, second);
 
-// With back references on, copied blocks and the networks the graft created
-// tell their sources; with them off, or for objects not copied, nothing.
-TEST_P(GraftBackReferenceTest, TellSourcesOnlyWhenOn) {
-  auto const [blocks, networks] = GetParam();
-  Ora_GraftMgr manager(false, false);
-  manager.SetBlockBackReferences(blocks);
-  manager.SetNetworkBackReferences(networks);
-  manager.Graft(h, inst);
-
-  Orb_Block const *u1Copy = inst->GetBlockByName("u1");
-  EXPECT_EQ(manager.GetBlockSource(u1Copy), blocks ? u1 : nullptr);
-  EXPECT_EQ(manager.GetBlockSource(u1Copy->GetBlockByName("leaf")), blocks ? leaf : nullptr);
-  EXPECT_EQ(manager.GetBlockSource(inst), nullptr);
-  EXPECT_EQ(manager.GetNetworkSource(view->GetNetworkByName("GND")), networks ? gnd : nullptr);
-  EXPECT_EQ(manager.GetNetworkSource(vcc), nullptr);
+  EXPECT_EQ(Names(view->GetNetworks()), "VCC GND");
+  Orb_Network const *copiedGnd = view->GetNetworkByName("GND");
+  EXPECT_EQ(Dump(copiedGnd), "network GND <ROLE=ground> top/inst/u1/inner top/inst2/u1/inner\n");
+  EXPECT_EQ(Dump(vcc), "network VCC <ROLE=supply> top/inst/sb top/inst2/sb\n");
+  EXPECT_EQ(networksOnly.GetNetworkSource(copiedGnd), gnd);
+  EXPECT_EQ(networksOnly.GetNetworkSource(vcc), nullptr);
+  EXPECT_EQ(networksOnly.GetBlockSource(inst->GetBlockByName("u1")), nullptr);
+  Orb_Block const *u1Copy = second->GetBlockByName("u1");
+  EXPECT_EQ(blocksOnly.GetBlockSource(u1Copy), u1);
+  EXPECT_EQ(blocksOnly.GetBlockSource(u1Copy->GetBlockByName("leaf")), leaf);
+  EXPECT_EQ(blocksOnly.GetBlockSource(second), nullptr);
+  EXPECT_EQ(blocksOnly.GetNetworkSource(copiedGnd), nullptr);
 }
 
-INSTANTIATE_TEST_SUITE_P(OnOff, GraftBackReferenceTest,
-                         ::testing::Combine(::testing::Bool(), ::testing::Bool()));
-
-// The constructor's flags switch back references on as the setters do.
-TEST_F(GraftTest, ConstructorTurnsBackReferencesOn) {
-  Ora_GraftMgr manager(true, true);
-  manager.Graft(h, inst);
-  EXPECT_EQ(manager.GetBlockSource(inst->GetBlockByName("u1")), u1);
-  EXPECT_EQ(manager.GetNetworkSource(view->GetNetworkByName("GND")), gnd);
-}
-
-// Records each pin property copy and writes a marker instead of copying.
-class MarkingGraftMgr : public Ora_GraftMgr {
-public:
-  MarkingGraftMgr() : Ora_GraftMgr(false, false) {}
-  void CopyPinProperties(Orb_Pin const *source, Orb_Pin *destination) override {
-    std::string const from = source->GetParent()->GetNameString() + "." + source->GetName();
-    calls.push_back(from + ">" + destination->GetParent()->GetName() + "." +
-                    destination->GetName());
-    destination->CreatePropertyString("FROM", from.c_str());
-  }
-  std::vector<std::string> calls;
-};
-
-// Copied pins get their properties through the virtual CopyPinProperties,
-// once each; the destination's own pins are not touched.
-TEST_F(GraftTest, CopyPinPropertiesOverrideIsUsed) {
-  MarkingGraftMgr manager;
-  manager.Graft(h, inst);
-  EXPECT_EQ(manager.calls, (std::vector<std::string>{"u1.i>u1.i", "u1.o>u1.o", "leaf.x>leaf.x",
-                                                     "u2.i>u2.i", "u2.o>u2.o"}));
-  EXPECT_EQ(PropertiesOf(*inst->GetBlockByName("u1")->GetPinByName("i")), "FROM=u1.i");
-  EXPECT_TRUE(inst->GetPinByName("A")->GetProperties().empty());
-}
-
-// Onto itself or into its own subtree a graft is refused and copies nothing.
-TEST_F(GraftTest, RefusesSelfAndOwnSubtree) {
-  std::string const before = Contents(h);
-  for (Orb_Block *destination : {h, u1, leaf}) {
+// Grafts into the own subtree are refused; a name clash throws and keeps earlier copies.
+TEST_F(GraftTest, RefusesOwnSubtreeAndNameClashes) {
+  std::string const before = Dump(h);
+  for (Orb_Block *destination : {h, u1, leaf})
     EXPECT_THROW(Ora_GraftMgr(false, false).Graft(h, destination), Orb_Exception)
         << destination->GetName();
-  }
   EXPECT_THROW(Ora_GraftMgr(false, false).Graft(nullptr, inst), Orb_Exception);
-  EXPECT_EQ(Contents(h), before);
+  EXPECT_EQ(Dump(h), before);
 
-  // Into the same model outside the subtree is fine; the copy joins the
-  // source's own network.
   Orb_Block *u2 = h->GetBlockByName("u2");
   EXPECT_TRUE(Ora_GraftMgr(false, false).Graft(u1, u2));
-  EXPECT_EQ(Connections(u2), "inner:leaf.x");
-  EXPECT_EQ(gnd->GetSignals().size(), 2u);
-}
+  EXPECT_EQ(Names(gnd->GetSignals()), "inner inner");
 
-// A name clash throws from the host; what was copied before stays.
-TEST_F(GraftTest, NameClashThrowsAndKeepsEarlierCopies) {
-  inst->CreateBlock("u2", 0);
+  inst->CreateBlock("u1");
   try {
     Ora_GraftMgr(false, false).Graft(h, inst);
-    FAIL() << "grafting over an existing u2 did not throw";
+    FAIL() << "grafting over an existing u1 did not throw";
   } catch (Orb_Exception const &e) {
-    EXPECT_EQ(e.GetObjectName(), "u2") << e.what();
+    EXPECT_EQ(e.GetObjectName(), "u1") << e.what();
   }
-  EXPECT_EQ(Names(inst->GetBlocks()), "u2 u1");
   EXPECT_EQ(Names(inst->GetSignals()), "sa sb mid");
 }
 
