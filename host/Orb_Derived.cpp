@@ -334,45 +334,9 @@ Orb_ModelDerived::Orb_ModelDerived(Orb_Model *model) : Orb_Context(model) {
 
 Orb_ModelDerived::~Orb_ModelDerived() {
   for (Orb_DesignMgr *designMgr : GetOrbModel()->GetDesignMgrs())
-    DestroyClients(designMgr);
+    Orb_VisitPostOrder(designMgr, [this](Orb_Persistent *object) { delete GetClient(object); });
   GetOrbModel()->Detach(this);
   // m_pOwnedModel, if any, goes with this object.
-}
-
-void Orb_ModelDerived::DestroyClients(Orb_Persistent *object) {
-  switch (object->GetKind()) {
-  case Orb_Kind::DesignMgr:
-    for (Orb_Design *design : static_cast<Orb_DesignMgr *>(object)->GetDesigns())
-      DestroyClients(design);
-    break;
-  case Orb_Kind::Design:
-    for (Orb_View *view : static_cast<Orb_Design *>(object)->GetViews())
-      DestroyClients(view);
-    break;
-  case Orb_Kind::View: {
-    auto *view = static_cast<Orb_View *>(object);
-    for (Orb_Network *network : view->GetNetworks())
-      DestroyClients(network);
-    if (view->GetBlock())
-      DestroyClients(view->GetBlock());
-    break;
-  }
-  case Orb_Kind::Block: {
-    auto *block = static_cast<Orb_Block *>(object);
-    for (Orb_Pin *pin : block->GetPins())
-      DestroyClients(pin);
-    for (Orb_Signal *signal : block->GetSignals())
-      DestroyClients(signal);
-    for (Orb_Block *child : block->GetBlocks())
-      DestroyClients(child);
-    break;
-  }
-  case Orb_Kind::Pin:
-  case Orb_Kind::Signal:
-  case Orb_Kind::Network:
-    break;
-  }
-  delete GetClient(object);
 }
 
 Orb_DesignMgrDerived *Orb_ModelDerived::CreateDesignMgr(char const *name) {

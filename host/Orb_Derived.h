@@ -188,7 +188,5 @@ public:
   void Dbg() const;
 
 private:
-  void DestroyClients(Orb_Persistent *object);
-
   std::unique_ptr<Orb_Model> m_pOwnedModel;
 };

@@ -408,45 +408,9 @@ void Orb_Model::FireDelete(Orb_Persistent *object) {
     delete m_Contexts[i]->GetClient(object);
 }
 
-void Orb_Model::FireDeleteTree(Orb_Persistent *object) {
-  switch (object->GetKind()) {
-  case Orb_Kind::DesignMgr:
-    for (Orb_Design *design : static_cast<Orb_DesignMgr *>(object)->GetDesigns())
-      FireDeleteTree(design);
-    break;
-  case Orb_Kind::Design:
-    for (Orb_View *view : static_cast<Orb_Design *>(object)->GetViews())
-      FireDeleteTree(view);
-    break;
-  case Orb_Kind::View: {
-    auto *view = static_cast<Orb_View *>(object);
-    for (Orb_Network *network : view->GetNetworks())
-      FireDeleteTree(network);
-    if (view->GetBlock())
-      FireDeleteTree(view->GetBlock());
-    break;
-  }
-  case Orb_Kind::Block: {
-    auto *block = static_cast<Orb_Block *>(object);
-    for (Orb_Pin *pin : block->GetPins())
-      FireDeleteTree(pin);
-    for (Orb_Signal *signal : block->GetSignals())
-      FireDeleteTree(signal);
-    for (Orb_Block *child : block->GetBlocks())
-      FireDeleteTree(child);
-    break;
-  }
-  case Orb_Kind::Pin:
-  case Orb_Kind::Signal:
-  case Orb_Kind::Network:
-    break;
-  }
-  FireDelete(object);
-}
-
 void Orb_Model::Delete(Orb_Persistent *object) {
   assert(object && object->GetModel() == this && "Delete: object of another model");
-  FireDeleteTree(object);
+  Orb_VisitPostOrder(object, [this](Orb_Persistent *owned) { FireDelete(owned); });
   Unlink(object);
   Free(object);
 }

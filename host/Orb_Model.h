@@ -250,6 +250,46 @@ private:
   Orb_NamedList<Orb_Design> m_Designs;
 };
 
+// Visits the object and everything it owns, children before parents: a
+// design manager's designs, a design's views, a view's networks and then its
+// block tree, a block's pins, signals and child blocks; each object after
+// what it owns.
+template <class F> void Orb_VisitPostOrder(Orb_Persistent *object, F const &visit) {
+  switch (object->GetKind()) {
+  case Orb_Kind::DesignMgr:
+    for (Orb_Design *design : static_cast<Orb_DesignMgr *>(object)->GetDesigns())
+      Orb_VisitPostOrder(design, visit);
+    break;
+  case Orb_Kind::Design:
+    for (Orb_View *view : static_cast<Orb_Design *>(object)->GetViews())
+      Orb_VisitPostOrder(view, visit);
+    break;
+  case Orb_Kind::View: {
+    auto *view = static_cast<Orb_View *>(object);
+    for (Orb_Network *network : view->GetNetworks())
+      Orb_VisitPostOrder(network, visit);
+    if (view->GetBlock())
+      Orb_VisitPostOrder(view->GetBlock(), visit);
+    break;
+  }
+  case Orb_Kind::Block: {
+    auto *block = static_cast<Orb_Block *>(object);
+    for (Orb_Pin *pin : block->GetPins())
+      Orb_VisitPostOrder(pin, visit);
+    for (Orb_Signal *signal : block->GetSignals())
+      Orb_VisitPostOrder(signal, visit);
+    for (Orb_Block *child : block->GetBlocks())
+      Orb_VisitPostOrder(child, visit);
+    break;
+  }
+  case Orb_Kind::Pin:
+  case Orb_Kind::Signal:
+  case Orb_Kind::Network:
+    break;
+  }
+  visit(object);
+}
+
 // Something a client keeps with a host model and that is saved with it: its
 // own host model, written into the design database under a key (for instance
 // a type library local to the design). The host model owns it.
@@ -333,7 +373,6 @@ private:
   void AnnounceLoad(Orb_Persistent *object);
   void AnnounceLoadTree(Orb_DesignMgr *designMgr);
   void FireDelete(Orb_Persistent *object);
-  void FireDeleteTree(Orb_Persistent *object);
   // Removes the object from its parent's containers.
   void Unlink(Orb_Persistent *object);
   // Frees the object and its subtree without events. Connections and network
