@@ -52,8 +52,8 @@ void BM_OpenAndCommit(benchmark::State &state) {
   for (auto _ : state) {
     Lum_TdmModel model("reader", "bench", path.c_str());
     model.Open(path.c_str());
-    Lum_TdmView *view = model.GetDesignMgrByName("dm")->GetDesignByName("chip")->GetViewByName(
-        "netlist");
+    Lum_TdmView *view =
+        model.GetDesignMgrByName("dm")->GetDesignByName("chip")->GetViewByName("netlist");
     view->CommitAll();
     benchmark::DoNotOptimize(view);
   }

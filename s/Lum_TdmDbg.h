@@ -6,6 +6,7 @@
 
 #include <cxxabi.h>
 
+#include <algorithm>
 #include <cstdlib>
 #include <string>
 #include <typeinfo>
@@ -20,12 +21,20 @@ template <class T> std::string ClassName() {
   char *demangled = abi::__cxa_demangle(mangled, nullptr, nullptr, &status);
   std::string name = status == 0 && demangled ? demangled : mangled;
   std::free(demangled);
-  for (std::string const cut : {"const", "*"})
-    for (auto pos = name.find(cut); pos != std::string::npos; pos = name.find(cut))
-      name.erase(pos, cut.size());
-  auto const first = name.find_first_not_of(' ');
-  auto const last = name.find_last_not_of(' ');
-  return first == std::string::npos ? name : name.substr(first, last - first + 1);
+  // Drop the pointer and every "const" word, keep the rest as it stands.
+  std::string result;
+  std::size_t pos = 0;
+  while (pos < name.size()) {
+    std::size_t const start = name.find_first_not_of(" *", pos);
+    if (start == std::string::npos)
+      break;
+    std::size_t const stop = std::min(name.find_first_of(" *", start), name.size());
+    std::string const word = name.substr(start, stop - start);
+    if (word != "const")
+      result += (result.empty() ? "" : " ") + word;
+    pos = stop;
+  }
+  return result;
 }
 
 inline char const *RuleLine() { return "=======================================\n"; }
