@@ -347,6 +347,12 @@ private:
   void ReadHeader();
   void ReadModel(Section &section);
   void ReadCompanion(Section &section);
+  // Reads a design manager's or a design's records: its properties, then its
+  // children of one kind, each read by `readChild`, up to the closing 'E'.
+  template <class Parent, class Child>
+  void ReadContainer(Parent *parent, Orb_NamedList<Child> &children, char childTag,
+                     char const *parentKind, char const *childKind,
+                     void (Orb_ModelIO::*readChild)(Child *));
   void ReadDesignMgr(Orb_DesignMgr *designMgr);
   void ReadDesign(Orb_Design *design);
   void ReadView(Orb_View *view);
@@ -672,52 +678,40 @@ void Orb_ModelIO::ReadCompanion(Section &section) {
   section.companions.emplace(std::move(key), std::move(companion));
 }
 
-void Orb_ModelIO::ReadDesignMgr(Orb_DesignMgr *designMgr) {
-  Orb_PropertyHolder *holder = designMgr;
+template <class Parent, class Child>
+void Orb_ModelIO::ReadContainer(Parent *parent, Orb_NamedList<Child> &children, char childTag,
+                                char const *parentKind, char const *childKind,
+                                void (Orb_ModelIO::*readChild)(Child *)) {
+  Orb_PropertyHolder *holder = parent;
   for (;;) {
     char const tag = m_pIn->Tag();
     if (ReadProperty(tag, holder))
       continue;
-    if (tag == 'G') {
-      std::string name = ReadName("design");
+    if (tag == childTag) {
+      std::string name = ReadName(childKind);
       m_pIn->End();
-      if (designMgr->m_Designs.Find(name))
-        Duplicate("design", name, designMgr);
-      auto *design = new Orb_Design(designMgr->GetModel(), designMgr, std::move(name));
-      designMgr->m_Designs.Add(design);
-      ReadDesign(design);
+      if (children.Find(name))
+        Duplicate(childKind, name, parent);
+      auto *child = new Child(parent->GetModel(), parent, std::move(name));
+      children.Add(child);
+      (this->*readChild)(child);
       holder = nullptr;
     } else if (tag == 'E') {
       m_pIn->End();
       return;
     } else {
-      Unexpected(tag, "design manager");
+      Unexpected(tag, parentKind);
     }
   }
 }
 
+void Orb_ModelIO::ReadDesignMgr(Orb_DesignMgr *designMgr) {
+  ReadContainer(designMgr, designMgr->m_Designs, 'G', "design manager", "design",
+                &Orb_ModelIO::ReadDesign);
+}
+
 void Orb_ModelIO::ReadDesign(Orb_Design *design) {
-  Orb_PropertyHolder *holder = design;
-  for (;;) {
-    char const tag = m_pIn->Tag();
-    if (ReadProperty(tag, holder))
-      continue;
-    if (tag == 'W') {
-      std::string name = ReadName("view");
-      m_pIn->End();
-      if (design->m_Views.Find(name))
-        Duplicate("view", name, design);
-      auto *view = new Orb_View(design->GetModel(), design, std::move(name));
-      design->m_Views.Add(view);
-      ReadView(view);
-      holder = nullptr;
-    } else if (tag == 'E') {
-      m_pIn->End();
-      return;
-    } else {
-      Unexpected(tag, "design");
-    }
-  }
+  ReadContainer(design, design->m_Views, 'W', "design", "view", &Orb_ModelIO::ReadView);
 }
 
 void Orb_ModelIO::ReadView(Orb_View *view) {
