@@ -6,10 +6,11 @@ namespace Port {
 class Stream;
 }
 
-// The host's debug printer. Conversions are its own and safe: %s (null prints
-// "(null)"), %d (int), %u (unsigned), %c (int), %x (uintptr_t: callers pass
-// pointers as uintptr_t), %lU (uint64_t), %%. Any other conversion is copied
-// as it stands and reads no argument.
+// The host's debug printer. Its conversions are Port::vformat's and safe:
+// %s, %d, %u, %c, %x (uintptr_t: callers pass pointers as uintptr_t), %lU
+// (uint64_t) and %%, each with flags, width and precision. An unknown
+// conversion ends the formatting: the rest is printed as it stands and no
+// further argument is read.
 class LUM_PLATFORM_API Orb_Debug {
 public:
   // Writes to the current debug output (standard output unless redirected).

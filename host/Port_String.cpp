@@ -1,23 +1,76 @@
 #include "Port_String.h"
 
-#include <cinttypes>
+#include <climits>
 #include <cstdint>
 #include <cstdio>
+#include <string_view>
 
 namespace Port {
 
 namespace {
 
-void AppendUnsigned(std::string &out, std::uint64_t value, unsigned base) {
+// Widths and precisions above this are refused as malformed: a format is
+// text, and a typo must not make the printer allocate gigabytes.
+constexpr unsigned kMaxField = 65535;
+
+// One conversion's flags, width and precision.
+struct Spec {
+  bool left = false;  // '-'
+  bool zero = false;  // '0'
+  bool plus = false;  // '+'
+  bool space = false; // ' '
+  bool alt = false;   // '#'
+  unsigned width = 0;
+  int precision = -1; // -1: none given
+};
+
+// Reads a decimal field at p, advancing it. False when it exceeds kMaxField.
+bool ReadField(char const *&p, unsigned &value) {
+  value = 0;
+  while (*p >= '0' && *p <= '9') {
+    value = value * 10 + static_cast<unsigned>(*p++ - '0');
+    if (value > kMaxField)
+      return false;
+  }
+  return true;
+}
+
+void Pad(std::string &out, std::size_t length, Spec const &spec, std::string_view body) {
+  std::size_t const fill = spec.width > length ? spec.width - length : 0;
+  if (!spec.left)
+    out.append(fill, ' ');
+  out.append(body);
+  if (spec.left)
+    out.append(fill, ' ');
+}
+
+// A number as printf lays it out: sign or prefix, zeros up to the
+// precision, then padding to the width (zeros with '0' unless '-' or a
+// precision is given).
+void AppendNumber(std::string &out, Spec const &spec, std::string_view prefix,
+                  std::uint64_t magnitude, unsigned base) {
   char digits[32];
   int n = 0;
-  do {
-    unsigned digit = static_cast<unsigned>(value % base);
-    digits[n++] = static_cast<char>(digit < 10 ? '0' + digit : 'a' + (digit - 10));
-    value /= base;
-  } while (value != 0);
+  // A zero precision prints nothing for the value zero.
+  if (magnitude != 0 || spec.precision != 0) {
+    do {
+      auto const digit = static_cast<unsigned>(magnitude % base);
+      digits[n++] = static_cast<char>(digit < 10 ? '0' + digit : 'a' + (digit - 10));
+      magnitude /= base;
+    } while (magnitude != 0);
+  }
+  std::size_t zeros =
+      spec.precision > n ? static_cast<std::size_t>(spec.precision - n) : std::size_t(0);
+  std::size_t length = prefix.size() + zeros + static_cast<std::size_t>(n);
+  if (spec.zero && !spec.left && spec.precision < 0 && spec.width > length) {
+    zeros += spec.width - length;
+    length = spec.width;
+  }
+  std::string body(prefix);
+  body.append(zeros, '0');
   while (n > 0)
-    out += digits[--n];
+    body += digits[--n];
+  Pad(out, length, spec, body);
 }
 
 } // namespace
@@ -31,53 +84,73 @@ std::string vformat(char const *format, va_list args) {
       out += *p;
       continue;
     }
-    char const c = p[1];
-    switch (c) {
+    char const *const start = p++;
+    Spec spec;
+    for (;; ++p) {
+      if (*p == '-')
+        spec.left = true;
+      else if (*p == '0')
+        spec.zero = true;
+      else if (*p == '+')
+        spec.plus = true;
+      else if (*p == ' ')
+        spec.space = true;
+      else if (*p == '#')
+        spec.alt = true;
+      else
+        break;
+    }
+    bool valid = ReadField(p, spec.width);
+    if (valid && *p == '.') {
+      unsigned precision = 0;
+      valid = ReadField(++p, precision);
+      spec.precision = static_cast<int>(precision);
+    }
+    // The conversion; '\0' for one that is unknown or malformed.
+    char conversion = valid ? *p : '\0';
+    if (conversion == 'l')
+      conversion = p[1] == 'U' ? (++p, 'U') : '\0';
+    switch (conversion) {
     case '%':
       out += '%';
-      ++p;
       break;
     case 's': {
       char const *text = va_arg(args, char const *);
-      out += text ? text : "(null)";
-      ++p;
+      std::string_view value = text ? text : "(null)";
+      if (spec.precision >= 0 && value.size() > static_cast<std::size_t>(spec.precision))
+        value = value.substr(0, static_cast<std::size_t>(spec.precision));
+      Pad(out, value.size(), spec, value);
+      break;
+    }
+    case 'c': {
+      char const c = static_cast<char>(va_arg(args, int));
+      Pad(out, 1, spec, std::string_view(&c, 1));
       break;
     }
     case 'd': {
-      int value = va_arg(args, int);
-      if (value < 0) {
-        out += '-';
-        AppendUnsigned(out, static_cast<std::uint64_t>(-static_cast<std::int64_t>(value)), 10);
-      } else {
-        AppendUnsigned(out, static_cast<std::uint64_t>(value), 10);
-      }
-      ++p;
+      int const value = va_arg(args, int);
+      // Through int64: the magnitude of INT_MIN does not fit an int.
+      auto const wide = static_cast<std::int64_t>(value);
+      std::string_view const sign = value < 0 ? "-" : spec.plus ? "+" : spec.space ? " " : "";
+      AppendNumber(out, spec, sign, static_cast<std::uint64_t>(value < 0 ? -wide : wide), 10);
       break;
     }
     case 'u':
-      AppendUnsigned(out, va_arg(args, unsigned), 10);
-      ++p;
+      AppendNumber(out, spec, "", va_arg(args, unsigned), 10);
       break;
-    case 'c':
-      out += static_cast<char>(va_arg(args, int));
-      ++p;
+    case 'x': {
+      std::uintptr_t const value = va_arg(args, std::uintptr_t);
+      AppendNumber(out, spec, spec.alt && value != 0 ? "0x" : "", value, 16);
       break;
-    case 'x':
-      AppendUnsigned(out, va_arg(args, std::uintptr_t), 16);
-      ++p;
-      break;
-    case 'l':
-      if (p[2] == 'U') {
-        AppendUnsigned(out, va_arg(args, std::uint64_t), 10);
-        p += 2;
-      } else {
-        out += '%';
-      }
+    }
+    case 'U':
+      AppendNumber(out, spec, "", va_arg(args, std::uint64_t), 10);
       break;
     default:
-      // Unknown or truncated conversion: copied, no argument read.
-      out += '%';
-      break;
+      // Unknown, malformed or cut short: the arguments that follow can no
+      // longer be matched to conversions, so the rest is text.
+      out.append(start);
+      return out;
     }
   }
   return out;
@@ -91,12 +164,100 @@ std::string format(char const *fmt, ...) {
   return text;
 }
 
+namespace {
+
+bool IsSpace(char c) { return c == ' ' || (c >= '\t' && c <= '\r'); }
+
+// Reads an optionally signed decimal number at p, advancing past it. False,
+// with p unchanged, when there is no digit; sets `overflow` when the
+// magnitude exceeds `limit`.
+bool ReadNumber(char const *&p, std::uint64_t limit, bool &negative, std::uint64_t &magnitude,
+                bool &overflow) {
+  char const *q = p;
+  negative = *q == '-';
+  if (*q == '-' || *q == '+')
+    ++q;
+  if (*q < '0' || *q > '9')
+    return false;
+  magnitude = 0;
+  overflow = false;
+  for (; *q >= '0' && *q <= '9'; ++q) {
+    if (!overflow) {
+      magnitude = magnitude * 10 + static_cast<unsigned>(*q - '0');
+      overflow = magnitude > limit;
+    }
+  }
+  p = q;
+  return true;
+}
+
+} // namespace
+
 int sscanf(char const *text, char const *fmt, ...) {
+  char const *in = text ? text : "";
+  char const *f = fmt ? fmt : "";
+  int assigned = 0;
+  // EOF when the input ends before the first conversion, as std::sscanf.
+  bool converted = false;
   va_list args;
   va_start(args, fmt);
-  int const n = std::vsscanf(text ? text : "", fmt, args);
+  while (*f) {
+    if (IsSpace(*f)) {
+      while (IsSpace(*f))
+        ++f;
+      while (IsSpace(*in))
+        ++in;
+      continue;
+    }
+    if (*f != '%' || f[1] == '%') {
+      // A literal; "%%" matches '%' after any white space.
+      if (*f == '%') {
+        while (IsSpace(*in))
+          ++in;
+        ++f;
+      }
+      if (*in == '\0' && !converted)
+        assigned = EOF;
+      if (*in != *f)
+        break;
+      ++in;
+      ++f;
+      continue;
+    }
+    char const conversion = f[1];
+    if (conversion != 'd' && conversion != 'u')
+      break;
+    f += 2;
+    while (IsSpace(*in))
+      ++in;
+    if (*in == '\0') {
+      if (!converted)
+        assigned = EOF;
+      break;
+    }
+    bool negative = false;
+    bool overflow = false;
+    std::uint64_t magnitude = 0;
+    if (conversion == 'd') {
+      // INT_MIN's magnitude is one more than INT_MAX.
+      std::uint64_t const limit = static_cast<std::uint64_t>(INT_MAX) + 1;
+      if (!ReadNumber(in, limit, negative, magnitude, overflow) || overflow ||
+          (!negative && magnitude > static_cast<std::uint64_t>(INT_MAX)))
+        break;
+      *va_arg(args, int *) = negative ? static_cast<int>(-static_cast<std::int64_t>(magnitude))
+                                      : static_cast<int>(magnitude);
+    } else {
+      if (!ReadNumber(in, UINT_MAX, negative, magnitude, overflow) || overflow)
+        break;
+      // As strtoul: a minus sign negates in the unsigned type.
+      auto const value = static_cast<unsigned>(magnitude);
+      *va_arg(args, unsigned *) = negative ? 0u - value : value;
+    }
+    ++assigned;
+    converted = true;
+  }
   va_end(args);
-  return n;
+  return assigned;
 }
 
 StringBase<char> &StringBase<char>::doFormat(char const *fmt, ...) {

@@ -38,8 +38,7 @@ public:
     return *this;
   }
 
-  // Replaces the contents with the formatted text. Conversions: %s (null
-  // prints "(null)"), %d, %u, %x (uintptr_t), %lU (uint64_t), %c, %%.
+  // Replaces the contents with the formatted text (Port::vformat below).
   StringBase &doFormat(char const *format, ...);
 
   // Replaces every occurrence of `from` by `to`; returns how many were
@@ -61,14 +60,27 @@ private:
   std::string m_Text;
 };
 
-// As std::sscanf.
+// A small std::sscanf with defined behaviour on any input. The format may
+// hold white space (matching any run of white space, also none), literal
+// bytes, "%%", and the conversions %d (int *) and %u (unsigned *), each
+// skipping leading white space and reading an optionally signed decimal
+// number. A number out of its type's range (int for %d; a magnitude above
+// UINT_MAX for %u, where a minus sign negates as strtoul does) is a failed
+// conversion: its argument is left alone and scanning stops there. Any
+// other conversion stops the scan too and reads no argument. Returns the
+// count of assigned arguments, or EOF when the text ends before the first
+// conversion.
 LUM_PLATFORM_API int sscanf(char const *text, char const *format, ...)
     __attribute__((format(scanf, 2, 3)));
 
 // Safe printf-style formatting shared by the printer, the messages and
-// StringBase::doFormat. Each conversion reads exactly one argument of the
-// documented size: %d int, %u unsigned, %c int, %s char const *, %x uintptr_t,
-// %lU uint64_t. Anything else is copied as it stands and reads nothing.
+// StringBase::doFormat. A conversion is '%', flags ("-0+ #"), a width, a
+// precision (".digits", each at most 65535) and one of: %d int, %u
+// unsigned, %c int, %s char const * (null prints "(null)"; the precision
+// caps the bytes taken), %x uintptr_t ('#' adds "0x"), %lU uint64_t, %%.
+// Each reads exactly one argument of that size. An unknown, malformed or
+// unfinished conversion ends the formatting: the rest of the format is
+// copied as it stands and no further argument is read.
 LUM_PLATFORM_API std::string vformat(char const *format, va_list args);
 LUM_PLATFORM_API std::string format(char const *format, ...);
 

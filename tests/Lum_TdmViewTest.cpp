@@ -189,7 +189,9 @@ INSTANTIATE_TEST_SUITE_P(
         StampCase{"3.1", StampCase::ACCEPTED, 3, 1}, StampCase{"3.2", StampCase::TOO_NEW, 3, 2},
         StampCase{"4.0", StampCase::TOO_NEW, 4, 0},
         StampCase{"-1.0", StampCase::TOO_NEW, 0xFFFFFFFFu, 0},
-        StampCase{"", StampCase::TOO_OLD, 0, 0}, StampCase{"abc", StampCase::TOO_OLD, 0, 0}),
+        StampCase{"", StampCase::TOO_OLD, 0, 0}, StampCase{"abc", StampCase::TOO_OLD, 0, 0},
+        StampCase{"4294967296.0", StampCase::TOO_OLD, 0, 0},
+        StampCase{"99999999999999999999.1", StampCase::TOO_OLD, 0, 0}),
     [](::testing::TestParamInfo<StampCase> const &caseInfo) {
       if (!caseInfo.param.stamp)
         return std::string("absent");
