@@ -152,7 +152,8 @@ std::vector<Lum_TlmBlock *> Lum_TlmLibrary::GetTypeBlocks() const {
 Lum_TlmBlock *Lum_TlmLibrary::CreateTypeBlock(char const *name) {
   if (!name || !*name || std::strchr(name, ':')) {
     std::string const message = std::string("A type block name must be non-empty and hold no ") +
-                                "\":\" (library <" + GetLibraryName() + ">).";
+                                "\":\" (library <" + Port::Exception::ShownName(GetLibraryName()) +
+                                ">).";
     throw Lum_ExceptionInvalidTypeBlock("Lum", kSourcePath, kRevision, __LINE__, name ? name : "",
                                         message.c_str(), false);
   }

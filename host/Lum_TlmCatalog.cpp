@@ -120,8 +120,9 @@ std::string FindLibraryFile(std::string const &name, std::string const &personal
 
 [[noreturn]] void ThrowNotFound(std::string const &name, std::string const &personality) {
   std::string const path = Lum_TlmCatalog::GetSearchPath();
-  std::string message = "Type library found neither in the catalog nor as a file " + name +
-                        kFileSuffix + " on the search path \"" + path + "\"";
+  std::string message = "Type library found neither in the catalog nor as a file " +
+                        Port::Exception::ShownName(name) + kFileSuffix + " on the search path \"" +
+                        path + "\"";
   if (!personality.empty())
     message += " (personality " + personality + ")";
   message += ".";

@@ -103,7 +103,7 @@ bool Ora_GraftMgr::Graft(Orb_Block const *source, Orb_Block *destination) {
     if (b == source)
       throw Orb_Exception(kSource, __LINE__, destination->GetName(),
                           (std::string("The destination block lies inside the source block <") +
-                           source->GetName() + ">.")
+                           Port::Exception::ShownName(source->GetNameString()) + ">.")
                               .c_str());
 
   GraftRun run{*this,

@@ -19,8 +19,8 @@ char const *const kSource = "host/Orb_Model";
 void ThrowDuplicate(Orb_Persistent const *parent, char const *kind, char const *name) {
   std::string message = std::string("A ") + kind + " of this name already exists";
   if (parent)
-    message +=
-        std::string(" in ") + Orb_KindName(parent->GetKind()) + " <" + parent->GetName() + ">";
+    message += std::string(" in ") + Orb_KindName(parent->GetKind()) + " <" +
+               Port::Exception::ShownName(parent->GetNameString()) + ">";
   message += ".";
   throw Orb_Exception(kSource, __LINE__, name, message.c_str());
 }

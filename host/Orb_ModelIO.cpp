@@ -55,7 +55,10 @@ static_assert(Orb_Pin::PIN_INPUT == 0 && Orb_Pin::PIN_OUTPUT == 1 &&
                   Orb_Pin::PIN_BIDIRECTIONAL == 2,
               "design databases store pin directions by these numbers");
 
-std::string Quote(std::string_view text) { return "'" + std::string(text) + "'"; }
+// Names come from files and callers and may be huge: messages cut them.
+// Paths are quoted whole.
+std::string Quote(std::string_view name) { return "'" + Port::Exception::ShownName(name) + "'"; }
+std::string QuotePath(std::string_view path) { return "'" + std::string(path) + "'"; }
 
 // Writes a temporary file next to the target through a buffer. Commit syncs
 // it and renames it over the target; until then the destructor removes it,
@@ -114,8 +117,8 @@ ByteWriter::~ByteWriter() {
 }
 
 void ByteWriter::Fail(char const *step, int error) const {
-  std::string const message = "Cannot save design database " + Quote(m_Path) + ": " + step + " " +
-                              Quote(m_TempPath) + ": " + std::strerror(error) + ".";
+  std::string const message = "Cannot save design database " + QuotePath(m_Path) + ": " + step +
+                              " " + QuotePath(m_TempPath) + ": " + std::strerror(error) + ".";
   throw Orb_Exception(kSource, __LINE__, m_Path.c_str(), message.c_str());
 }
 
@@ -232,7 +235,7 @@ bool ByteReader::Fill() {
 }
 
 void ByteReader::Refuse(std::string const &what) const {
-  std::string const message = "Design database " + Quote(m_Path) + " " + what + ".";
+  std::string const message = "Design database " + QuotePath(m_Path) + " " + what + ".";
   throw Orb_Exception(kSource, __LINE__, m_Path.c_str(), message.c_str());
 }
 
@@ -394,7 +397,7 @@ void Orb_Model::Save(char const *path) const {
                         ("Cannot save model " + Quote(m_Name) + ": no file path given.").c_str());
   if (m_ReadOnly)
     throw Orb_Exception(kSource, __LINE__, target.c_str(),
-                        ("Cannot save design database " + Quote(target) + ": model " +
+                        ("Cannot save design database " + QuotePath(target) + ": model " +
                          Quote(m_Name) + " is read-only.")
                             .c_str());
   Orb_ModelIO::Save(*this, target);

@@ -2,8 +2,10 @@
 
 #include "Lum_PlatformApi.h"
 
+#include <cstddef>
 #include <exception>
 #include <string>
+#include <string_view>
 
 namespace Port {
 
@@ -25,8 +27,15 @@ public:
   bool GetFlag() const { return m_Flag; }
 
   // One readable line with every field: "<subsystem> error at <file>:<line>
-  // (<revision>): <<object>> <message>".
+  // (<revision>): <<object>> <message>". The object name appears as
+  // ShownName gives it; GetObjectName keeps it whole.
   char const *what() const noexcept override { return m_What.c_str(); }
+
+  // Names longer than this are cut when a message quotes them.
+  static constexpr std::size_t kMaxShownName = 256;
+  // `name` as messages quote it: whole up to kMaxShownName bytes; longer, its
+  // first bytes (never half a UTF-8 character) followed by "... (<n> bytes)".
+  static std::string ShownName(std::string_view name);
 
 private:
   std::string m_Subsystem;

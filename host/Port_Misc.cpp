@@ -27,8 +27,19 @@ Exception::Exception(char const *subsystem, char const *file, char const *revisi
     m_What += " (" + m_Revision + ")";
   m_What += ": ";
   if (!m_ObjectName.empty())
-    m_What += "<" + m_ObjectName + "> ";
+    m_What += "<" + ShownName(m_ObjectName) + "> ";
   m_What += m_Message;
+}
+
+std::string Exception::ShownName(std::string_view name) {
+  if (name.size() <= kMaxShownName)
+    return std::string(name);
+  std::size_t cut = kMaxShownName;
+  // Back to the start of a UTF-8 sequence: continuation bytes are 10xxxxxx.
+  for (std::size_t back = 0; back < 3 && (static_cast<unsigned char>(name[cut]) & 0xC0) == 0x80;
+       ++back)
+    --cut;
+  return std::string(name.substr(0, cut)) + "... (" + std::to_string(name.size()) + " bytes)";
 }
 
 Exception::~Exception() = default;

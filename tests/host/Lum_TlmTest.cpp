@@ -177,6 +177,29 @@ TEST_F(TlmTest, LocalLibraryTravelsWithTheDatabase) {
   EXPECT_EQ(Lum_TlmLibrary::GetLocalLibrary(&reopened, m_Pic), local);
 }
 
+// A huge name is cut in what() and in the message, never in GetObjectName; a cut keeps UTF-8 whole.
+TEST_F(TlmTest, MessagesCutLongNames) {
+  std::string const name(std::size_t(1) << 20, 'n');
+  try {
+    Lum_TlmLibrary::LoadLibrary(name.c_str(), m_Pic);
+    ADD_FAILURE() << "loaded a library that does not exist";
+  } catch (Lum_ExceptionInvalidLibrary const &e) {
+    EXPECT_EQ(e.GetObjectName(), name);
+    std::string const shown = std::string(256, 'n') + "... (1048576 bytes)";
+    EXPECT_NE(std::string(e.what()).find("<" + shown + ">"), std::string::npos);
+    EXPECT_LT(std::string(e.what()).size(), 1024u);
+    EXPECT_LT(e.GetMessage().size(), 512u);
+  }
+
+  // "\xc3\xa9" straddles the limit: the cut falls before it.
+  std::string const accented = std::string(255, 'a') + "\xc3\xa9" + std::string(10, 'b');
+  Port::Exception const e("Lum", "f", "", 1, accented.c_str(), "m", false);
+  EXPECT_EQ(std::string(e.what()),
+            "Lum error at f:1: <" + std::string(255, 'a') + "... (267 bytes)> m");
+  std::string const exact(256, 'x');
+  EXPECT_EQ(Port::Exception::ShownName(exact), exact);
+}
+
 // Type IDs represent exactly their block or pin (default: null); the registry counts by name.
 TEST_F(TlmTest, TypeIdentifiersAndRegistry) {
   Lum_TlmModel model("m", "m", "", false);
