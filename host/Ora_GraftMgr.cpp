@@ -2,6 +2,7 @@
 
 #include "Orb_Exception.h"
 
+#include <algorithm>
 #include <string>
 #include <utility>
 #include <vector>
@@ -9,6 +10,21 @@
 namespace {
 
 char const *const kSource = "host/Ora_GraftMgr";
+
+// Levels of blocks in the subtree of `block`, itself included; counting stops
+// once it passes `limit`.
+unsigned SubtreeLevels(Orb_Block const *block, unsigned limit) {
+  std::vector<std::pair<Orb_Block const *, unsigned>> pending{{block, 1}};
+  unsigned levels = 0;
+  while (!pending.empty() && levels <= limit) {
+    auto const [next, level] = pending.back();
+    pending.pop_back();
+    levels = std::max(levels, level);
+    for (Orb_Block const *child : next->GetBlocks())
+      pending.emplace_back(child, level + 1);
+  }
+  return levels;
+}
 
 // One graft: the copies made so far, keyed by their sources, so that
 // connections are resolved in constant time per pin.
@@ -105,6 +121,16 @@ bool Ora_GraftMgr::Graft(Orb_Block const *source, Orb_Block *destination) {
                           (std::string("The destination block lies inside the source block <") +
                            Port::Exception::ShownName(source->GetNameString()) + ">.")
                               .c_str());
+  // The source's children land one level below the destination: refused here,
+  // before anything is copied, rather than halfway through.
+  unsigned const depth = destination->GetDepth();
+  if (depth - 1 + SubtreeLevels(source, Orb_MaxBlockDepth) > Orb_MaxBlockDepth)
+    throw Orb_Exception(kSource, __LINE__, source->GetName(),
+                        ("Grafted under block <" +
+                         Port::Exception::ShownName(destination->GetNameString()) +
+                         ">, copies of this block's children would lie deeper than " +
+                         std::to_string(Orb_MaxBlockDepth) + " levels.")
+                            .c_str());
 
   GraftRun run{*this,
                source,

@@ -137,10 +137,23 @@ Orb_Block *Orb_Block::GetParent() const {
                                                         : nullptr;
 }
 
+unsigned Orb_Block::GetDepth() const {
+  unsigned depth = 1;
+  for (Orb_Block const *parent = GetParent(); parent; parent = parent->GetParent())
+    ++depth;
+  return depth;
+}
+
 Orb_Block *Orb_Block::CreateBlock(char const *name, int /*flags*/) {
   CheckName(name, "block");
   if (m_Blocks.Find(name))
     ThrowDuplicate(this, "block", name);
+  if (GetDepth() >= Orb_MaxBlockDepth)
+    throw Orb_Exception(kSource, __LINE__, name,
+                        ("A child block of block <" + Port::Exception::ShownName(GetNameString()) +
+                         "> would lie deeper than " + std::to_string(Orb_MaxBlockDepth) +
+                         " levels.")
+                            .c_str());
   auto *block = new Orb_Block(GetModel(), this, m_pView, name);
   m_Blocks.Add(block);
   return GetModel()->Announce(block);

@@ -35,6 +35,11 @@ constexpr unsigned Orb_KindCount = 7;
 
 LUM_PLATFORM_API char const *Orb_KindName(Orb_Kind kind);
 
+// The deepest a block may lie: a view's top block is at depth 1, a child
+// block one deeper than its parent. Far beyond real designs, it bounds every
+// walk of a block tree; creating, grafting or reading a deeper block fails.
+constexpr unsigned Orb_MaxBlockDepth = 1000;
+
 // Base of every host object: name, kind, parent, owning model, bridge id and
 // properties. Host objects are made and freed by their owners only.
 class LUM_PLATFORM_API Orb_Persistent : public Orb_PropertyHolder {
@@ -169,10 +174,14 @@ public:
   Orb_Pin *GetPinByName(char const *name) const { return m_Pins.Find(name); }
   Orb_Signal *GetSignalByName(char const *name) const { return m_Signals.Find(name); }
 
+  // 1 for a view's top block, one more per parent block (walks the parents).
+  unsigned GetDepth() const;
+
   // Creation fires the OnCreate event to every subscribed context before it
-  // returns. A duplicate name throws Orb_Exception and creates nothing. If an
-  // event handler throws, the new object is deleted again (with its delete
-  // events) and the exception passes unchanged.
+  // returns. A duplicate name, or a child block that would lie deeper than
+  // Orb_MaxBlockDepth, throws Orb_Exception and creates nothing. If an event
+  // handler throws, the new object is deleted again (with its delete events)
+  // and the exception passes unchanged.
   Orb_Block *CreateBlock(char const *name, int flags = 0);
   Orb_Pin *CreatePin(char const *name, Orb_Pin::PIN_DIRECTION direction);
   Orb_Signal *CreateSignal(char const *name);

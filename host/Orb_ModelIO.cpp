@@ -85,6 +85,8 @@ public:
   // Throws Orb_Exception naming the target if the data cannot be made
   // durable or the rename fails.
   void Commit();
+  // Throws Orb_Exception naming the target and `what`.
+  [[noreturn]] void Refuse(std::string const &what) const;
 
 private:
   [[noreturn]] void Fail(char const *step, int error) const;
@@ -119,6 +121,12 @@ ByteWriter::~ByteWriter() {
 void ByteWriter::Fail(char const *step, int error) const {
   std::string const message = "Cannot save design database " + QuotePath(m_Path) + ": " + step +
                               " " + QuotePath(m_TempPath) + ": " + std::strerror(error) + ".";
+  throw Orb_Exception(kSource, __LINE__, m_Path.c_str(), message.c_str());
+}
+
+void ByteWriter::Refuse(std::string const &what) const {
+  std::string const message =
+      "Cannot save design database " + QuotePath(m_Path) + ": " + what + ".";
   throw Orb_Exception(kSource, __LINE__, m_Path.c_str(), message.c_str());
 }
 
@@ -341,14 +349,16 @@ private:
   static void Rollback(Orb_Model &model, std::vector<Orb_DesignMgr *> const &loaded,
                        std::vector<std::string> const &companionKeys);
 
-  void WriteModel(Orb_Model const &model);
+  // `companionKey`: the key a companion model is written under, else null.
+  void WriteModel(Orb_Model const &model, std::string_view const *companionKey = nullptr);
   void WriteDesignMgr(Orb_DesignMgr const *designMgr);
   void WriteView(Orb_View const *view);
   void WriteBlock(Orb_Block const *block);
   void WriteProperties(Orb_PropertyHolder const *holder);
 
   void ReadHeader();
-  void ReadModel(Section &section);
+  // A companion's section holds no companion sections of its own.
+  void ReadModel(Section &section, bool companion = false);
   void ReadCompanion(Section &section);
   // Reads a design manager's or a design's records: its properties, then its
   // children of one kind, each read by `readChild`, up to the closing 'E'.
@@ -384,6 +394,8 @@ private:
   // Opening: the current view's pins and signals in number order.
   std::vector<Orb_Pin *> m_Pins;
   std::vector<Orb_Signal *> m_Signals;
+  // The blocks ReadBlock is inside of, outermost first.
+  std::vector<Orb_Block *> m_OpenBlocks;
   std::string m_Text;
 };
 
@@ -414,7 +426,7 @@ void Orb_ModelIO::Save(Orb_Model const &model, std::string const &path) {
   out.Commit();
 }
 
-void Orb_ModelIO::WriteModel(Orb_Model const &model) {
+void Orb_ModelIO::WriteModel(Orb_Model const &model, std::string_view const *companionKey) {
   auto const pins = static_cast<unsigned>(Orb_Kind::Pin);
   auto const signals = static_cast<unsigned>(Orb_Kind::Signal);
   if (m_PinNumber.size() < model.m_NextBridgeId[pins])
@@ -437,9 +449,14 @@ void Orb_ModelIO::WriteModel(Orb_Model const &model) {
       companions.emplace(key, companionModel);
   for (auto const &[key, companionModel] : model.m_LoadedCompanions)
     companions.emplace(key, companionModel.get());
+  // Open reads no companion section inside another: refuse rather than write
+  // a database that cannot be opened again.
+  if (companionKey && !companions.empty())
+    m_pOut->Refuse("companion " + Quote(*companionKey) + " has companion " +
+                   Quote(companions.begin()->first) + " of its own, and companions cannot nest");
   for (auto const &[key, companionModel] : companions) {
     m_pOut->Named('K', key);
-    WriteModel(*companionModel);
+    WriteModel(*companionModel, &key);
   }
   m_pOut->Tag('Z');
   m_pOut->End();
@@ -633,7 +650,7 @@ void Orb_ModelIO::ReadHeader() {
   m_pIn->End();
 }
 
-void Orb_ModelIO::ReadModel(Section &section) {
+void Orb_ModelIO::ReadModel(Section &section, bool companion) {
   for (;;) {
     char const tag = m_pIn->Tag();
     if (tag == 'D') {
@@ -647,6 +664,8 @@ void Orb_ModelIO::ReadModel(Section &section) {
       section.designMgrs.Add(designMgr);
       ReadDesignMgr(designMgr);
     } else if (tag == 'K') {
+      if (companion)
+        m_pIn->Corrupt("companion section inside a companion section");
       ReadCompanion(section);
     } else if (tag == 'Z') {
       m_pIn->End();
@@ -673,10 +692,8 @@ void Orb_ModelIO::ReadCompanion(Section &section) {
   auto companion = std::make_unique<Orb_Model>(name.c_str(), dbName.c_str(), "", false);
   {
     Section inner(*companion);
-    ReadModel(inner);
+    ReadModel(inner, true);
     Commit(inner);
-    for (auto &[innerKey, innerModel] : inner.companions)
-      companion->m_LoadedCompanions.emplace(innerKey, std::move(innerModel));
   }
   section.companions.emplace(std::move(key), std::move(companion));
 }
@@ -747,10 +764,15 @@ void Orb_ModelIO::ReadView(Orb_View *view) {
   }
 }
 
-void Orb_ModelIO::ReadBlock(Orb_Block *block) {
-  Orb_Model *model = block->GetModel();
-  Orb_PropertyHolder *holder = block;
-  for (;;) {
+void Orb_ModelIO::ReadBlock(Orb_Block *top) {
+  // The file decides how deep blocks nest, so the open blocks live on a stack
+  // of our own rather than on the call stack.
+  Orb_Model *model = top->GetModel();
+  std::vector<Orb_Block *> &open = m_OpenBlocks;
+  open.assign(1, top);
+  Orb_PropertyHolder *holder = top;
+  while (!open.empty()) {
+    Orb_Block *block = open.back();
     char const tag = m_pIn->Tag();
     if (ReadProperty(tag, holder))
       continue;
@@ -781,13 +803,19 @@ void Orb_ModelIO::ReadBlock(Orb_Block *block) {
       m_pIn->End();
       if (block->m_Blocks.Find(name))
         Duplicate("block", name, block);
+      if (open.size() >= Orb_MaxBlockDepth)
+        m_pIn->Corrupt("block " + Quote(name) + " nested deeper than " +
+                       std::to_string(Orb_MaxBlockDepth) + " levels");
       auto *child = new Orb_Block(model, block, block->m_pView, std::move(name));
       block->m_Blocks.Add(child);
-      ReadBlock(child);
-      holder = nullptr;
+      open.push_back(child);
+      holder = child;
     } else if (tag == 'E') {
       m_pIn->End();
-      return;
+      open.pop_back();
+      // Properties belong right after their object's record, not after its
+      // children.
+      holder = nullptr;
     } else {
       Unexpected(tag, "block");
     }

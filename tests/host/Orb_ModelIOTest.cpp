@@ -158,6 +158,16 @@ TEST_F(Orb_ModelIOTest, RefusesBrokenFiles) {
   ExpectRefused(PathOf("missing.db"), "cannot be opened");
   ExpectRefused(m_Dir, "cannot be read");
 
+  // Blocks c nested one level deeper than allowed below top; refused at the end of the deepest
+  // block's record.
+  std::string deep;
+  for (unsigned level = 1; level <= Orb_MaxBlockDepth; ++level)
+    deep += "B 1:c\n";
+  std::string const tooDeep = "corrupt at byte " +
+                              std::to_string(kSmallDatabase.find("B 1:c\n") + deep.size()) +
+                              ": block 'c' nested deeper than 1000 levels";
+  for (unsigned level = 1; level <= Orb_MaxBlockDepth; ++level)
+    deep += "E\n";
   // Each replaces `from` once in kSmallDatabase; an empty `from` replaces all.
   struct {
     std::string_view from, to;
@@ -173,6 +183,8 @@ TEST_F(Orb_ModelIOTest, RefusesBrokenFiles) {
       {"S 1:s\n", "S 1:s\nP 1:k 0:\nP 1:k 0:\n", "second property named 'k'"},
       {"1:p", std::string_view("1:\0", 3), "NUL byte"},
       {"Z\n", "Z\nZ\n", "data after the end record"},
+      {"B 1:c\nI 1 1:q\nE\n", deep, tooDeep.c_str()},
+      {"E\nZ\n", "E\nK 1:a\nM 1:m 1:d\nK 1:b\n", "companion section inside a companion"},
   };
   for (auto const &breakage : breakages) {
     SCOPED_TRACE(breakage.expected);
@@ -249,6 +261,21 @@ TEST_F(Orb_ModelIOTest, CompanionsRoundTrip) {
   refusing.refuse = "main";
   EXPECT_THROW(failed.Open(m_Path.c_str()), std::runtime_error);
   EXPECT_EQ(failed.TakeLoadedCompanion("local"), nullptr);
+
+  // A companion with a companion of its own cannot be stored: the save is refused.
+  auto nested = std::make_unique<Orb_Model>("lib", "libdb", "", false);
+  nested->SetCompanion(
+      "inner", std::make_unique<TestCompanion>(std::make_unique<Orb_Model>("in", "db", "", false)));
+  Orb_Model nesting("nesting", "db", "", false);
+  nesting.SetCompanion("local", std::make_unique<TestCompanion>(std::move(nested)));
+  std::string const previous = ReadBytes(m_Path);
+  try {
+    nesting.Save(m_Path.c_str());
+    ADD_FAILURE() << "saved nested companions";
+  } catch (Orb_Exception const &e) {
+    EXPECT_NE(e.GetMessage().find("companions cannot nest"), std::string::npos) << e.what();
+  }
+  EXPECT_EQ(ReadBytes(m_Path), previous);
 }
 
 } // namespace

@@ -1,11 +1,13 @@
 #include "host/HostTestSupport.h"
 
+#include "Ora_GraftMgr.h"
 #include "Orb_Exception.h"
 #include "Orb_SortFtor.h"
 
 #include <gtest/gtest.h>
 
 #include <algorithm>
+#include <filesystem>
 #include <functional>
 #include <memory>
 #include <stdexcept>
@@ -178,6 +180,38 @@ TEST_F(HostModelTest, DuplicateNamesRefused) {
   EXPECT_TRUE(log.empty()) << Joined(log);
   EXPECT_EQ(top->GetSignalByName("p"), top->CreateSignal("p"));
   EXPECT_EQ(top->GetPinByName("p"), p);
+}
+
+// Blocks nest at most Orb_MaxBlockDepth deep: a deeper block or graft creates nothing, and the
+// deepest chain saves and reopens.
+TEST_F(HostModelTest, BlockDepthIsBounded) {
+  Orb_Block *source = top->CreateBlock("source");
+  source->CreateBlock("x");
+  Orb_Block *deepest = c;
+  while (deepest->GetDepth() < Orb_MaxBlockDepth)
+    deepest = deepest->CreateBlock("b");
+  log.clear();
+  std::size_t const before = ObjectCount(*host);
+  try {
+    deepest->CreateBlock("b");
+    ADD_FAILURE() << "a block below the deepest level was created";
+  } catch (Orb_Exception const &e) {
+    EXPECT_EQ(e.GetObjectName(), "b");
+    EXPECT_NE(e.GetMessage().find("deeper than 1000 levels"), std::string::npos) << e.what();
+  }
+  // A copy of x would land one level too deep: the graft copies nothing at all.
+  EXPECT_THROW(Ora_GraftMgr(false, false).Graft(source, deepest), Orb_Exception);
+  EXPECT_EQ(ObjectCount(*host), before);
+  EXPECT_TRUE(log.empty()) << Joined(log);
+  EXPECT_TRUE(Ora_GraftMgr(false, false).Graft(source, deepest->GetParent()));
+  EXPECT_EQ(deepest->GetParent()->GetBlockByName("x")->GetDepth(), Orb_MaxBlockDepth);
+
+  std::string const path = ::testing::TempDir() + "Orb_ModelTest_deep.db";
+  host->Save(path.c_str());
+  Orb_Model reopened("reopened", "db", "", false);
+  reopened.Open(path.c_str());
+  std::filesystem::remove(path);
+  EXPECT_EQ(Dump(reopened), Dump(*host));
 }
 
 // Orders pins by direction only, so pins of one direction compare equal.
