@@ -2,8 +2,9 @@
 //
 // A design database is a magic line followed by records. A record is a tag
 // byte, fields each preceded by one space, and a newline. Numbers are decimal;
-// strings are "<length>:<bytes>", so every byte but NUL survives. Design
-// managers, designs, views and blocks end with an 'E' record; properties
+// strings are "<length>:<bytes>", so every byte survives: property values
+// and companion keys may hold NUL, names may not (the API takes names as C
+// strings). Design managers, designs, views and blocks end with an 'E' record; properties
 // follow the record of the object they belong to. Pins and signals are
 // numbered per view in the order they are written, and a view's connections
 // and networks, written after its block tree, refer to them by number.
@@ -197,7 +198,10 @@ public:
   // A record's tag; the end of the file here means the file was cut.
   char Tag();
   std::uint64_t Num();
+  // A string of any bytes.
   void Str(std::string &out);
+  // A string without NUL.
+  void Name(std::string &out);
   void End() { Expect('\n', "end of record"); }
 
   [[noreturn]] void Refuse(std::string const &what) const;
@@ -308,13 +312,16 @@ void ByteReader::Str(std::string &out) {
       Truncated();
     std::size_t const take =
         static_cast<std::size_t>(std::min<std::uint64_t>(left, m_Size - m_Pos));
-    char const *data = m_Buffer.data() + m_Pos;
-    if (std::memchr(data, '\0', take))
-      Corrupt("NUL byte in a string");
-    out.append(data, take);
+    out.append(m_Buffer.data() + m_Pos, take);
     m_Pos += take;
     left -= take;
   }
+}
+
+void ByteReader::Name(std::string &out) {
+  Str(out);
+  if (out.find('\0') != std::string::npos)
+    Corrupt("NUL byte in a name");
 }
 
 } // namespace
@@ -645,8 +652,8 @@ void Orb_ModelIO::ReadHeader() {
   // The model's own names are informational: Open keeps the target's.
   if (m_pIn->Tag() != 'M')
     m_pIn->Corrupt("expected the model record");
-  m_pIn->Str(m_Text);
-  m_pIn->Str(m_Text);
+  m_pIn->Name(m_Text);
+  m_pIn->Name(m_Text);
   m_pIn->End();
 }
 
@@ -686,8 +693,8 @@ void Orb_ModelIO::ReadCompanion(Section &section) {
     m_pIn->Corrupt("expected the model record of companion " + Quote(key));
   std::string name;
   std::string dbName;
-  m_pIn->Str(name);
-  m_pIn->Str(dbName);
+  m_pIn->Name(name);
+  m_pIn->Name(dbName);
   m_pIn->End();
   auto companion = std::make_unique<Orb_Model>(name.c_str(), dbName.c_str(), "", false);
   {
@@ -855,7 +862,7 @@ bool Orb_ModelIO::ReadProperty(char tag, Orb_PropertyHolder *holder) {
   if (!holder)
     m_pIn->Corrupt("property record without an object");
   std::string name;
-  m_pIn->Str(name);
+  m_pIn->Name(name);
   std::size_t const before = holder->GetProperties().size();
   Orb_Property *property = nullptr;
   if (tag == 'P') {
@@ -872,9 +879,9 @@ bool Orb_ModelIO::ReadProperty(char tag, Orb_PropertyHolder *holder) {
     property = holder->CreatePropertyList(name.c_str());
     std::string memberName;
     for (std::uint64_t n = m_pIn->Num(); n > 0; --n) {
-      m_pIn->Str(memberName);
+      m_pIn->Name(memberName);
       m_pIn->Str(m_Text);
-      property->CreatePropertyString(memberName.c_str(), m_Text.c_str());
+      property->CreatePropertyString(memberName.c_str(), "")->SetStringValue(m_Text);
     }
   }
   m_pIn->End();
@@ -885,7 +892,7 @@ bool Orb_ModelIO::ReadProperty(char tag, Orb_PropertyHolder *holder) {
 
 std::string Orb_ModelIO::ReadName(char const *kind) {
   std::string name;
-  m_pIn->Str(name);
+  m_pIn->Name(name);
   if (name.empty())
     m_pIn->Corrupt(std::string("empty ") + kind + " name");
   return name;

@@ -74,7 +74,9 @@ void Orb_PropertyHolder::CopyPropertiesFrom(Orb_PropertyHolder const &other) {
     Orb_Property *copy = nullptr;
     switch (source->GetKind()) {
     case Orb_Property::STRING:
-      CreatePropertyString(source->GetName(), source->GetStringValue());
+      // Whole values: GetStringValue would stop at a NUL byte.
+      Insert(std::make_unique<Orb_Property>(Orb_Property::STRING, source->GetName(),
+                                            source->GetValue()));
       break;
     case Orb_Property::STRING_LIST:
       copy = CreatePropertyStringList(source->GetName());
@@ -84,7 +86,7 @@ void Orb_PropertyHolder::CopyPropertiesFrom(Orb_PropertyHolder const &other) {
     case Orb_Property::LIST:
       copy = CreatePropertyList(source->GetName());
       for (auto const &member : source->GetMembers())
-        copy->CreatePropertyString(member->GetName(), member->GetStringValue());
+        copy->CreatePropertyString(member->GetName(), "")->SetStringValue(member->GetValue());
       break;
     }
   }

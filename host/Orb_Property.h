@@ -11,7 +11,14 @@ class Stream;
 }
 
 // A named property of a host object: a string, a list of strings, or a list
-// of named string members. Values are arbitrary bytes without NUL.
+// of named string members.
+//
+// Values are arbitrary bytes. A NUL byte, which only the std::string setters
+// (SetStringValue, AppendString) can put in, is a byte like any other: it is
+// copied, saved and read back, and GetValue and GetStrings give every byte;
+// GetStringValue, a C string, ends at the first NUL. Names are C strings and
+// so never hold NUL; a design database with a NUL in any name is refused as
+// corrupt.
 class LUM_PLATFORM_API Orb_Property {
 public:
   enum Kind { STRING, STRING_LIST, LIST };

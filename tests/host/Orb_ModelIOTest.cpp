@@ -22,6 +22,7 @@ namespace fs = std::filesystem;
 namespace {
 
 using namespace HostTest;
+using namespace std::string_literals;
 
 // Nested blocks, pins out of name order, cross-block connections, networks, awkward properties.
 void BuildSample(Orb_Model &model) {
@@ -47,6 +48,10 @@ void BuildSample(Orb_Model &model) {
   list->CreatePropertyString("k", "1");
   list->CreatePropertyString("k", "2");
   list->CreatePropertyString("j", "\xfe:\n");
+  // NUL bytes in values, which the std::string setters accept.
+  alu->CreatePropertyString("nul", "")->SetStringValue("\0a\0"s);
+  strings->AppendString("b\0"s);
+  list->CreatePropertyString("n", "")->SetStringValue("\0"s);
   Orb_Network *clocks = view->CreateNetwork("clocks");
   clocks->AddSignal(carry);
   clocks->AddSignal(clk);
@@ -100,6 +105,9 @@ TEST_F(Orb_ModelIOTest, RoundTripGivesIdenticalModel) {
   Orb_Model reopened("sample", "db", "", false);
   reopened.Open(m_Path.c_str());
   EXPECT_EQ(Dump(reopened), Dump(m_Sample));
+  Orb_Block const *alu =
+      reopened.GetDesignMgrs()[0]->GetDesigns()[0]->GetViews()[1]->GetBlock()->GetBlocks()[0];
+  EXPECT_EQ(alu->GetPropertyByName("nul")->GetValue(), "\0a\0"s);
   reopened.Save(PathOf("b.db").c_str());
   EXPECT_EQ(ReadBytes(PathOf("b.db")), ReadBytes(m_Path));
 
@@ -128,10 +136,13 @@ TEST_F(Orb_ModelIOTest, ThrowingHandlerUnloadsEverything) {
   }
 }
 
-// A small hand-written database, valid as it is; broken variants follow.
-constexpr std::string_view kSmallDatabase = "Orb design database\nV 1\nM 1:m 1:d\nD 2:dm\nG 1:g\n"
-                                            "W 1:v\nB 3:top\nI 0 1:p\nS 1:s\nB 1:c\nI 1 1:q\nE\n"
-                                            "E\nC 0 1 0\nN 1:n 1 0\nE\nE\nE\nZ\n";
+// A small hand-written database, valid as it is (a NUL byte in a value included); broken
+// variants follow.
+using namespace std::string_view_literals;
+constexpr std::string_view kSmallDatabase =
+    "Orb design database\nV 1\nM 1:m 1:d\nD 2:dm\nG 1:g\n"
+    "W 1:v\nB 3:top\nI 0 1:p\nS 1:s\nP 1:k 2:\0v\n"
+    "B 1:c\nI 1 1:q\nE\nE\nC 0 1 0\nN 1:n 1 0\nE\nE\nE\nZ\n"sv;
 
 // It opens as written, with OnLoad once per object in the documented order, the model last.
 TEST_F(Orb_ModelIOTest, OpensHandWrittenDatabaseWithLoadEvents) {
@@ -140,10 +151,10 @@ TEST_F(Orb_ModelIOTest, OpensHandWrittenDatabaseWithLoadEvents) {
   RecModel client(&log, &model);
   model.Open(m_Path.c_str());
   EXPECT_EQ(Dump(model), "design manager dm\n design g\n  view v\n   block top\n"
-                         "    pin p input -> top/s\n    signal s <- top/p\n    block c\n"
-                         "     pin q output\n   network n top/s\n");
+                         "    pin p input -> top/s\n    signal s <k=\0v> <- top/p\n    block c\n"
+                         "     pin q output\n   network n top/s\n"s);
   EXPECT_EQ(Joined(log), "load design manager dm; load design g; load view v; load block top; "
-                         "load pin p; load signal s; load block c; load pin q; "
+                         "load pin p; load signal s +properties; load block c; load pin q; "
                          "load network n; load model target");
 }
 
@@ -181,7 +192,8 @@ TEST_F(Orb_ModelIOTest, RefusesBrokenFiles) {
       {"C 0 1 0", "C 0 1 7", "pin 7 of a view with 2 pins"},
       {"S 1:s\n", "I 2 1:p\n", "second pin named 'p'"},
       {"S 1:s\n", "S 1:s\nP 1:k 0:\nP 1:k 0:\n", "second property named 'k'"},
-      {"1:p", std::string_view("1:\0", 3), "NUL byte"},
+      {"1:p", "1:\0"sv, "NUL byte in a name"},
+      {"P 1:k", "P 2:k\0"sv, "NUL byte in a name"},
       {"Z\n", "Z\nZ\n", "data after the end record"},
       {"B 1:c\nI 1 1:q\nE\n", deep, tooDeep.c_str()},
       {"E\nZ\n", "E\nK 1:a\nM 1:m 1:d\nK 1:b\n", "companion section inside a companion"},

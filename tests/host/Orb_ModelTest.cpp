@@ -16,6 +16,7 @@
 namespace {
 
 using namespace HostTest;
+using namespace std::string_literals;
 
 // dm / d / v with top block "top" (pin p, signal s, child block c with pin
 // cp) and network n holding s; p and cp connect to s.
@@ -256,10 +257,12 @@ TEST(PropertyTest, ReplaceDeleteAndCopyInPlace) {
   holder.DeleteProperty(other.CreatePropertyString("C", "other"));
   holder.DeleteProperty(holder.GetPropertyByName("B"));
   holder.DeleteProperty("D");
-  other.CreatePropertyList("L")->CreatePropertyString("k", "v");
+  other.CreatePropertyList("L")->CreatePropertyString("k", "v")->SetStringValue("v\0w"s);
+  other.CreatePropertyString("N", "")->SetStringValue("\0n"s);
   holder.CopyPropertiesFrom(other);
   holder.CopyPropertiesFrom(holder);
-  EXPECT_EQ(PropertiesOf(holder), "A[x] C=other L{k:v}");
+  // Values are copied whole, NUL bytes included.
+  EXPECT_EQ(PropertiesOf(holder), "A[x] C=other L{k:v\0w} N=\0n"s);
 }
 
 } // namespace
