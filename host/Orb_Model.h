@@ -331,7 +331,10 @@ public:
 
   // Writes the whole model (and its companions) to `path` through a temporary
   // file that is flushed and renamed over the target: a failed save throws
-  // Orb_Exception and leaves the previous file unchanged.
+  // Orb_Exception and leaves the previous file unchanged. A symbolic link at
+  // `path` stays: the file it leads to is replaced. A replaced file keeps its
+  // permission bits. Temporary files of earlier saves to the same target
+  // whose process is gone are removed.
   void Save(char const *path) const;
   void Save() const { Save(m_Path.c_str()); }
 

@@ -38,10 +38,15 @@
 #include <charconv>
 #include <cstdint>
 #include <cstring>
+#include <dirent.h>
 #include <fcntl.h>
 #include <map>
+#include <memory>
+#include <signal.h>
 #include <string>
 #include <string_view>
+#include <sys/stat.h>
+#include <system_error>
 #include <unistd.h>
 #include <unordered_set>
 #include <vector>
@@ -61,9 +66,75 @@ static_assert(Orb_Pin::PIN_INPUT == 0 && Orb_Pin::PIN_OUTPUT == 1 &&
 std::string Quote(std::string_view name) { return "'" + Port::Exception::ShownName(name) + "'"; }
 std::string QuotePath(std::string_view path) { return "'" + std::string(path) + "'"; }
 
+// The file a save replaces: `path`, or the file that its chain of symbolic
+// links ends at (which may not exist yet). Empty with errno set when a link
+// cannot be read or the chain does not end.
+std::string ResolveLinks(std::string path) {
+  for (int hop = 0; hop < 40; ++hop) {
+    struct stat status {};
+    if (::lstat(path.c_str(), &status) != 0 || !S_ISLNK(status.st_mode))
+      return path;
+    std::string link(static_cast<std::size_t>(status.st_size) + 1, '\0');
+    for (;;) {
+      ssize_t const length = ::readlink(path.c_str(), link.data(), link.size());
+      if (length < 0)
+        return std::string();
+      if (static_cast<std::size_t>(length) < link.size()) {
+        link.resize(static_cast<std::size_t>(length));
+        break;
+      }
+      link.resize(link.size() * 2 + 64); // changed since lstat, or st_size 0
+    }
+    // A relative link is relative to the directory that holds it.
+    std::size_t const slash = path.rfind('/');
+    if ((!link.empty() && link.front() == '/') || slash == std::string::npos) {
+      path = std::move(link);
+    } else {
+      path.resize(slash + 1);
+      path += link;
+    }
+  }
+  errno = ELOOP;
+  return std::string();
+}
+
+// Removes the "<target>.tmp.<pid>.<n>" files of processes that are gone,
+// left behind by saves killed midway. A process that still exists, even one
+// we may not signal, keeps its files; anything that cannot be removed stays.
+void RemoveStaleTemporaries(std::string const &target) {
+  std::size_t const slash = target.rfind('/');
+  std::string const directory = slash == std::string::npos ? "." : target.substr(0, slash + 1);
+  std::string const prefix =
+      (slash == std::string::npos ? target : target.substr(slash + 1)) + ".tmp.";
+  std::unique_ptr<DIR, int (*)(DIR *)> dir(::opendir(directory.c_str()), &::closedir);
+  if (!dir)
+    return;
+  pid_t const self = ::getpid();
+  while (dirent const *entry = ::readdir(dir.get())) {
+    std::string_view const name = entry->d_name;
+    if (name.size() <= prefix.size() || name.compare(0, prefix.size(), prefix) != 0)
+      continue;
+    // "<pid>.<n>", both decimal, nothing more.
+    char const *const first = name.data() + prefix.size();
+    char const *const last = name.data() + name.size();
+    pid_t pid = 0;
+    auto const parsed = std::from_chars(first, last, pid);
+    if (parsed.ec != std::errc() || pid <= 0 || pid == self || parsed.ptr == last ||
+        *parsed.ptr != '.' || parsed.ptr + 1 == last)
+      continue;
+    if (!std::all_of(parsed.ptr + 1, last, [](char c) { return c >= '0' && c <= '9'; }))
+      continue;
+    if (::kill(pid, 0) == 0 || errno != ESRCH)
+      continue;
+    ::unlinkat(::dirfd(dir.get()), entry->d_name, 0);
+  }
+}
+
 // Writes a temporary file next to the target through a buffer. Commit syncs
 // it and renames it over the target; until then the destructor removes it,
-// so a failed save leaves the target as it was.
+// so a failed save leaves the target as it was. The target is the file a
+// symbolic link at the path leads to (the link stays), and a file it
+// replaces passes on its permission bits.
 class ByteWriter {
 public:
   explicit ByteWriter(std::string const &path);
@@ -94,18 +165,29 @@ private:
   void Flush();
 
   std::string m_Path;
+  std::string m_Target;
   std::string m_TempPath;
   int m_Fd = -1;
   bool m_Committed = false;
+  // The permission bits of the file being replaced; -1 when there is none.
+  int m_Mode = -1;
   std::string m_Buffer;
 };
 
-ByteWriter::ByteWriter(std::string const &path) : m_Path(path) {
+ByteWriter::ByteWriter(std::string const &path) : m_Path(path), m_Target(ResolveLinks(path)) {
+  if (m_Target.empty())
+    Refuse(std::string("cannot follow the symbolic link: ") + std::strerror(errno));
+  struct stat status {};
+  if (::stat(m_Target.c_str(), &status) == 0 && S_ISREG(status.st_mode))
+    m_Mode = static_cast<int>(status.st_mode & 07777);
+  RemoveStaleTemporaries(m_Target);
   // O_EXCL with a fresh suffix on collision: a stale file of a crashed save
-  // or a concurrent save to the same target is never reused.
+  // or a concurrent save to the same target is never reused. Private until
+  // Commit gives it the replaced file's bits.
   for (unsigned attempt = 0; m_Fd < 0; ++attempt) {
-    m_TempPath = path + ".tmp." + std::to_string(::getpid()) + "." + std::to_string(attempt);
-    m_Fd = ::open(m_TempPath.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, 0666);
+    m_TempPath = m_Target + ".tmp." + std::to_string(::getpid()) + "." + std::to_string(attempt);
+    m_Fd = ::open(m_TempPath.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC,
+                  m_Mode < 0 ? 0666 : 0600);
     if (m_Fd < 0 && (errno != EEXIST || attempt == 100))
       Fail("cannot create the temporary file", errno);
   }
@@ -168,13 +250,15 @@ void ByteWriter::Flush() {
 
 void ByteWriter::Commit() {
   Flush();
+  if (m_Mode >= 0 && ::fchmod(m_Fd, static_cast<mode_t>(m_Mode)) != 0)
+    Fail("cannot set the permissions of", errno);
   if (::fsync(m_Fd) != 0)
     Fail("cannot flush", errno);
   int const fd = m_Fd;
   m_Fd = -1;
   if (::close(fd) != 0)
     Fail("cannot close", errno);
-  if (::rename(m_TempPath.c_str(), m_Path.c_str()) != 0)
+  if (::rename(m_TempPath.c_str(), m_Target.c_str()) != 0)
     Fail("cannot rename", errno);
   m_Committed = true;
 }

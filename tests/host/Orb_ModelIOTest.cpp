@@ -16,6 +16,9 @@
 #include <stdexcept>
 #include <string_view>
 #include <sys/resource.h>
+#include <sys/wait.h>
+#include <unistd.h>
+#include <vector>
 
 namespace fs = std::filesystem;
 
@@ -236,6 +239,65 @@ TEST_F(Orb_ModelIOTest, FailedSaveKeepsPreviousFile) {
   for (auto const &entry : fs::directory_iterator(m_Dir))
     entries += entry.path().filename() != "a.db";
   EXPECT_EQ(entries, 0u) << "temporary file left behind";
+}
+
+// A save keeps the replaced file's permission bits, writes through symbolic links (relative
+// to their directory, also dangling ones) and leaves the links in place.
+TEST_F(Orb_ModelIOTest, SaveKeepsModeAndLinks) {
+  std::string const bytes = ReadBytes(m_Path);
+  // 0666 is wider than the usual umask allows: only a kept mode gives it.
+  for (fs::perms mode : {fs::perms(0600), fs::perms(0666)}) {
+    fs::permissions(m_Path, mode);
+    m_Sample.Save(m_Path.c_str());
+    EXPECT_EQ(fs::status(m_Path).permissions(), mode);
+  }
+
+  fs::create_directory(PathOf("sub"));
+  fs::create_symlink("../a.db", PathOf("sub/link.db"));
+  fs::create_symlink("sub/link.db", PathOf("chain.db"));
+  fs::create_symlink("fresh.db", PathOf("dangling.db"));
+  WriteBytes(m_Path, "old");
+  Orb_Model other("other", "db", "", false);
+  other.CreateDesignMgr("x");
+  other.Save(PathOf("chain.db").c_str());
+  other.Save(PathOf("dangling.db").c_str());
+  EXPECT_TRUE(fs::is_symlink(PathOf("chain.db")));
+  EXPECT_EQ(fs::read_symlink(PathOf("sub/link.db")), "../a.db");
+  EXPECT_TRUE(fs::is_symlink(PathOf("dangling.db")));
+  EXPECT_EQ(ReadBytes(m_Path), ReadBytes(PathOf("fresh.db")));
+  EXPECT_NE(ReadBytes(m_Path), bytes);
+  Orb_Model reopened("target", "db", "", false);
+  reopened.Open(PathOf("chain.db").c_str());
+  EXPECT_EQ(Dump(reopened), Dump(other));
+
+  fs::create_symlink("loop2.db", PathOf("loop1.db"));
+  fs::create_symlink("loop1.db", PathOf("loop2.db"));
+  EXPECT_THROW(other.Save(PathOf("loop1.db").c_str()), Orb_Exception);
+}
+
+// A save removes temporary files that saves of the same target left when their process died.
+TEST_F(Orb_ModelIOTest, SaveRemovesStaleTemporaryFiles) {
+  pid_t const dead = ::fork();
+  ASSERT_GE(dead, 0);
+  if (dead == 0)
+    ::_exit(0);
+  ASSERT_EQ(::waitpid(dead, nullptr, 0), dead);
+  std::string const deadPid = std::to_string(dead);
+  std::string const stale[] = {"a.db.tmp." + deadPid + ".0", "a.db.tmp." + deadPid + ".17"};
+  // A live process's file, names off the pattern, another target's file.
+  std::string const live[] = {"a.db.tmp." + std::to_string(::getppid()) + ".0",
+                              "a.db.tmp." + deadPid + ".1x", "a.db.tmp." + deadPid, "a.db.tmp.x.0",
+                              "b.db.tmp." + deadPid + ".0"};
+  for (auto const &name : stale)
+    WriteBytes(PathOf(name.c_str()), "partial");
+  for (auto const &name : live)
+    WriteBytes(PathOf(name.c_str()), "keep");
+
+  m_Sample.Save(m_Path.c_str());
+  for (auto const &name : stale)
+    EXPECT_FALSE(fs::exists(PathOf(name.c_str()))) << name;
+  for (auto const &name : live)
+    EXPECT_TRUE(fs::exists(PathOf(name.c_str()))) << name;
 }
 
 // Companions come back without events, survive an unclaimed save, and yield to live ones.
