@@ -2,14 +2,16 @@
 //
 // A design database is a magic line followed by records. A record is a tag
 // byte, fields each preceded by one space, and a newline. Numbers are decimal;
-// strings are "<length>:<bytes>", so every byte survives: property values
-// and companion keys may hold NUL, names may not (the API takes names as C
-// strings). Design managers, designs, views and blocks end with an 'E' record; properties
-// follow the record of the object they belong to. Pins and signals are
-// numbered per view in the order they are written, and a view's connections
-// and networks, written after its block tree, refer to them by number.
-// Companion models follow the design managers, each as an embedded model
-// section. A 'Z' record ends every model section, so a cut file shows.
+// strings are "<length>:<bytes>", so every byte survives: property values and
+// companion keys may hold NUL, names may not (the API takes names as C
+// strings). Design managers, designs, views and blocks end with an 'E'
+// record; properties follow the record of the object they belong to. Blocks
+// nest at most Orb_MaxBlockDepth deep. Pins and signals are numbered per view
+// in the order they are written, and a view's connections and networks,
+// written after its block tree, refer to them by number. Companion models
+// follow the design managers, each as an embedded model section that holds
+// no companions of its own. A 'Z' record ends every model section, so a cut
+// file shows.
 //
 //   Orb design database          magic line
 //   V <version>                  format version
@@ -596,6 +598,7 @@ void Orb_ModelIO::WriteView(Orb_View const *view) {
   m_pOut->Raw("E\n");
 }
 
+// Recursive: no block lies deeper than Orb_MaxBlockDepth.
 void Orb_ModelIO::WriteBlock(Orb_Block const *block) {
   m_pOut->Named('B', block->GetNameString());
   WriteProperties(block);
