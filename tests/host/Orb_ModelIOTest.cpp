@@ -18,7 +18,6 @@
 #include <sys/resource.h>
 #include <sys/wait.h>
 #include <unistd.h>
-#include <vector>
 
 namespace fs = std::filesystem;
 
@@ -244,7 +243,6 @@ TEST_F(Orb_ModelIOTest, FailedSaveKeepsPreviousFile) {
 // A save keeps the replaced file's permission bits, writes through symbolic links (relative
 // to their directory, also dangling ones) and leaves the links in place.
 TEST_F(Orb_ModelIOTest, SaveKeepsModeAndLinks) {
-  std::string const bytes = ReadBytes(m_Path);
   // 0666 is wider than the usual umask allows: only a kept mode gives it.
   for (fs::perms mode : {fs::perms(0600), fs::perms(0666)}) {
     fs::permissions(m_Path, mode);
@@ -265,7 +263,6 @@ TEST_F(Orb_ModelIOTest, SaveKeepsModeAndLinks) {
   EXPECT_EQ(fs::read_symlink(PathOf("sub/link.db")), "../a.db");
   EXPECT_TRUE(fs::is_symlink(PathOf("dangling.db")));
   EXPECT_EQ(ReadBytes(m_Path), ReadBytes(PathOf("fresh.db")));
-  EXPECT_NE(ReadBytes(m_Path), bytes);
   Orb_Model reopened("target", "db", "", false);
   reopened.Open(PathOf("chain.db").c_str());
   EXPECT_EQ(Dump(reopened), Dump(other));
