@@ -35,8 +35,9 @@ bool ReadField(char const *&p, unsigned &value) {
   return true;
 }
 
-void Pad(std::string &out, std::size_t length, Spec const &spec, std::string_view body) {
-  std::size_t const fill = spec.width > length ? spec.width - length : 0;
+// Appends the body, padded with blanks to the width.
+void Pad(std::string &out, Spec const &spec, std::string_view body) {
+  std::size_t const fill = spec.width > body.size() ? spec.width - body.size() : 0;
   if (!spec.left)
     out.append(fill, ' ');
   out.append(body);
@@ -61,16 +62,14 @@ void AppendNumber(std::string &out, Spec const &spec, std::string_view prefix,
   }
   std::size_t zeros =
       spec.precision > n ? static_cast<std::size_t>(spec.precision - n) : std::size_t(0);
-  std::size_t length = prefix.size() + zeros + static_cast<std::size_t>(n);
-  if (spec.zero && !spec.left && spec.precision < 0 && spec.width > length) {
+  std::size_t const length = prefix.size() + zeros + static_cast<std::size_t>(n);
+  if (spec.zero && !spec.left && spec.precision < 0 && spec.width > length)
     zeros += spec.width - length;
-    length = spec.width;
-  }
   std::string body(prefix);
   body.append(zeros, '0');
   while (n > 0)
     body += digits[--n];
-  Pad(out, length, spec, body);
+  Pad(out, spec, body);
 }
 
 } // namespace
@@ -119,12 +118,12 @@ std::string vformat(char const *format, va_list args) {
       std::string_view value = text ? text : "(null)";
       if (spec.precision >= 0 && value.size() > static_cast<std::size_t>(spec.precision))
         value = value.substr(0, static_cast<std::size_t>(spec.precision));
-      Pad(out, value.size(), spec, value);
+      Pad(out, spec, value);
       break;
     }
     case 'c': {
       char const c = static_cast<char>(va_arg(args, int));
-      Pad(out, 1, spec, std::string_view(&c, 1));
+      Pad(out, spec, std::string_view(&c, 1));
       break;
     }
     case 'd': {
