@@ -195,9 +195,9 @@ bool ReadNumber(char const *&p, std::uint64_t limit, bool &negative, std::uint64
 int sscanf(char const *text, char const *fmt, ...) {
   char const *in = text ? text : "";
   char const *f = fmt ? fmt : "";
+  // Becomes EOF when the input ends before the first conversion, as with
+  // std::sscanf.
   int assigned = 0;
-  // EOF when the input ends before the first conversion, as std::sscanf.
-  bool converted = false;
   va_list args;
   va_start(args, fmt);
   while (*f) {
@@ -215,7 +215,7 @@ int sscanf(char const *text, char const *fmt, ...) {
           ++in;
         ++f;
       }
-      if (*in == '\0' && !converted)
+      if (*in == '\0' && assigned == 0)
         assigned = EOF;
       if (*in != *f)
         break;
@@ -230,7 +230,7 @@ int sscanf(char const *text, char const *fmt, ...) {
     while (IsSpace(*in))
       ++in;
     if (*in == '\0') {
-      if (!converted)
+      if (assigned == 0)
         assigned = EOF;
       break;
     }
@@ -253,7 +253,6 @@ int sscanf(char const *text, char const *fmt, ...) {
       *va_arg(args, unsigned *) = negative ? 0u - value : value;
     }
     ++assigned;
-    converted = true;
   }
   va_end(args);
   return assigned;
