@@ -105,9 +105,12 @@ std::string vformat(char const *format, va_list args) {
       valid = ReadField(++p, precision);
       spec.precision = static_cast<int>(precision);
     }
-    // The conversion; '\0' for one that is unknown or malformed.
+    // The conversion; '\0' for one that is unknown or malformed. 'U' stands
+    // for %lU and is unknown on its own.
     char conversion = valid ? *p : '\0';
-    if (conversion == 'l')
+    if (conversion == 'U')
+      conversion = '\0';
+    else if (conversion == 'l')
       conversion = p[1] == 'U' ? (++p, 'U') : '\0';
     switch (conversion) {
     case '%':

@@ -55,6 +55,7 @@ TEST(OrbDebugTest, Conversions) {
   // An unknown or unfinished conversion ends the formatting: the rest is text, no argument read.
   EXPECT_EQ(Render("%d %q %5d|%s", 1, 7, "x"), everywhere("1 %q %5d|%s"));
   EXPECT_EQ(Render("%s %ld %d", "a", 7L, 8), everywhere("a %ld %d"));
+  EXPECT_EQ(Render("%U %d", 8), everywhere("%U %d"));
   EXPECT_EQ(Render("50%"), everywhere("50%"));
   EXPECT_EQ(Render("%5.", 1), everywhere("%5."));
   EXPECT_EQ(Render("%99999d|%s", 1, "x"), everywhere("%99999d|%s"));
