@@ -210,8 +210,8 @@ Lum_TlmLibrary *Lum_TlmLibrary::GetLocalLibrary(Orb_Model *model, PM_PIC const &
     client = std::make_unique<Lum_TlmModel>(host.get());
     library = client->CreateLibrary(LOCAL_LIBRARY_NAME, 1, 0);
   }
-  model->SetCompanion(key, std::make_unique<LocalLibraryCompanion>(std::move(host), std::move(client),
-                                                                   library, taken));
+  model->SetCompanion(key, std::make_unique<LocalLibraryCompanion>(
+                               std::move(host), std::move(client), library, taken));
   return library;
 }
 

@@ -34,7 +34,7 @@ struct GraftRun {
 std::string PathPrefix(Orb_Block const *block) {
   std::string path;
   for (; block; block = block->GetParent())
-    path = block->GetNameString() + "/" + path;
+    path.insert(0, 1, '/').insert(0, block->GetNameString());
   return path;
 }
 

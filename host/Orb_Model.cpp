@@ -46,7 +46,7 @@ std::string PathOf(Orb_Persistent const *object) {
   std::string path = object->GetNameString();
   for (Orb_Persistent const *p = object->GetParentObject(); p && p->GetKind() == Orb_Kind::Block;
        p = p->GetParentObject())
-    path = p->GetNameString() + "/" + path;
+    path.insert(0, 1, '/').insert(0, p->GetNameString());
   return path;
 }
 
@@ -102,11 +102,11 @@ Orb_Block *Orb_Pin::GetParent() const { return static_cast<Orb_Block *>(GetParen
 void Orb_Pin::Connect(Orb_Signal *signal) {
   Orb_Block *outside = GetParent()->GetParent();
   if (signal && signal->GetParent() != outside) {
-    std::string message = "Pin <" + PathOf(this) + "> cannot connect outside to signal <" +
-                          PathOf(signal) + ">: ";
-    message += outside ? "the pin connects outside only to signals of block <" + PathOf(outside) +
-                             ">."
-                       : "a top block's pin connects only inside.";
+    std::string message =
+        "Pin <" + PathOf(this) + "> cannot connect outside to signal <" + PathOf(signal) + ">: ";
+    message += outside
+                   ? "the pin connects outside only to signals of block <" + PathOf(outside) + ">."
+                   : "a top block's pin connects only inside.";
     throw Orb_Exception(kSource, __LINE__, GetName(), message.c_str());
   }
   Link(m_pSignal, signal);

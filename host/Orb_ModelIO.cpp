@@ -823,11 +823,10 @@ void Orb_ModelIO::ReadConnections() {
     Orb_Block *block = pin->GetParent();
     bool const inner = block == signal->GetParent();
     if (!inner && block->GetParent() != signal->GetParent())
-      m_pIn->Corrupt("pin " + Quote(pin->GetNameString()) + " of block " +
-                     Quote(block->GetNameString()) + " connects to signal " +
-                     Quote(signal->GetNameString()) + " of block " +
-                     Quote(signal->GetParent()->GetNameString()) +
-                     ", neither its own block nor its parent");
+      m_pIn->Corrupt(
+          "pin " + Quote(pin->GetNameString()) + " of block " + Quote(block->GetNameString()) +
+          " connects to signal " + Quote(signal->GetNameString()) + " of block " +
+          Quote(signal->GetParent()->GetNameString()) + ", neither its own block nor its parent");
     if (inner ? pin->GetInnerSignal() : pin->GetSignal())
       m_pIn->Corrupt("pin " + Quote(pin->GetNameString()) + " is connected twice " +
                      (inner ? "inside" : "outside"));

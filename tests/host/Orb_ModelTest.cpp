@@ -220,10 +220,11 @@ TEST_F(HostModelTest, DeleteHandlerMayDeleteSiblingsAndAncestors) {
   addSiblings();
   log.clear();
   v->DeleteTopBlock();
-  EXPECT_EQ(Joined(log), "delete pin p; ~pin p; delete signal s; ~signal s; delete pin cp; ~pin cp; "
-                         "delete block c; ~block c; delete pin x; ~pin x; delete block a; ~block a; "
-                         "delete pin x; ~pin x; delete block b; ~block b; "
-                         "delete block top; ~block top");
+  EXPECT_EQ(Joined(log),
+            "delete pin p; ~pin p; delete signal s; ~signal s; delete pin cp; ~pin cp; "
+            "delete block c; ~block c; delete pin x; ~pin x; delete block a; ~block a; "
+            "delete pin x; ~pin x; delete block b; ~block b; "
+            "delete block top; ~block top");
   EXPECT_EQ(v->GetBlock(), nullptr);
 
   // Deleting a, whose pin's handler deletes the whole tree above it.
