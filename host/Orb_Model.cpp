@@ -514,16 +514,18 @@ void Orb_Model::Delete(Orb_Persistent *object) {
   // Already held by a deletion under way, which fires its events and frees it.
   if (object->m_Dying)
     return;
+  // The snapshot stays readable under the hold whatever the handlers change.
+  // Memory is taken first: a failure here must leave nothing marked.
+  std::vector<Orb_Persistent *> doomed;
+  Orb_VisitPostOrder(object, [&doomed](Orb_Persistent *owned) { doomed.push_back(owned); });
+  if (m_PendingFrees.size() == m_PendingFrees.capacity())
+    m_PendingFrees.reserve(2 * m_PendingFrees.size() + 1);
   FreeHold hold(*this);
   m_PendingFrees.push_back(object);
   // Marked before any handler runs, so that a handler's deletion of an
-  // object of the subtree is left to this walk. The snapshot stays readable
-  // under the hold whatever the handlers change.
-  std::vector<Orb_Persistent *> doomed;
-  Orb_VisitPostOrder(object, [&doomed](Orb_Persistent *owned) {
+  // object of the subtree is left to this walk.
+  for (Orb_Persistent *owned : doomed)
     owned->m_Dying = true;
-    doomed.push_back(owned);
-  });
   std::exception_ptr failure;
   for (Orb_Persistent *owned : doomed) {
     // A handler's deletion of an ancestor may have fired it already.

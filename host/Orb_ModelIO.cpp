@@ -579,11 +579,10 @@ void Orb_ModelIO::Open(Orb_Model &model, std::string const &path) {
     companionKeys.push_back(entry.first);
 
   std::vector<Orb_DesignMgr *> const loaded = Commit(section);
-  for (auto &[key, companion] : section.companions)
-    model.m_LoadedCompanions.emplace(key, std::move(companion));
-
   model.m_pOpenJournal = &journal;
   try {
+    for (auto &[key, companion] : section.companions)
+      model.m_LoadedCompanions.emplace(key, std::move(companion));
     Orb_Model::FreeHold hold(model);
     for (Orb_DesignMgr *designMgr : loaded)
       model.AnnounceLoadTree(designMgr);
