@@ -56,8 +56,10 @@ void WriteDesign(std::string const &path) {
   Lum_TdmPin *out = top->CreatePin("q", Orb_Pin::PIN_OUTPUT);
   Lum_TdmSignal *clockNet = top->CreateSignal("clk_net");
   Lum_TdmSignal *outNet = top->CreateSignal("q_net");
-  clock->GetOrbPin()->Connect(clockNet->GetOrbSignal());
-  out->GetOrbPin()->Connect(outNet->GetOrbSignal());
+  // The top block's pins connect inside, to signals of the top block; the
+  // child blocks' pins connect outside, to the same signals.
+  clock->GetOrbPin()->ConnectInner(clockNet->GetOrbSignal());
+  out->GetOrbPin()->ConnectInner(outNet->GetOrbSignal());
 
   for (char const *name : {"bit0", "bit1"}) {
     Lum_TdmBlock *bit = top->CreateBlock(name, 0);
@@ -77,10 +79,12 @@ void PrintBlock(Lum_TdmBlock *block, int depth) {
   std::printf("%*sblock %s\n", depth * 2, "", block->GetName());
   for (std::size_t i = 0; i < block->GetPins().size(); ++i) {
     Lum_TdmPin *pin = block->GetPin(i);
-    Orb_Signal const *signal = pin->GetSignal();
-    std::printf("%*s  pin %s (%s)%s%s\n", depth * 2, "", pin->GetName(),
-                Orb_PinDirectionName(pin->GetDirection()), signal ? " -> " : "",
-                signal ? signal->GetName() : "");
+    Orb_Signal const *outside = pin->GetSignal();
+    Orb_Signal const *inside = pin->GetInnerSignal();
+    std::printf("%*s  pin %s (%s)%s%s%s%s\n", depth * 2, "", pin->GetName(),
+                Orb_PinDirectionName(pin->GetDirection()), outside ? ", outside " : "",
+                outside ? outside->GetName() : "", inside ? ", inside " : "",
+                inside ? inside->GetName() : "");
   }
   for (std::size_t i = 0; i < block->GetSignals().size(); ++i)
     std::printf("%*s  signal %s\n", depth * 2, "", block->GetSignal(i)->GetName());
