@@ -59,8 +59,8 @@ std::string FileBytes(std::string const &path) {
 
 // What a test design's child block "u1" is stored with.
 struct StoredBlock {
-  char const *type; // TDS_BLOCK_TYPE, or null for none
-  std::vector<std::pair<char const *, bool>> pins; // name, connected
+  char const *type;                                          // TDS_BLOCK_TYPE, or null for none
+  std::vector<std::pair<char const *, bool>> pins;           // name, connected
   std::vector<std::pair<char const *, char const *>> pinMap; // TDS_BLOCK_PIN_MAP members
 };
 
@@ -124,8 +124,9 @@ protected:
   int m_Files = 0;
 };
 
-StoredBlock const kMappedReg{
-    "LIBT:REG", {{"DATA0", true}, {"CLK", false}, {"DATA1", true}}, {{"DATA0", "D0"}, {"DATA1", "D1"}}};
+StoredBlock const kMappedReg{"LIBT:REG",
+                             {{"DATA0", true}, {"CLK", false}, {"DATA1", true}},
+                             {{"DATA0", "D0"}, {"DATA1", "D1"}}};
 
 // ---------------------------------------------------------------------------
 // Round trip
@@ -221,8 +222,9 @@ TEST_P(TdmBlockReconcileTest, PinsEndAsExpected) {
   Lum_TdmBlock *u1 = U1(*model);
   EXPECT_EQ(u1->GetTypeBlock(), m_pAbc);
   EXPECT_EQ(PinText(u1), GetParam().pins);
-  bool const storedC = std::any_of(GetParam().stored.pins.begin(), GetParam().stored.pins.end(),
-                                   [](auto const &pin) { return std::strcmp(pin.first, "C") == 0; });
+  bool const storedC =
+      std::any_of(GetParam().stored.pins.begin(), GetParam().stored.pins.end(),
+                  [](auto const &pin) { return std::strcmp(pin.first, "C") == 0; });
   Lum_TdmPin const *c = u1->GetPinByName("C");
   if (c && !storedC) {
     EXPECT_EQ(c->GetDirection(), Orb_Pin::PIN_OUTPUT) << "created with the type pin's direction";
@@ -236,8 +238,8 @@ INSTANTIATE_TEST_SUITE_P(
         ReconcileCase{"MissingPinCreated", {"LIBT:ABC", {{"B", true}, {"A", true}}, {}}, "A,B,C"},
         // Three type pins against two pins: B and C are created, X stays
         // without a type pin.
-        ReconcileCase{"FewerPinsGetTheRest", {"LIBT:ABC", {{"A", true}, {"X", false}}, {}},
-                      "A,B,C,X!"},
+        ReconcileCase{
+            "FewerPinsGetTheRest", {"LIBT:ABC", {{"A", true}, {"X", false}}, {}}, "A,B,C,X!"},
         // Equal counts: nothing is created and the order stays.
         ReconcileCase{"EqualCountsCreateNothing",
                       {"LIBT:ABC", {{"X", false}, {"A", true}, {"B", true}}, {}},
@@ -250,9 +252,10 @@ INSTANTIATE_TEST_SUITE_P(
                        {{"P", "C"}, {"Z", "A"}, {"P", "B"}}},
                       "P>B,A,C"},
         // Two pins may take one type pin.
-        ReconcileCase{"SharedTypePin",
-                      {"LIBT:ABC", {{"P", true}, {"Q", true}, {"C", true}}, {{"P", "A"}, {"Q", "A"}}},
-                      "P>A,Q>A,C"},
+        ReconcileCase{
+            "SharedTypePin",
+            {"LIBT:ABC", {{"P", true}, {"Q", true}, {"C", true}}, {{"P", "A"}, {"Q", "A"}}},
+            "P>A,Q>A,C"},
         // An unconnected pin whose mapped name is unknown stays untyped.
         ReconcileCase{"UnknownMappedNameUnconnected",
                       {"LIBT:ABC", {{"P", false}, {"A", true}, {"B", true}}, {{"P", "NOPE"}}},
@@ -314,10 +317,8 @@ INSTANTIATE_TEST_SUITE_P(
                     "NOPE",
                     "\nCouldn't find type block <NOPE> in library <LIBT>.\n"},
         // Without ":" the whole value names the library.
-        FailureCase{"NoColon",
-                    {"LIBT", {}, {}},
-                    "",
-                    "\nCouldn't find type block <> in library <LIBT>.\n"},
+        FailureCase{
+            "NoColon", {"LIBT", {}, {}}, "", "\nCouldn't find type block <> in library <LIBT>.\n"},
         FailureCase{"ConnectedPinWithoutTypePin",
                     {"LIBT:ABC", {{"A", true}, {"X", true}}, {}},
                     "X",
@@ -529,8 +530,8 @@ INSTANTIATE_TEST_SUITE_P(Cases, TdmPinOrderTest,
 // Equal names compare false both ways, so a stable sort keeps their order.
 TEST(TdmPinAlpaSorterTest, EqualNamesAreNotOrdered) {
   Orb_Model host("h", "h", "", false);
-  Orb_Block *top = host.CreateDesignMgr("dm")->CreateDesign("d")->CreateView("v")->CreateTopBlock(
-      "t");
+  Orb_Block *top =
+      host.CreateDesignMgr("dm")->CreateDesign("d")->CreateView("v")->CreateTopBlock("t");
   Orb_Pin *first = top->CreatePin("X", Orb_Pin::PIN_INPUT);
   Orb_Pin *second = top->CreateBlock("c")->CreatePin("X", Orb_Pin::PIN_INPUT);
   PinAlpaSorter const sorter;
