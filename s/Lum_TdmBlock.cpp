@@ -121,9 +121,18 @@ void Lum_TdmBlock::ReconcilePins(Lum_TlmBlock const *typeBlock) {
       nameMap[std::string_view(member->GetName())] = member->GetStringValue();
   }
 
-  // First phase: every pin takes the type pin of its (mapped) name.
+  // The second phase gives a block with fewer pins than its type block, in a
+  // view that allows it, the type pins nobody took. The first phase creates
+  // no pin, so whether it will run is known now, and the taken type pins are
+  // noted only then.
+  bool const createMissing = typeBlock->GetNumPins() > GetNumPins() &&
+                             !GetOrbBlock()->GetView()->GetPropertyByName(kDontCreatePinsProperty);
   std::vector<Lum_TlmPin const *> taken;
-  taken.reserve(pins.size());
+  if (createMissing)
+    taken.reserve(pins.size());
+
+  // First phase: every pin takes the type pin of its (mapped) name.
+
   for (std::size_t i = 0; i < pins.size(); ++i) {
     Orb_Pin *pin = pins[i];
     char const *typePinName = pin->GetName();
@@ -137,16 +146,14 @@ void Lum_TdmBlock::ReconcilePins(Lum_TlmBlock const *typeBlock) {
       throw Lum_ExceptionCorruptDatabase("Lum", kSourcePath, kRevision, __LINE__, pin->GetName(),
                                          "Could not locate the specified pin.", false);
     clientOf(pin)->SetTypePin(typePin);
-    if (typePin)
+    if (createMissing && typePin)
       taken.push_back(typePin);
   }
-  nameMap.clear();
-
-  // Second phase: only a block with fewer pins than its type block, in a view
-  // that allows it, gets the type pins nobody took.
-  if (typeBlock->GetNumPins() <= GetNumPins() ||
-      GetOrbBlock()->GetView()->GetPropertyByName(kDontCreatePinsProperty))
+  if (!createMissing)
     return;
+
+  // Second phase: creation in the type block's pin order, then the sort.
+  nameMap.clear();
   std::sort(taken.begin(), taken.end());
   std::size_t const typePinCount = typeBlock->GetPins().size();
   for (std::size_t i = 0; i < typePinCount; ++i) {
