@@ -296,7 +296,6 @@ TEST_P(TdmBlockLoadFailureTest, OpenFailsAndLeavesNothing) {
     EXPECT_FALSE(e.GetFlag());
   }
   Orb_Model *host = model.GetOrbModel();
-  EXPECT_TRUE(host->GetDesignMgrs().empty());
   for (unsigned k = 0; k < Orb_KindCount; ++k)
     EXPECT_EQ(host->GetObjectCount(static_cast<Orb_Kind>(k)), 0u) << Orb_KindName(Orb_Kind(k));
   EXPECT_EQ(model.GetClientCount(), 0u);
@@ -552,20 +551,16 @@ TEST_F(TdmBlockTest, DumpShowsTheTypeBlock) {
   Port::StringStream out;
   Port::Stream *previous = Orb_Debug::SetOutput(&out);
   U1(*model)->Dbg();
-  std::string const typed = out.GetText();
-  out.Clear();
   U1(*model)->GetParent()->Dbg();
   Orb_Debug::SetOutput(previous);
   std::ostringstream address;
   address << std::hex << reinterpret_cast<std::uintptr_t>(m_pReg);
-  std::string const head = "=======================================\n"
-                           "Data for class <Lum_TdmBlock>:\n";
-  EXPECT_EQ(typed.substr(0, head.size()), head);
-  EXPECT_NE(typed.find("\n(Lum_TlmBlock *) m_pTypeBlock = <0x" + address.str() + ">, (REG)\n"),
-            std::string::npos)
-      << typed;
-  EXPECT_NE(out.GetText().find("\n(Lum_TlmBlock *) m_pTypeBlock = <0x0>, ()\n"), std::string::npos)
-      << out.GetText();
+  std::string const typed = "Data for class <Lum_TdmBlock>:\n(Lum_TlmBlock *) m_pTypeBlock = <0x" +
+                            address.str() + ">, (REG)\n";
+  std::string const untyped =
+      "Data for class <Lum_TdmBlock>:\n(Lum_TlmBlock *) m_pTypeBlock = <0x0>, ()\n";
+  EXPECT_LT(out.GetText().find(typed), out.GetText().find(untyped)) << out.GetText();
+  EXPECT_NE(out.GetText().find(untyped), std::string::npos) << out.GetText();
 }
 
 } // namespace

@@ -58,7 +58,7 @@ TEST_F(TdmTypePinMapTest, FirstEntryWinsAndPinFormsUseTheName) {
 }
 
 // Equality ignores insertion order and the default flag, compares type pins
-// by identity and sizes first.
+// by identity and sizes first; copies are equal and independent.
 TEST_F(TdmTypePinMapTest, EqualityIsByEntriesOnly) {
   Lum_TdmTypePinMap left, right;
   left.SetDefaultMap(true);
@@ -77,9 +77,14 @@ TEST_F(TdmTypePinMapTest, EqualityIsByEntriesOnly) {
   EXPECT_FALSE(left == other) << "one type pin differs";
 
   Lum_TdmTypePinMap larger(left);
+  EXPECT_TRUE(larger == left);
+  EXPECT_TRUE(larger.IsDefaultMap());
   larger.SetPinMap("C", m_pClk);
   EXPECT_FALSE(left == larger);
   EXPECT_FALSE(larger == left);
+  right = larger;
+  EXPECT_TRUE(right == larger);
+  EXPECT_TRUE(right.IsDefaultMap());
 }
 
 // A name mapped to null on the left matches a missing name on the right,
@@ -94,37 +99,14 @@ TEST_F(TdmTypePinMapTest, StoredNullMakesEqualityAsymmetric) {
   EXPECT_FALSE(withOther == withNull);
 }
 
-// A copy, by construction or assignment, holds the same entries and flag and
-// is independent of its source.
-TEST_F(TdmTypePinMapTest, CopiesAreEqualAndIndependent) {
-  Lum_TdmTypePinMap source;
-  source.SetDefaultMap(true);
-  source.SetPinMap("A", m_pD0);
-  Lum_TdmTypePinMap copy(source);
-  EXPECT_TRUE(copy == source);
-  EXPECT_TRUE(copy.IsDefaultMap());
-  copy.SetPinMap("B", m_pD1);
-  EXPECT_EQ(source.GetNumPins(), 1u);
-
-  Lum_TdmTypePinMap assigned;
-  assigned = copy;
-  EXPECT_TRUE(assigned == copy);
-  EXPECT_TRUE(assigned.IsDefaultMap());
-}
-
 // A null design pin is refused with an exception, never dereferenced.
 TEST_F(TdmTypePinMapTest, NullDesignPinIsRefused) {
   Lum_TdmTypePinMap map;
   EXPECT_THROW(map.SetPinMap(static_cast<Lum_TdmPin const *>(nullptr), m_pD0),
                Lum_ExceptionInvalidTypeBlock);
   EXPECT_EQ(map.GetNumPins(), 0u);
-  try {
-    map.GetPinMapping(static_cast<Lum_TdmPin const *>(nullptr));
-    FAIL() << "null design pin accepted";
-  } catch (Lum_ExceptionInvalidTypeBlock const &e) {
-    EXPECT_EQ(e.GetFile(), "../s/Lum_TdmTypePinMap");
-    EXPECT_FALSE(e.GetMessage().empty());
-  }
+  EXPECT_THROW(map.GetPinMapping(static_cast<Lum_TdmPin const *>(nullptr)),
+               Lum_ExceptionInvalidTypeBlock);
 }
 
 // The dump shows the flag, the count and each entry in name order.
