@@ -102,7 +102,7 @@ protected:
       for (auto const &[name, value] : stored.pinMap)
         pinMap->CreatePropertyString(name, value);
     }
-    std::string const path = m_Dir.File("d" + std::to_string(m_Files++) + ".odb");
+    std::string path = m_Dir.File("d" + std::to_string(m_Files++) + ".odb");
     design.Model().Save(path.c_str());
     return path;
   }
