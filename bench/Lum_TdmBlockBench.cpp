@@ -60,7 +60,8 @@ void WriteDesign(std::int64_t blocks, Typing typing, std::string const &path) {
       continue;
     block->CreatePropertyString(inert ? "XDS_BLOCK_TYPE" : "TDS_BLOCK_TYPE",
                                 ("BENCHT:T" + std::to_string(i % kTypeBlocks)).c_str());
-    Orb_Property *pinMap = block->CreatePropertyList(inert ? "XDS_BLOCK_PIN_MAP" : "TDS_BLOCK_PIN_MAP");
+    Orb_Property *pinMap =
+        block->CreatePropertyList(inert ? "XDS_BLOCK_PIN_MAP" : "TDS_BLOCK_PIN_MAP");
     for (int p = kPinsPerBlock - 2; p < kPinsPerBlock; ++p)
       pinMap->CreatePropertyString(("X" + std::to_string(p)).c_str(),
                                    ("P" + std::to_string(p)).c_str());
