@@ -200,6 +200,9 @@ TEST_F(TdmBlockTest, UntypedBlocksCarryNoTyping) {
   EXPECT_EQ(PinText(u1), "P!");
   FirstView(*loaded)->CommitAll();
   EXPECT_EQ(Members(u1, "TDS_BLOCK_PIN_MAP"), "<absent>");
+  u1->CreatePropertyString("TDS_BLOCK_TYPE", "LIBT:REG");
+  FirstView(*loaded)->CommitAll();
+  EXPECT_EQ(PropertyValue(u1, "TDS_BLOCK_TYPE"), "<absent>") << "an untyped block drops it";
 }
 
 // ---------------------------------------------------------------------------
@@ -208,7 +211,8 @@ TEST_F(TdmBlockTest, UntypedBlocksCarryNoTyping) {
 struct ReconcileCase {
   char const *name;
   StoredBlock stored;
-  char const *pins; // PinText after the load
+  char const *pins;    // PinText after the load
+  char const *members; // TDS_BLOCK_PIN_MAP after a commit
 };
 
 std::ostream &operator<<(std::ostream &out, ReconcileCase const &c) { return out << c.name; }
@@ -216,7 +220,8 @@ std::ostream &operator<<(std::ostream &out, ReconcileCase const &c) { return out
 class TdmBlockReconcileTest : public TdmBlockTest,
                               public ::testing::WithParamInterface<ReconcileCase> {};
 
-// Each stored block ends with the pins, type pins and order given.
+// Each stored block ends with the pins, type pins and order given, and its
+// commit records exactly the pins whose names differ from their type pins'.
 TEST_P(TdmBlockReconcileTest, PinsEndAsExpected) {
   auto model = Open(WriteDesign(GetParam().stored));
   Lum_TdmBlock *u1 = U1(*model);
@@ -229,37 +234,52 @@ TEST_P(TdmBlockReconcileTest, PinsEndAsExpected) {
   if (c && !storedC) {
     EXPECT_EQ(c->GetDirection(), Orb_Pin::PIN_OUTPUT) << "created with the type pin's direction";
   }
+  FirstView(*model)->CommitAll();
+  EXPECT_EQ(PropertyValue(u1, "TDS_BLOCK_TYPE"), "LIBT:ABC");
+  EXPECT_EQ(Members(u1, "TDS_BLOCK_PIN_MAP"), GetParam().members);
 }
 
 INSTANTIATE_TEST_SUITE_P(
     Cases, TdmBlockReconcileTest,
     ::testing::Values(
         // The missing C is created and the pins sorted.
-        ReconcileCase{"MissingPinCreated", {"LIBT:ABC", {{"B", true}, {"A", true}}, {}}, "A,B,C"},
+        ReconcileCase{
+            "MissingPinCreated", {"LIBT:ABC", {{"B", true}, {"A", true}}, {}}, "A,B,C", "<absent>"},
         // Three type pins against two pins: B and C are created, X stays
         // without a type pin.
-        ReconcileCase{
-            "FewerPinsGetTheRest", {"LIBT:ABC", {{"A", true}, {"X", false}}, {}}, "A,B,C,X!"},
+        ReconcileCase{"FewerPinsGetTheRest",
+                      {"LIBT:ABC", {{"A", true}, {"X", false}}, {}},
+                      "A,B,C,X!",
+                      "<absent>"},
         // Equal counts: nothing is created and the order stays.
         ReconcileCase{"EqualCountsCreateNothing",
                       {"LIBT:ABC", {{"X", false}, {"A", true}, {"B", true}}, {}},
-                      "X!,A,B"},
+                      "X!,A,B",
+                      "<absent>"},
         // The last member of a name counts; a member for a missing pin
         // changes nothing.
         ReconcileCase{"LastMemberWins",
                       {"LIBT:ABC",
                        {{"P", true}, {"A", true}, {"C", true}},
                        {{"P", "C"}, {"Z", "A"}, {"P", "B"}}},
-                      "P>B,A,C"},
+                      "P>B,A,C",
+                      "P=B"},
         // Two pins may take one type pin.
         ReconcileCase{
             "SharedTypePin",
             {"LIBT:ABC", {{"P", true}, {"Q", true}, {"C", true}}, {{"P", "A"}, {"Q", "A"}}},
-            "P>A,Q>A,C"},
+            "P>A,Q>A,C",
+            "P=A|Q=A"},
+        // Names differing in case only make a mapped pin.
+        ReconcileCase{"CaseDiffers",
+                      {"LIBT:ABC", {{"a", true}, {"B", true}, {"C", true}}, {{"a", "A"}}},
+                      "a>A,B,C",
+                      "a=A"},
         // An unconnected pin whose mapped name is unknown stays untyped.
         ReconcileCase{"UnknownMappedNameUnconnected",
                       {"LIBT:ABC", {{"P", false}, {"A", true}, {"B", true}}, {{"P", "NOPE"}}},
-                      "P!,A,B"}),
+                      "P!,A,B",
+                      "<absent>"}),
     [](::testing::TestParamInfo<ReconcileCase> const &caseInfo) {
       return std::string(caseInfo.param.name);
     });
