@@ -132,7 +132,6 @@ void Lum_TdmBlock::ReconcilePins(Lum_TlmBlock const *typeBlock) {
     taken.reserve(pins.size());
 
   // First phase: every pin takes the type pin of its (mapped) name.
-
   for (std::size_t i = 0; i < pins.size(); ++i) {
     Orb_Pin *pin = pins[i];
     char const *typePinName = pin->GetName();
