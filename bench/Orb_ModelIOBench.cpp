@@ -38,8 +38,8 @@ std::unique_ptr<Orb_Model> MakeDesign(std::int64_t blocks) {
     block->CreatePropertyString("cell", "NAND2 x1");
     Orb_Signal *signal = block->CreateSignal("n");
     network->AddSignal(signal);
-    block->CreatePin("a", Orb_Pin::PIN_INPUT)->Connect(signal);
-    block->CreatePin("b", Orb_Pin::PIN_INPUT)->Connect(signal);
+    block->CreatePin("a", Orb_Pin::PIN_INPUT)->ConnectInner(signal);
+    block->CreatePin("b", Orb_Pin::PIN_INPUT)->ConnectInner(signal);
     block->CreatePin("y", Orb_Pin::PIN_OUTPUT);
   }
   return model;

@@ -1,8 +1,11 @@
 // Builds a small typed design, saves its design database, reopens it in a
-// fresh client model and prints what it found.
+// fresh client model and prints what it found. What it writes stays.
 //
-// Usage: Lum_TdmExample [directory]
-// Without a directory it works in a temporary one and removes it at the end.
+// Usage:
+//   Lum_TdmExample                  writes into a new folder lum_example_XXXXXX
+//                                   in the current directory
+//   Lum_TdmExample DIRECTORY        writes into DIRECTORY (made if missing)
+//   Lum_TdmExample --open DIRECTORY reopens what an earlier run wrote there
 
 #include "Lum_TdmBlock.h"
 #include "Lum_TdmDesign.h"
@@ -53,8 +56,10 @@ void WriteDesign(std::string const &path) {
   Lum_TdmPin *out = top->CreatePin("q", Orb_Pin::PIN_OUTPUT);
   Lum_TdmSignal *clockNet = top->CreateSignal("clk_net");
   Lum_TdmSignal *outNet = top->CreateSignal("q_net");
-  clock->GetOrbPin()->Connect(clockNet->GetOrbSignal());
-  out->GetOrbPin()->Connect(outNet->GetOrbSignal());
+  // The top block's pins connect inside, to signals of the top block; the
+  // child blocks' pins connect outside, to the same signals.
+  clock->GetOrbPin()->ConnectInner(clockNet->GetOrbSignal());
+  out->GetOrbPin()->ConnectInner(outNet->GetOrbSignal());
 
   for (char const *name : {"bit0", "bit1"}) {
     Lum_TdmBlock *bit = top->CreateBlock(name, 0);
@@ -74,10 +79,12 @@ void PrintBlock(Lum_TdmBlock *block, int depth) {
   std::printf("%*sblock %s\n", depth * 2, "", block->GetName());
   for (std::size_t i = 0; i < block->GetPins().size(); ++i) {
     Lum_TdmPin *pin = block->GetPin(i);
-    Orb_Signal const *signal = pin->GetSignal();
-    std::printf("%*s  pin %s (%s)%s%s\n", depth * 2, "", pin->GetName(),
-                Orb_PinDirectionName(pin->GetDirection()), signal ? " -> " : "",
-                signal ? signal->GetName() : "");
+    Orb_Signal const *outside = pin->GetSignal();
+    Orb_Signal const *inside = pin->GetInnerSignal();
+    std::printf("%*s  pin %s (%s)%s%s%s%s\n", depth * 2, "", pin->GetName(),
+                Orb_PinDirectionName(pin->GetDirection()), outside ? ", outside " : "",
+                outside ? outside->GetName() : "", inside ? ", inside " : "",
+                inside ? inside->GetName() : "");
   }
   for (std::size_t i = 0; i < block->GetSignals().size(); ++i)
     std::printf("%*s  signal %s\n", depth * 2, "", block->GetSignal(i)->GetName());
@@ -122,41 +129,66 @@ void ReadDesign(std::string const &path) {
   }
 }
 
+void PrintUsage(char const *program) {
+  std::fprintf(stderr,
+               "usage: %s [DIRECTORY]\n"
+               "       %s --open DIRECTORY\n"
+               "Writes a type library and a design database into DIRECTORY (by default a new\n"
+               "folder lum_example_XXXXXX in the current directory), then reopens and prints\n"
+               "the design. With --open it only reopens and prints what is in DIRECTORY.\n",
+               program, program);
+}
+
 } // namespace
 
 int main(int argc, char **argv) {
-  std::string directory;
-  bool temporary = false;
-  int status = 1;
+  std::string const first = argc > 1 ? argv[1] : "";
+  bool const open = first == "--open";
+  if (first == "-h" || first == "--help") {
+    PrintUsage(argv[0]);
+    return 0;
+  }
+  if ((open && argc != 3) || (!open && argc > 2) || (!open && !first.empty() && first[0] == '-')) {
+    PrintUsage(argv[0]);
+    return 2;
+  }
+
   try {
-    if (argc > 1) {
+    std::string directory;
+    if (open) {
+      directory = argv[2];
+    } else if (argc > 1) {
       directory = argv[1];
       std::filesystem::create_directories(directory);
     } else {
-      std::string pattern =
-          (std::filesystem::temp_directory_path() / "lum_example_XXXXXX").string();
+      // A new folder per run, so that no earlier result is overwritten.
+      std::string pattern = "lum_example_XXXXXX";
       if (!::mkdtemp(pattern.data())) {
-        std::perror("mkdtemp");
+        std::perror("error: cannot make a folder in the current directory");
         return 1;
       }
       directory = pattern;
-      temporary = true;
     }
+    directory = std::filesystem::absolute(directory).lexically_normal().string();
+    if (directory.size() > 1 && directory.back() == '/')
+      directory.pop_back();
     std::string const database = directory + "/counter.odb";
-    WriteCellLibrary(directory);
+    // The design's blocks are typed from CELLS.tlm, looked up in the same folder.
     Lum_TlmCatalog::AddSearchDirectory(directory.c_str());
-    WriteDesign(database);
-    std::printf("saved %s\n", database.c_str());
+
+    if (!open) {
+      WriteCellLibrary(directory);
+      WriteDesign(database);
+      std::printf("saved %s and %s/CELLS.tlm\n", database.c_str(), directory.c_str());
+    }
     ReadDesign(database);
-    status = 0;
+    if (!open)
+      std::printf("kept in %s; to look at it again:\n  %s --open %s\n", directory.c_str(), argv[0],
+                  directory.c_str());
   } catch (std::exception const &e) {
     // Port::Exception's what() names the object and the source of the error.
     std::fprintf(stderr, "error: %s\n", e.what());
+    return 1;
   }
-  // A directory the example made for itself goes with it.
-  if (temporary) {
-    std::error_code ignored;
-    std::filesystem::remove_all(directory, ignored);
-  }
-  return status;
+  return 0;
 }

@@ -33,9 +33,11 @@ Orb_Block *TypeViewBlock(Orb_Design const *design) {
 // saves the library's host model with the database.
 class LocalLibraryCompanion : public Orb_ModelCompanion {
 public:
+  // `taken`: the host model was a waiting one, taken from the design's model.
   LocalLibraryCompanion(std::unique_ptr<Orb_Model> host, std::unique_ptr<Lum_TlmModel> client,
-                        Lum_TlmLibrary *library)
-      : m_pHost(std::move(host)), m_pClient(std::move(client)), m_pLibrary(library) {}
+                        Lum_TlmLibrary *library, bool taken)
+      : m_pHost(std::move(host)), m_pClient(std::move(client)), m_pLibrary(library),
+        m_Taken(taken) {}
   ~LocalLibraryCompanion() override {
     // The client model detaches from the host model, so it goes first.
     m_pClient.reset();
@@ -45,10 +47,20 @@ public:
   Orb_Model const *GetModelToSave() const override { return m_pHost.get(); }
   Lum_TlmLibrary *GetLibrary() const { return m_pLibrary; }
 
+  std::unique_ptr<Orb_Model> ReleaseTakenModel() override {
+    if (!m_Taken)
+      return nullptr;
+    // The client model's objects go; the host model stays as it was read.
+    m_pClient.reset();
+    m_pLibrary = nullptr;
+    return std::move(m_pHost);
+  }
+
 private:
   std::unique_ptr<Orb_Model> m_pHost;
   std::unique_ptr<Lum_TlmModel> m_pClient;
   Lum_TlmLibrary *m_pLibrary;
+  bool m_Taken;
 };
 
 } // namespace
@@ -183,6 +195,7 @@ Lum_TlmLibrary *Lum_TlmLibrary::GetLocalLibrary(Orb_Model *model, PM_PIC const &
     return companion->GetLibrary();
 
   std::unique_ptr<Orb_Model> host = model->TakeLoadedCompanion(key);
+  bool const taken = host != nullptr;
   std::unique_ptr<Lum_TlmModel> client;
   Lum_TlmLibrary *library = nullptr;
   if (host) {
@@ -197,8 +210,8 @@ Lum_TlmLibrary *Lum_TlmLibrary::GetLocalLibrary(Orb_Model *model, PM_PIC const &
     client = std::make_unique<Lum_TlmModel>(host.get());
     library = client->CreateLibrary(LOCAL_LIBRARY_NAME, 1, 0);
   }
-  model->SetCompanion(
-      key, std::make_unique<LocalLibraryCompanion>(std::move(host), std::move(client), library));
+  model->SetCompanion(key, std::make_unique<LocalLibraryCompanion>(
+                               std::move(host), std::move(client), library, taken));
   return library;
 }
 

@@ -121,12 +121,16 @@ public:
   // when the file cannot be written (the previous file stays).
   void Save(char const *path) const;
 
-  // Loads a library by name for a personality: from the catalog, else from
-  // the first file found on the search path (<dir>/<personality>/<name>.tlm
-  // before <dir>/<name>.tlm). Each call takes a reference. Never null: a
-  // library that cannot be found throws Lum_ExceptionInvalidLibrary naming
-  // the library and the search path; an unreadable file throws what the host
-  // throws for it.
+  // Loads a library by name for a personality: a library registered under
+  // the name (whatever the personality), else the one already read for this
+  // name and personality, else the first file found on the search path
+  // (<dir>/<personality>/<name>.tlm before <dir>/<name>.tlm), read as a
+  // library of its own for this personality. Each call takes a reference on
+  // the library it returns. Never null: a library that cannot be found, a
+  // file that cannot be read (missing, truncated, corrupt, of a newer format;
+  // the message names the file and the reader's finding, such as the byte
+  // offset) and a file without this library throw Lum_ExceptionInvalidLibrary
+  // naming the library.
   static Lum_TlmLibrary const *LoadLibrary(Port::StringBase<char> const &name,
                                            PM_PIC const &personality);
   // Gives back a reference taken by LoadLibrary. A library read from a file
@@ -202,11 +206,12 @@ public:
 // files. Like the host model it is used from one thread at a time.
 class LUM_PLATFORM_API Lum_TlmCatalog {
 public:
-  // Makes an in-memory library loadable by its name. The caller keeps it
-  // alive while it is registered and while references that LoadLibrary gave
-  // out are held (its destruction unregisters it). Null,
-  // the local library's name, or a name already in the catalog (registered
-  // or read from a file) throws Lum_ExceptionInvalidLibrary.
+  // Makes an in-memory library loadable by its name, for every personality.
+  // The caller keeps it alive while it is registered and while references
+  // that LoadLibrary gave out are held (its destruction unregisters it).
+  // Null, the local library's name, or a name already in the catalog
+  // (registered, or read from a file for any personality) throws
+  // Lum_ExceptionInvalidLibrary.
   static void Register(Lum_TlmLibrary *library);
   // Removes a registered in-memory library, whatever its references. A
   // library that is not registered (or was read from a file) is ignored.
@@ -220,8 +225,12 @@ public:
   // The directories searched, in order, joined by ":".
   static std::string GetSearchPath();
 
-  // References held on the library of that name (0 when not in the catalog),
-  // and whether it is in the catalog.
+  // References held on the libraries of that name, all personalities
+  // together (0 when none is in the catalog), and whether any is.
   static unsigned GetReferenceCount(char const *name);
   static bool IsLoaded(char const *name);
+  // The same for the library that LoadLibrary gives for that name and
+  // personality.
+  static unsigned GetReferenceCount(char const *name, PM_PIC const &personality);
+  static bool IsLoaded(char const *name, PM_PIC const &personality);
 };

@@ -3,9 +3,11 @@
 #include "Lum_Tlm.h"
 
 #include "Lum_Exception.h"
+#include "Orb_Exception.h"
 
 #include <cstdlib>
 #include <filesystem>
+#include <map>
 #include <string>
 #include <string_view>
 #include <system_error>
@@ -27,6 +29,17 @@ struct Entry {
   std::unique_ptr<Lum_TlmModel> model;
 };
 
+// A library read from a file is keyed by its name and the personality it was
+// loaded for, since each personality may find its own file.
+using FileKey = std::pair<std::string, std::string>;
+
+// Where an entry lives: the registered map (personality unused) or the file
+// map.
+struct EntryKey {
+  bool registered;
+  FileKey key;
+};
+
 // Set when the catalog is destroyed at exit: libraries destroyed after it
 // (by other static objects) find nothing to unregister.
 bool g_CatalogDestroyed = false;
@@ -41,16 +54,33 @@ struct Catalog {
     g_CatalogDestroyed = true;
   }
 
-  std::unordered_map<std::string, Entry> byName;
+  // In-memory libraries by name; they serve every personality.
+  std::unordered_map<std::string, Entry> registered;
+  // Libraries read from files, by (name, personality): ordered, so that the
+  // libraries of one name are neighbours.
+  std::map<FileKey, Entry> files;
   // Release and unregister find a library by its address, without reading
   // it: a registered library may already be gone.
-  std::unordered_map<Lum_TlmLibrary const *, std::string> byLibrary;
+  std::unordered_map<Lum_TlmLibrary const *, EntryKey> byLibrary;
   std::vector<std::string> directories;
 };
 
 Catalog &TheCatalog() {
   static Catalog catalog;
   return catalog;
+}
+
+Entry *FindEntry(Catalog &catalog, Lum_TlmLibrary const *library) {
+  auto byLibrary = catalog.byLibrary.find(library);
+  if (byLibrary == catalog.byLibrary.end())
+    return nullptr;
+  EntryKey const &where = byLibrary->second;
+  if (where.registered) {
+    auto found = catalog.registered.find(where.key.first);
+    return found == catalog.registered.end() ? nullptr : &found->second;
+  }
+  auto found = catalog.files.find(where.key);
+  return found == catalog.files.end() ? nullptr : &found->second;
 }
 
 // Removes the library's entry and hands back its model (null for a
@@ -60,21 +90,25 @@ std::unique_ptr<Lum_TlmModel> RemoveEntry(Catalog &catalog, Lum_TlmLibrary const
   if (byLibrary == catalog.byLibrary.end())
     return nullptr;
   std::unique_ptr<Lum_TlmModel> model;
-  auto byName = catalog.byName.find(byLibrary->second);
-  if (byName != catalog.byName.end()) {
-    model = std::move(byName->second.model);
-    catalog.byName.erase(byName);
+  EntryKey const &where = byLibrary->second;
+  if (where.registered) {
+    catalog.registered.erase(where.key.first);
+  } else {
+    auto found = catalog.files.find(where.key);
+    if (found != catalog.files.end()) {
+      model = std::move(found->second.model);
+      catalog.files.erase(found);
+    }
   }
   catalog.byLibrary.erase(byLibrary);
   return model;
 }
 
-Entry *FindEntry(Catalog &catalog, Lum_TlmLibrary const *library) {
-  auto byLibrary = catalog.byLibrary.find(library);
-  if (byLibrary == catalog.byLibrary.end())
-    return nullptr;
-  auto byName = catalog.byName.find(byLibrary->second);
-  return byName == catalog.byName.end() ? nullptr : &byName->second;
+// The file libraries of that name, in personality order.
+template <class F> void ForEachFileEntry(Catalog &catalog, std::string const &name, F const &f) {
+  for (auto it = catalog.files.lower_bound(FileKey(name, std::string()));
+       it != catalog.files.end() && it->first.first == name; ++it)
+    f(it->second);
 }
 
 // The added directories, then those of LUM_TLM_PATH; empty entries are
@@ -140,17 +174,30 @@ std::string FindLibraryFile(std::string const &name, std::string const &personal
 Lum_TlmLibrary const *Lum_TlmLibrary::LoadLibrary(Port::StringBase<char> const &name,
                                                   PM_PIC const &personality) {
   Catalog &catalog = TheCatalog();
-  auto found = catalog.byName.find(name.str());
-  if (found != catalog.byName.end()) {
-    ++found->second.references;
-    return found->second.library;
+  auto registered = catalog.registered.find(name.str());
+  if (registered != catalog.registered.end()) {
+    ++registered->second.references;
+    return registered->second.library;
+  }
+  FileKey key(name.str(), personality.GetPersonality());
+  auto loaded = catalog.files.find(key);
+  if (loaded != catalog.files.end()) {
+    ++loaded->second.references;
+    return loaded->second.library;
   }
 
   std::string const path = FindLibraryFile(name.str(), personality.GetPersonality());
   if (path.empty())
     ThrowNotFound(name.str(), personality.GetPersonality());
   auto model = std::make_unique<Lum_TlmModel>(name.c_str(), path.c_str(), path.c_str(), false);
-  model->Open(path.c_str());
+  try {
+    model->Open(path.c_str());
+  } catch (Orb_Exception const &e) {
+    // The host's message names the file and says where and how it is broken.
+    throw Lum_ExceptionInvalidLibrary(
+        "Lum", kSourcePath, kRevision, __LINE__, name.c_str(),
+        ("The library file " + path + " cannot be read: " + e.GetMessage()).c_str(), false);
+  }
   Lum_TlmLibrary *library = model->GetDesignMgrByName(name.c_str());
   if (!library)
     throw Lum_ExceptionInvalidLibrary(
@@ -161,8 +208,13 @@ Lum_TlmLibrary const *Lum_TlmLibrary::LoadLibrary(Port::StringBase<char> const &
   entry.library = library;
   entry.references = 1;
   entry.model = std::move(model);
-  catalog.byName.emplace(name.str(), std::move(entry));
-  catalog.byLibrary.emplace(library, name.str());
+  auto inserted = catalog.files.emplace(key, std::move(entry)).first;
+  try {
+    catalog.byLibrary.emplace(library, EntryKey{false, key});
+  } catch (...) {
+    catalog.files.erase(inserted);
+    throw;
+  }
   return library;
 }
 
@@ -192,14 +244,19 @@ void Lum_TlmCatalog::Register(Lum_TlmLibrary *library) {
     throw Lum_ExceptionInvalidLibrary("Lum", kSourcePath, kRevision, __LINE__, name.c_str(),
                                       "This name is reserved for a design's local library.", false);
   Catalog &catalog = TheCatalog();
-  if (catalog.byName.count(name))
+  if (IsLoaded(name.c_str()))
     throw Lum_ExceptionInvalidLibrary("Lum", kSourcePath, kRevision, __LINE__, name.c_str(),
                                       "A type library of this name is already in the catalog.",
                                       false);
   Entry entry;
   entry.library = library;
-  catalog.byName.emplace(name, std::move(entry));
-  catalog.byLibrary.emplace(library, name);
+  auto inserted = catalog.registered.emplace(name, std::move(entry)).first;
+  try {
+    catalog.byLibrary.emplace(library, EntryKey{true, FileKey(name, std::string())});
+  } catch (...) {
+    catalog.registered.erase(inserted);
+    throw;
+  }
 }
 
 void Lum_TlmCatalog::Unregister(Lum_TlmLibrary const *library) {
@@ -232,10 +289,34 @@ std::string Lum_TlmCatalog::GetSearchPath() {
 
 unsigned Lum_TlmCatalog::GetReferenceCount(char const *name) {
   Catalog &catalog = TheCatalog();
-  auto found = catalog.byName.find(name ? name : "");
-  return found == catalog.byName.end() ? 0 : found->second.references;
+  std::string const key = name ? name : "";
+  auto registered = catalog.registered.find(key);
+  unsigned count = registered == catalog.registered.end() ? 0 : registered->second.references;
+  ForEachFileEntry(catalog, key, [&count](Entry const &entry) { count += entry.references; });
+  return count;
+}
+
+unsigned Lum_TlmCatalog::GetReferenceCount(char const *name, PM_PIC const &personality) {
+  Catalog &catalog = TheCatalog();
+  std::string key = name ? name : "";
+  auto registered = catalog.registered.find(key);
+  if (registered != catalog.registered.end())
+    return registered->second.references;
+  auto loaded = catalog.files.find(FileKey(std::move(key), personality.GetPersonality()));
+  return loaded == catalog.files.end() ? 0 : loaded->second.references;
 }
 
 bool Lum_TlmCatalog::IsLoaded(char const *name) {
-  return TheCatalog().byName.count(name ? name : "") != 0;
+  Catalog &catalog = TheCatalog();
+  std::string const key = name ? name : "";
+  bool loaded = catalog.registered.count(key) != 0;
+  ForEachFileEntry(catalog, key, [&loaded](Entry const &) { loaded = true; });
+  return loaded;
+}
+
+bool Lum_TlmCatalog::IsLoaded(char const *name, PM_PIC const &personality) {
+  Catalog &catalog = TheCatalog();
+  std::string key = name ? name : "";
+  return catalog.registered.count(key) != 0 ||
+         catalog.files.count(FileKey(std::move(key), personality.GetPersonality())) != 0;
 }

@@ -3,6 +3,7 @@
 #include "Orb_Exception.h"
 
 #include <string>
+#include <unordered_map>
 #include <utility>
 #include <vector>
 
@@ -19,11 +20,38 @@ struct GraftRun {
   // The manager's back reference maps, or null when those are off.
   std::unordered_map<Orb_Block const *, Orb_Block const *> *blockSources;
   std::unordered_map<Orb_Network const *, Orb_Network const *> *networkSources;
+  // The prefix of this graft's network names: the destination block's path.
+  std::string networkPrefix;
   std::unordered_map<Orb_Pin const *, Orb_Pin *> pinCopies;
   // Copied signals in creation order, so that connections are made in a
   // reproducible order.
   std::vector<std::pair<Orb_Signal const *, Orb_Signal *>> signalCopies;
+  // This graft's network for each source network.
+  std::unordered_map<Orb_Network const *, Orb_Network *> networkCopies;
 };
+
+// The destination's path through its blocks, as "top/u1/".
+std::string PathPrefix(Orb_Block const *block) {
+  std::string path;
+  for (; block; block = block->GetParent())
+    path.insert(0, 1, '/').insert(0, block->GetNameString());
+  return path;
+}
+
+// A network of its own for the copies of one source network, named after the
+// destination and the source network, made unique in the view.
+Orb_Network *CopyNetwork(GraftRun &run, Orb_Network const *network, Orb_View *view) {
+  std::string const base = run.networkPrefix + network->GetNameString();
+  std::string name = base;
+  for (unsigned n = 1; view->GetNetworkByName(name.c_str()); ++n)
+    name = base + "_" + std::to_string(n);
+  Orb_Network *copy = view->CreateNetwork(name.c_str());
+  copy->CopyPropertiesFrom(*network);
+  run.networkCopies.emplace(network, copy);
+  if (run.networkSources)
+    (*run.networkSources)[copy] = network;
+  return copy;
+}
 
 void CopySignals(GraftRun &run, Orb_Block const *source, Orb_Block *copy) {
   Orb_View *view = copy->GetView();
@@ -34,13 +62,9 @@ void CopySignals(GraftRun &run, Orb_Block const *source, Orb_Block *copy) {
     Orb_Network const *network = signal->GetNetwork();
     if (!network)
       continue;
-    Orb_Network *target = view->GetNetworkByName(network->GetName());
-    if (!target) {
-      target = view->CreateNetwork(network->GetName());
-      target->CopyPropertiesFrom(*network);
-      if (run.networkSources)
-        (*run.networkSources)[target] = network;
-    }
+    auto known = run.networkCopies.find(network);
+    Orb_Network *target =
+        known != run.networkCopies.end() ? known->second : CopyNetwork(run, network, view);
     target->AddSignal(signalCopy);
   }
 }
@@ -62,9 +86,10 @@ void CopyBlock(GraftRun &run, Orb_Block const *source, Orb_Block *parent) {
 
 void ConnectCopies(GraftRun &run) {
   // Walking each copied signal's source pins reproduces its connection order.
-  // Pins outside the source subtree have no copy and stay behind. The pairs
-  // are collected first: a destination pin may still hang on a source signal
-  // of the same view, and connecting it would change the list being walked.
+  // Pins outside the source subtree have no copy and stay behind; a pin of
+  // the source block itself stands for the destination's pin of that name,
+  // whose inner side takes the copy. The pairs are collected first, so that
+  // no connection changes a pin list being walked.
   std::vector<std::pair<Orb_Pin *, Orb_Signal *>> connections;
   for (auto const &[signal, signalCopy] : run.signalCopies) {
     for (Orb_Pin const *pin : signal->GetPins()) {
@@ -80,8 +105,14 @@ void ConnectCopies(GraftRun &run) {
         connections.emplace_back(pinCopy, signalCopy);
     }
   }
-  for (auto const &[pin, signal] : connections)
-    pin->Connect(signal);
+  // A copy sits where its source sat, so the side is the source's: inner for
+  // a pin of the signal's own block, outer for a pin of a child block.
+  for (auto const &[pin, signal] : connections) {
+    if (pin->GetParent() == signal->GetParent())
+      pin->ConnectInner(signal);
+    else
+      pin->Connect(signal);
+  }
 }
 
 } // namespace
@@ -111,6 +142,8 @@ bool Ora_GraftMgr::Graft(Orb_Block const *source, Orb_Block *destination) {
                destination,
                m_BlockBackReferences ? &m_BlockSources : nullptr,
                m_NetworkBackReferences ? &m_NetworkSources : nullptr,
+               PathPrefix(destination),
+               {},
                {},
                {}};
   CopySignals(run, source, destination);

@@ -7,9 +7,14 @@
 // Copies the contents of one block under another, possibly of another host
 // model: child blocks recursively with their pins, signals, properties and
 // connections, and, in the destination's view, networks for the copied
-// signals (joining a network of the same name when there is one). A pin of
-// the source block itself stands for the destination's pin of the same name:
-// the copies of inner signals that it connected are connected to that pin.
+// signals. A pin of the source block itself stands for the destination's pin
+// of the same name: the copy of the signal that it connected inside is
+// connected to that pin's inner side; its outer side is never touched.
+//
+// Each graft makes its own network per source network that a copied signal
+// belongs to, named "<destination path>/<source network>" (for example
+// "top/u1/VCC"), with "_1", "_2", ... appended when the view has that name
+// already: two grafts never share a network, nor join one of the view's.
 //
 // Every copy is created first (its OnCreate event fires) and only then given
 // the source's properties, so a copy carries them whatever its creation
@@ -23,8 +28,7 @@ public:
   virtual ~Ora_GraftMgr();
 
   // With back references on, the manager remembers the source of each block
-  // or network it copies, for as long as the manager lives (not saved). A
-  // network that a graft joined but did not create has no source.
+  // or network it copies, for as long as the manager lives (not saved).
   void SetBlockBackReferences(bool on) { m_BlockBackReferences = on; }
   void SetNetworkBackReferences(bool on) { m_NetworkBackReferences = on; }
 

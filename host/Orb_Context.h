@@ -16,7 +16,9 @@ class Orb_SignalDerived;
 class Orb_ViewDerived;
 
 // A context's bridge table of one kind, read by bridge id. It stays valid
-// while the context lives, also when the table grows.
+// while the context lives, also when the table grows. Bridge ids are numbered
+// per host model: only ids of the context's own model's objects mean anything
+// here (Orb_Context::GetClient checks the model).
 class LUM_PLATFORM_API Orb_BridgeHandle {
 public:
   explicit Orb_BridgeHandle(std::vector<Orb_ClientObject *> const *table) : m_pTable(table) {}
@@ -41,8 +43,8 @@ public:
     return Orb_BridgeHandle(&m_Bridge[static_cast<unsigned>(kind)]);
   }
 
-  // The existing client of the object in this context, or null. Never
-  // creates one.
+  // The existing client of the object in this context, or null (also for an
+  // object of another host model). Never creates one.
   Orb_ClientObject *GetClient(Orb_Persistent const *object) const;
   Orb_DesignMgrDerived *GetClient(Orb_DesignMgr const *object) const;
   Orb_DesignDerived *GetClient(Orb_Design const *object) const;
@@ -54,7 +56,8 @@ public:
 
   // The client of the object; when it has none, fires this context's OnLoad
   // event for it and returns what the event made (null if it made nothing).
-  // A null object gives null.
+  // A null object gives null; an object of another host model throws
+  // Orb_Exception and fires nothing.
   Orb_ClientObject *Specialize(Orb_Persistent *object);
   Orb_DesignMgrDerived *Specialize(Orb_DesignMgr *object);
   Orb_DesignDerived *Specialize(Orb_Design *object);
@@ -74,7 +77,10 @@ protected:
 private:
   friend class Orb_ClientObject;
   friend class Orb_ModelDerived;
+  // Throws Orb_Exception for an object of another model or one that has a
+  // client here already.
   void Register(Orb_ClientObject *client);
+  void CheckOwnModel(Orb_Persistent const *object) const;
   void Unregister(Orb_ClientObject *client);
 
   Orb_Model *m_pOrbModel;

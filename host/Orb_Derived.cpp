@@ -17,7 +17,9 @@ char const *const kSource = "host/Orb_Derived";
 // Orb_Context
 
 Orb_ClientObject *Orb_Context::GetClient(Orb_Persistent const *object) const {
-  if (!object)
+  // Bridge ids are numbered per host model: another model's object would
+  // find the client of an unrelated object here.
+  if (!object || object->GetModel() != m_pOrbModel)
     return nullptr;
   return GetBridgeHandle(object->GetKind())[object->GetBridgeId()];
 }
@@ -25,6 +27,7 @@ Orb_ClientObject *Orb_Context::GetClient(Orb_Persistent const *object) const {
 Orb_ClientObject *Orb_Context::Specialize(Orb_Persistent *object) {
   if (!object)
     return nullptr;
+  CheckOwnModel(object);
   if (Orb_ClientObject *client = GetClient(object))
     return client;
   // Orb_ModelDerived is the only context there is.
@@ -97,8 +100,19 @@ std::size_t Orb_Context::GetClientCount() const {
   return count;
 }
 
+void Orb_Context::CheckOwnModel(Orb_Persistent const *object) const {
+  if (object->GetModel() != m_pOrbModel)
+    throw Orb_Exception(kSource, __LINE__, object->GetName(),
+                        (std::string("The ") + Orb_KindName(object->GetKind()) + " <" +
+                         object->GetName() + "> belongs to host model <" +
+                         object->GetModel()->GetName() + ">, not to this context's model <" +
+                         m_pOrbModel->GetName() + ">.")
+                            .c_str());
+}
+
 void Orb_Context::Register(Orb_ClientObject *client) {
   Orb_Persistent *object = client->GetOrbObject();
+  CheckOwnModel(object);
   auto &table = m_Bridge[static_cast<unsigned>(object->GetKind())];
   unsigned const id = object->GetBridgeId();
   if (id >= table.size())
@@ -333,9 +347,23 @@ Orb_ModelDerived::Orb_ModelDerived(Orb_Model *model) : Orb_Context(model) {
 }
 
 Orb_ModelDerived::~Orb_ModelDerived() {
-  for (Orb_DesignMgr *designMgr : GetOrbModel()->GetDesignMgrs())
-    Orb_VisitPostOrder(designMgr, [this](Orb_Persistent *object) { delete GetClient(object); });
-  GetOrbModel()->Detach(this);
+  Orb_Model *model = GetOrbModel();
+  {
+    // Client destructors may delete clients or host objects: the hold keeps
+    // host objects in memory while the walk goes on, and the walk looks each
+    // client up when it gets there.
+    Orb_Model::FreeHold hold(*model);
+    std::vector<Orb_DesignMgr *> const &designMgrs = model->GetDesignMgrs();
+    for (std::size_t i = 0; i < designMgrs.size(); ++i)
+      Orb_VisitPostOrder(designMgrs[i],
+                         [this](Orb_Persistent *object) { delete GetClient(object); });
+    // Whatever the walk missed (a destructor that moved objects about) or a
+    // destructor specialized behind it.
+    for (auto &table : m_Bridge)
+      for (std::size_t id = 0; id < table.size(); ++id)
+        delete table[id];
+  }
+  model->Detach(this);
   // m_pOwnedModel, if any, goes with this object.
 }
 

@@ -47,7 +47,7 @@ public:
 
 protected:
   // Registers the client; throws Orb_Exception if the object already has a
-  // client in this context.
+  // client in this context or belongs to another host model.
   Orb_ClientObject(Orb_Context *context, Orb_Persistent *object);
   // The host's own dump of the object: kind, name and properties.
   void DbgHost() const;
@@ -62,8 +62,11 @@ public:
   Orb_PinDerived(Orb_Context *context, Orb_Pin *pin) : Orb_ClientObject(context, pin) {}
   Orb_Pin *GetOrbPin() const { return static_cast<Orb_Pin *>(GetOrbObject()); }
   Orb_Pin::PIN_DIRECTION GetDirection() const { return GetOrbPin()->GetDirection(); }
-  // The connected host signal, or null.
+  // The outer connection (a signal of the parent block of the pin's block),
+  // or null.
   Orb_Signal *GetSignal() const { return GetOrbPin()->GetSignal(); }
+  // The inner connection (a signal of the pin's own block), or null.
+  Orb_Signal *GetInnerSignal() const { return GetOrbPin()->GetInnerSignal(); }
   // The parent block's client, specialized on demand.
   Orb_BlockDerived *GetParent() const;
   void Dbg() const { DbgHost(); }
@@ -94,7 +97,8 @@ public:
   Orb_BlockDerived(Orb_Context *context, Orb_Block *block) : Orb_ClientObject(context, block) {}
   Orb_Block *GetOrbBlock() const { return static_cast<Orb_Block *>(GetOrbObject()); }
 
-  // The client of `block` in `context`, or null. Never creates one.
+  // The client of `block` in `context`, or null (also for a block of another
+  // host model than the context's). Never creates one.
   static Orb_BlockDerived *OrbResolve(Orb_Context const *context, Orb_Block const *block);
 
   // Parent block (null for a top block) and view, specialized on demand.
@@ -168,7 +172,8 @@ public:
 // owns, or attaches to an existing one. It never loads anything by itself.
 // Destroying it destroys every client still in its bridge (children before
 // parents, while their host objects exist), then detaches from the host model
-// and frees the host model if it made it.
+// and frees the host model if it made it. A client destructor may delete
+// other clients or host objects meanwhile.
 class LUM_PLATFORM_API Orb_ModelDerived : public Orb_Context, public Orb_Sync {
 public:
   Orb_ModelDerived(char const *name, char const *dbName, char const *path, bool readOnly);

@@ -9,6 +9,7 @@
 
 #include <algorithm>
 #include <cassert>
+#include <exception>
 #include <new>
 #include <string>
 
@@ -28,6 +29,25 @@ void ThrowDuplicate(Orb_Persistent const *parent, char const *kind, char const *
 void CheckName(char const *name, char const *kind) {
   if (!name || !*name)
     throw Orb_Exception(kSource, __LINE__, "", (std::string("Empty ") + kind + " name.").c_str());
+}
+
+// Nothing is created in an object that a deletion under way is about to free.
+void CheckNotDying(Orb_Persistent const *parent, char const *kind, char const *name) {
+  if (parent->IsBeingDeleted())
+    throw Orb_Exception(kSource, __LINE__, name,
+                        (std::string("Cannot create a ") + kind + " in " +
+                         Orb_KindName(parent->GetKind()) + " <" + parent->GetName() +
+                         ">, which is being deleted.")
+                            .c_str());
+}
+
+// A pin's or signal's place, as "top/u1/name".
+std::string PathOf(Orb_Persistent const *object) {
+  std::string path = object->GetNameString();
+  for (Orb_Persistent const *p = object->GetParentObject(); p && p->GetKind() == Orb_Kind::Block;
+       p = p->GetParentObject())
+    path.insert(0, 1, '/').insert(0, p->GetNameString());
+  return path;
 }
 
 } // namespace
@@ -69,10 +89,10 @@ char const *Orb_PinDirectionName(Orb_Pin::PIN_DIRECTION direction) {
 
 Orb_Persistent::Orb_Persistent(Orb_Model *model, Orb_Kind kind, Orb_Persistent *parent,
                                std::string name)
-    : m_Name(std::move(name)), m_pModel(model), m_pParent(parent), m_Kind(kind),
-      m_BridgeId(model->AllocateBridgeId(kind)) {}
+    : m_Name(std::move(name)), m_pModel(model), m_pParent(parent),
+      m_BridgeId(model->AllocateBridgeId(kind)), m_Kind(static_cast<std::uint8_t>(kind)) {}
 
-Orb_Persistent::~Orb_Persistent() { m_pModel->ReleaseBridgeId(m_Kind, m_BridgeId); }
+Orb_Persistent::~Orb_Persistent() { m_pModel->ReleaseBridgeId(GetKind(), m_BridgeId); }
 
 Orb_Pin::Orb_Pin(Orb_Model *model, Orb_Block *parent, std::string name, PIN_DIRECTION direction)
     : Orb_Persistent(model, Orb_Kind::Pin, parent, std::move(name)), m_Direction(direction) {}
@@ -80,23 +100,46 @@ Orb_Pin::Orb_Pin(Orb_Model *model, Orb_Block *parent, std::string name, PIN_DIRE
 Orb_Block *Orb_Pin::GetParent() const { return static_cast<Orb_Block *>(GetParentObject()); }
 
 void Orb_Pin::Connect(Orb_Signal *signal) {
-  if (signal == m_pSignal)
-    return;
-  if (signal && signal->GetParent()->GetView() != GetParent()->GetView())
+  Orb_Block *outside = GetParent()->GetParent();
+  if (signal && signal->GetParent() != outside) {
+    std::string message =
+        "Pin <" + PathOf(this) + "> cannot connect outside to signal <" + PathOf(signal) + ">: ";
+    message += outside
+                   ? "the pin connects outside only to signals of block <" + PathOf(outside) + ">."
+                   : "a top block's pin connects only inside.";
+    throw Orb_Exception(kSource, __LINE__, GetName(), message.c_str());
+  }
+  Link(m_pSignal, signal);
+}
+
+void Orb_Pin::ConnectInner(Orb_Signal *signal) {
+  if (signal && signal->GetParent() != GetParent())
     throw Orb_Exception(kSource, __LINE__, GetName(),
-                        "A pin can only connect to a signal of its own view.");
-  Disconnect();
-  m_pSignal = signal;
+                        ("Pin <" + PathOf(this) + "> cannot connect inside to signal <" +
+                         PathOf(signal) + ">: the pin connects inside only to signals of block <" +
+                         PathOf(GetParent()) + ">.")
+                            .c_str());
+  Link(m_pInnerSignal, signal);
+}
+
+void Orb_Pin::Link(Orb_Signal *&side, Orb_Signal *signal) {
+  if (signal == side)
+    return;
+  // Room first, so that running out of memory changes nothing.
+  if (signal)
+    signal->m_Pins.reserve(signal->m_Pins.size() + 1);
+  Unlink(side);
+  side = signal;
   if (signal)
     signal->m_Pins.push_back(this);
 }
 
-void Orb_Pin::Disconnect() noexcept {
-  if (!m_pSignal)
+void Orb_Pin::Unlink(Orb_Signal *&side) noexcept {
+  if (!side)
     return;
-  auto &pins = m_pSignal->m_Pins;
+  auto &pins = side->m_Pins;
   pins.erase(std::find(pins.begin(), pins.end(), this));
-  m_pSignal = nullptr;
+  side = nullptr;
 }
 
 Orb_Signal::Orb_Signal(Orb_Model *model, Orb_Block *parent, std::string name)
@@ -139,6 +182,7 @@ Orb_Block *Orb_Block::GetParent() const {
 
 Orb_Block *Orb_Block::CreateBlock(char const *name, int /*flags*/) {
   CheckName(name, "block");
+  CheckNotDying(this, "block", name);
   if (m_Blocks.Find(name))
     ThrowDuplicate(this, "block", name);
   auto *block = new Orb_Block(GetModel(), this, m_pView, name);
@@ -148,6 +192,7 @@ Orb_Block *Orb_Block::CreateBlock(char const *name, int /*flags*/) {
 
 Orb_Pin *Orb_Block::CreatePin(char const *name, Orb_Pin::PIN_DIRECTION direction) {
   CheckName(name, "pin");
+  CheckNotDying(this, "pin", name);
   if (m_Pins.Find(name))
     ThrowDuplicate(this, "pin", name);
   auto *pin = new Orb_Pin(GetModel(), this, name, direction);
@@ -157,6 +202,7 @@ Orb_Pin *Orb_Block::CreatePin(char const *name, Orb_Pin::PIN_DIRECTION direction
 
 Orb_Signal *Orb_Block::CreateSignal(char const *name) {
   CheckName(name, "signal");
+  CheckNotDying(this, "signal", name);
   if (m_Signals.Find(name))
     ThrowDuplicate(this, "signal", name);
   auto *signal = new Orb_Signal(GetModel(), this, name);
@@ -192,6 +238,7 @@ Orb_Design *Orb_View::GetParent() const { return static_cast<Orb_Design *>(GetPa
 
 Orb_Block *Orb_View::CreateTopBlock(char const *name) {
   CheckName(name, "block");
+  CheckNotDying(this, "block", name);
   if (m_pTopBlock)
     throw Orb_Exception(kSource, __LINE__, GetName(), "The view already has a top block.");
   m_pTopBlock = new Orb_Block(GetModel(), this, this, name);
@@ -200,6 +247,7 @@ Orb_Block *Orb_View::CreateTopBlock(char const *name) {
 
 Orb_Network *Orb_View::CreateNetwork(char const *name) {
   CheckName(name, "network");
+  CheckNotDying(this, "network", name);
   if (m_Networks.Find(name))
     ThrowDuplicate(this, "network", name);
   auto *network = new Orb_Network(GetModel(), this, name);
@@ -226,6 +274,7 @@ Orb_DesignMgr *Orb_Design::GetParent() const {
 
 Orb_View *Orb_Design::CreateView(char const *name) {
   CheckName(name, "view");
+  CheckNotDying(this, "view", name);
   if (m_Views.Find(name))
     ThrowDuplicate(this, "view", name);
   auto *view = new Orb_View(GetModel(), this, name);
@@ -243,6 +292,7 @@ Orb_DesignMgr::Orb_DesignMgr(Orb_Model *model, std::string name)
 
 Orb_Design *Orb_DesignMgr::CreateDesign(char const *name) {
   CheckName(name, "design");
+  CheckNotDying(this, "design", name);
   if (m_Designs.Find(name))
     ThrowDuplicate(this, "design", name);
   auto *design = new Orb_Design(GetModel(), this, name);
@@ -257,6 +307,8 @@ void Orb_DesignMgr::DeleteDesign(Orb_Design *design) {
 
 Orb_ModelCompanion::~Orb_ModelCompanion() = default;
 
+std::unique_ptr<Orb_Model> Orb_ModelCompanion::ReleaseTakenModel() { return nullptr; }
+
 // ---------------------------------------------------------------------------
 // Model
 
@@ -266,6 +318,7 @@ Orb_Model::Orb_Model(char const *name, char const *dbName, char const *path, boo
 
 Orb_Model::~Orb_Model() {
   assert(m_Contexts.empty() && "Orb_Model destroyed while client models are attached");
+  assert(m_HoldDepth == 0 && "Orb_Model destroyed while a deletion or an open is under way");
   // Companions may hold client models of their own host models; they go
   // before this model's objects.
   m_Companions.clear();
@@ -291,12 +344,51 @@ void Orb_Model::DeleteDesignMgr(Orb_DesignMgr *designMgr) {
 
 void Orb_Model::SetCompanion(std::string const &key,
                              std::unique_ptr<Orb_ModelCompanion> companion) {
-  m_Companions[key] = std::move(companion);
+  std::unique_ptr<Orb_ModelCompanion> &slot = m_Companions[key];
+  if (m_pOpenJournal && slot) {
+    auto before = m_pOpenJournal->liveBefore.find(key);
+    // The one that was there before the open is kept for a refusal to restore.
+    if (before != m_pOpenJournal->liveBefore.end() && before->second == slot.get())
+      m_pOpenJournal->replaced.emplace(key, std::move(slot));
+  }
+  slot = std::move(companion);
 }
 
 Orb_ModelCompanion *Orb_Model::GetCompanion(std::string const &key) const {
   auto it = m_Companions.find(key);
   return it == m_Companions.end() ? nullptr : it->second.get();
+}
+
+void Orb_Model::RestoreCompanions(OpenJournal &journal) noexcept {
+  for (auto it = m_Companions.begin(); it != m_Companions.end();) {
+    std::string const &key = it->first;
+    auto before = journal.liveBefore.find(key);
+    if (before != journal.liveBefore.end() && before->second == it->second.get()) {
+      ++it;
+      continue;
+    }
+    std::unique_ptr<Orb_ModelCompanion> added = std::move(it->second);
+    // A model that was waiting before the open and that this companion took
+    // waits again.
+    if (added && journal.waitingBefore.count(key) && !m_LoadedCompanions.count(key)) {
+      try {
+        if (std::unique_ptr<Orb_Model> taken = added->ReleaseTakenModel())
+          m_LoadedCompanions.emplace(key, std::move(taken));
+      } catch (...) {
+        // Without memory to keep it, the model goes with its companion.
+      }
+    }
+    added.reset();
+    // Nothing removes a key during an open, so a replaced companion's slot is
+    // still here to take it back.
+    auto replaced = journal.replaced.find(key);
+    if (replaced != journal.replaced.end()) {
+      it->second = std::move(replaced->second);
+      ++it;
+    } else {
+      it = m_Companions.erase(it);
+    }
+  }
 }
 
 std::unique_ptr<Orb_Model> Orb_Model::TakeLoadedCompanion(std::string const &key) {
@@ -359,6 +451,9 @@ template <class T> T *Orb_Model::Announce(T *object) {
 }
 
 void Orb_Model::AnnounceLoad(Orb_Persistent *object) {
+  // A handler may have deleted it before its turn came.
+  if (object->m_Dying)
+    return;
   for (std::size_t i = 0; i < m_Subscribers.size(); ++i) {
     Orb_ModelDerived *context = m_Subscribers[i];
     if (!context->GetClient(object))
@@ -368,33 +463,39 @@ void Orb_Model::AnnounceLoad(Orb_Persistent *object) {
 
 namespace {
 
-// Pre-order walk of a block tree: each block, its pins, its signals, then
-// its child blocks.
-template <class F> void WalkBlockTree(Orb_Block *block, F const &visit) {
-  visit(block);
-  for (std::size_t i = 0; i < block->GetPins().size(); ++i)
-    visit(block->GetPins()[i]);
-  for (std::size_t i = 0; i < block->GetSignals().size(); ++i)
-    visit(block->GetSignals()[i]);
-  for (std::size_t i = 0; i < block->GetBlocks().size(); ++i)
-    WalkBlockTree(block->GetBlocks()[i], visit);
+// A block tree in pre-order: each block, its pins, its signals, then its
+// child blocks.
+void CollectBlockTree(Orb_Block *block, std::vector<Orb_Persistent *> &out) {
+  out.push_back(block);
+  out.insert(out.end(), block->GetPins().begin(), block->GetPins().end());
+  out.insert(out.end(), block->GetSignals().begin(), block->GetSignals().end());
+  for (Orb_Block *child : block->GetBlocks())
+    CollectBlockTree(child, out);
 }
 
 } // namespace
 
 void Orb_Model::AnnounceLoadTree(Orb_DesignMgr *designMgr) {
-  auto announce = [this](Orb_Persistent *object) { AnnounceLoad(object); };
-  announce(designMgr);
-  for (std::size_t d = 0; d < designMgr->GetDesigns().size(); ++d) {
-    Orb_Design *design = designMgr->GetDesigns()[d];
-    announce(design);
-    for (std::size_t v = 0; v < design->GetViews().size(); ++v) {
-      Orb_View *view = design->GetViews()[v];
-      announce(view);
+  // Handlers run client code that may delete or create objects: each level
+  // is walked from a snapshot, which the caller's FreeHold keeps in memory,
+  // one view at a time.
+  assert(m_HoldDepth > 0 && "AnnounceLoadTree needs a FreeHold");
+  AnnounceLoad(designMgr);
+  std::vector<Orb_Design *> const designs = designMgr->GetDesigns();
+  std::vector<Orb_Persistent *> objects;
+  for (Orb_Design *design : designs) {
+    AnnounceLoad(design);
+    std::vector<Orb_View *> const views = design->GetViews();
+    for (Orb_View *view : views) {
+      AnnounceLoad(view);
+      if (view->m_Dying)
+        continue;
+      objects.clear();
       if (view->GetBlock())
-        WalkBlockTree(view->GetBlock(), announce);
-      for (std::size_t n = 0; n < view->GetNetworks().size(); ++n)
-        announce(view->GetNetworks()[n]);
+        CollectBlockTree(view->GetBlock(), objects);
+      objects.insert(objects.end(), view->GetNetworks().begin(), view->GetNetworks().end());
+      for (Orb_Persistent *object : objects)
+        AnnounceLoad(object);
     }
   }
 }
@@ -410,9 +511,48 @@ void Orb_Model::FireDelete(Orb_Persistent *object) {
 
 void Orb_Model::Delete(Orb_Persistent *object) {
   assert(object && object->GetModel() == this && "Delete: object of another model");
-  Orb_VisitPostOrder(object, [this](Orb_Persistent *owned) { FireDelete(owned); });
+  // Already held by a deletion under way, which fires its events and frees it.
+  if (object->m_Dying)
+    return;
+  // The snapshot stays readable under the hold whatever the handlers change.
+  // Memory is taken first: a failure here must leave nothing marked.
+  std::vector<Orb_Persistent *> doomed;
+  Orb_VisitPostOrder(object, [&doomed](Orb_Persistent *owned) { doomed.push_back(owned); });
+  if (m_PendingFrees.size() == m_PendingFrees.capacity())
+    m_PendingFrees.reserve(2 * m_PendingFrees.size() + 1);
+  FreeHold hold(*this);
+  m_PendingFrees.push_back(object);
+  // Marked before any handler runs, so that a handler's deletion of an
+  // object of the subtree is left to this walk.
+  for (Orb_Persistent *owned : doomed)
+    owned->m_Dying = true;
+  std::exception_ptr failure;
+  for (Orb_Persistent *owned : doomed) {
+    // A handler's deletion of an ancestor may have fired it already.
+    if (owned->m_DeleteFired)
+      continue;
+    owned->m_DeleteFired = true;
+    try {
+      FireDelete(owned);
+    } catch (...) {
+      if (!failure)
+        failure = std::current_exception();
+    }
+  }
   Unlink(object);
-  Free(object);
+  if (failure)
+    std::rethrow_exception(failure);
+}
+
+void Orb_Model::ReleaseHold() noexcept {
+  if (--m_HoldDepth > 0)
+    return;
+  // Client destructors run by Free may delete more; those queue behind.
+  ++m_HoldDepth;
+  for (std::size_t i = 0; i < m_PendingFrees.size(); ++i)
+    Free(m_PendingFrees[i]);
+  m_PendingFrees.clear();
+  --m_HoldDepth;
 }
 
 void Orb_Model::Unlink(Orb_Persistent *object) {
@@ -445,7 +585,7 @@ void Orb_Model::Unlink(Orb_Persistent *object) {
   }
 }
 
-void Orb_Model::Free(Orb_Persistent *object, bool keepLinks) {
+void Orb_Model::Free(Orb_Persistent *object, bool keepLinks) noexcept {
   switch (object->GetKind()) {
   case Orb_Kind::DesignMgr:
     for (Orb_Design *design : static_cast<Orb_DesignMgr *>(object)->GetDesigns())
@@ -466,7 +606,8 @@ void Orb_Model::Free(Orb_Persistent *object, bool keepLinks) {
   case Orb_Kind::Block: {
     auto *block = static_cast<Orb_Block *>(object);
     // Signals before pins: a signal lets go of all its pins at once, so the
-    // pins connected to it (often its children's) have nothing to undo.
+    // pins connected to it (its block's and its children's) have nothing to
+    // undo.
     for (Orb_Signal *signal : block->GetSignals())
       Free(signal, keepLinks);
     for (Orb_Pin *pin : block->GetPins())
@@ -476,15 +617,18 @@ void Orb_Model::Free(Orb_Persistent *object, bool keepLinks) {
     break;
   }
   case Orb_Kind::Pin:
-    if (keepLinks)
-      static_cast<Orb_Pin *>(object)->Disconnect();
+    if (keepLinks) {
+      auto *pin = static_cast<Orb_Pin *>(object);
+      pin->Unlink(pin->m_pSignal);
+      pin->Unlink(pin->m_pInnerSignal);
+    }
     break;
   case Orb_Kind::Signal: {
     auto *signal = static_cast<Orb_Signal *>(object);
     if (!keepLinks)
       break;
     for (Orb_Pin *pin : signal->m_Pins)
-      pin->m_pSignal = nullptr;
+      (pin->GetParent() == signal->GetParent() ? pin->m_pInnerSignal : pin->m_pSignal) = nullptr;
     if (signal->m_pNetwork)
       signal->m_pNetwork->RemoveSignal(signal);
     break;
@@ -498,6 +642,10 @@ void Orb_Model::Free(Orb_Persistent *object, bool keepLinks) {
     break;
   }
   }
+  // A client made for the object after its delete event (a handler that
+  // specialized a dying sibling) goes with it.
+  for (std::size_t i = 0; i < m_Contexts.size(); ++i)
+    delete m_Contexts[i]->GetClient(object);
   delete object;
 }
 
@@ -505,7 +653,7 @@ void Orb_Model::Free(Orb_Persistent *object, bool keepLinks) {
 // Dump
 
 void Orb_Persistent::DebugDump(Port::Stream *stream, int indent) const {
-  Orb_Debug::Printf(stream, indent, "%s <%s>\n", Orb_KindName(m_Kind), m_Name.c_str());
+  Orb_Debug::Printf(stream, indent, "%s <%s>\n", Orb_KindName(GetKind()), m_Name.c_str());
   DumpProperties(stream, indent + 1);
   for (Orb_ModelDerived *context : m_pModel->GetContexts())
     if (Orb_ClientObject *client = context->GetClient(this))

@@ -8,8 +8,10 @@
 
 #include <algorithm>
 #include <cstddef>
+#include <cstdint>
 #include <map>
 #include <memory>
+#include <set>
 #include <string>
 #include <string_view>
 #include <unordered_map>
@@ -44,10 +46,13 @@ public:
 
   char const *GetName() const { return m_Name.c_str(); }
   std::string const &GetNameString() const { return m_Name; }
-  Orb_Kind GetKind() const { return m_Kind; }
+  Orb_Kind GetKind() const { return static_cast<Orb_Kind>(m_Kind); }
   Orb_Model *GetModel() const { return m_pModel; }
   Orb_Persistent *GetParentObject() const { return m_pParent; }
   unsigned GetBridgeId() const { return m_BridgeId; }
+  // Whether a deletion under way holds the object: its delete events have
+  // fired or are about to, and it is freed when that deletion ends.
+  bool IsBeingDeleted() const { return m_Dying; }
 
   // Prints the object's kind, name and properties, then lets the client of
   // every attached context add its lines (DebugDumpCallback).
@@ -62,8 +67,11 @@ private:
   std::string m_Name;
   Orb_Model *m_pModel;
   Orb_Persistent *m_pParent;
-  Orb_Kind m_Kind;
   unsigned m_BridgeId;
+  // The kind and the deletion marks share the word the kind alone took.
+  std::uint8_t m_Kind;
+  bool m_Dying = false;
+  bool m_DeleteFired = false;
 };
 
 // Children of one kind in host order, with O(1) lookup by name.
@@ -98,20 +106,30 @@ public:
 
   PIN_DIRECTION GetDirection() const { return m_Direction; }
   Orb_Block *GetParent() const;
-  // The signal the pin connects to, or null.
+  // The outer connection: a signal of the parent block of the pin's block, or
+  // null. A top block's pin has none.
   Orb_Signal *GetSignal() const { return m_pSignal; }
-  // Connects the pin to `signal` (null disconnects). The signal must belong to
-  // the pin's view; otherwise throws Orb_Exception and changes nothing.
+  // The inner connection: a signal of the pin's own block, or null.
+  Orb_Signal *GetInnerSignal() const { return m_pInnerSignal; }
+  // Set the outer or the inner connection, replacing the previous one; null
+  // disconnects that side. A signal of any other block (for Connect on a top
+  // block's pin, any signal) throws Orb_Exception naming the pin and the
+  // signal, and changes nothing.
   void Connect(Orb_Signal *signal);
+  void ConnectInner(Orb_Signal *signal);
 
 private:
   friend class Orb_Model;
   friend class Orb_ModelIO;
   friend class Orb_Block;
   Orb_Pin(Orb_Model *model, Orb_Block *parent, std::string name, PIN_DIRECTION direction);
-  void Disconnect() noexcept;
+  // Points `side` (m_pSignal or m_pInnerSignal) at `signal`, keeping the
+  // signals' pin lists in step.
+  void Link(Orb_Signal *&side, Orb_Signal *signal);
+  void Unlink(Orb_Signal *&side) noexcept;
   PIN_DIRECTION m_Direction;
   Orb_Signal *m_pSignal = nullptr;
+  Orb_Signal *m_pInnerSignal = nullptr;
 };
 
 LUM_PLATFORM_API char const *Orb_PinDirectionName(Orb_Pin::PIN_DIRECTION direction);
@@ -121,7 +139,9 @@ public:
   Orb_Block *GetParent() const;
   // The network the signal belongs to, or null.
   Orb_Network *GetNetwork() const { return m_pNetwork; }
-  // Pins connected to the signal, in connection order.
+  // Pins connected to the signal from either side, in connection order: pins
+  // of its own block (their inner connection) and pins of its block's child
+  // blocks (their outer one).
   std::vector<Orb_Pin *> const &GetPins() const { return m_Pins; }
 
 private:
@@ -170,15 +190,17 @@ public:
   Orb_Signal *GetSignalByName(char const *name) const { return m_Signals.Find(name); }
 
   // Creation fires the OnCreate event to every subscribed context before it
-  // returns. A duplicate name throws Orb_Exception and creates nothing. If an
-  // event handler throws, the new object is deleted again (with its delete
-  // events) and the exception passes unchanged.
+  // returns. A duplicate name, or a block that is being deleted, throws
+  // Orb_Exception and creates nothing. If an event handler throws, the new
+  // object is deleted again (with its delete events) and the exception
+  // passes unchanged.
   Orb_Block *CreateBlock(char const *name, int flags = 0);
   Orb_Pin *CreatePin(char const *name, Orb_Pin::PIN_DIRECTION direction);
   Orb_Signal *CreateSignal(char const *name);
 
   // Deletion fires the delete events for everything the object owns, children
-  // before parents, then for the object, then frees the host objects.
+  // before parents, then for the object, then frees the host objects (see
+  // Orb_Model::Delete).
   void DeleteBlock(Orb_Block *child);
   void DeletePin(Orb_Pin *pin);
   void DeleteSignal(Orb_Signal *signal);
@@ -253,33 +275,33 @@ private:
 // Visits the object and everything it owns, children before parents: a
 // design manager's designs, a design's views, a view's networks and then its
 // block tree, a block's pins, signals and child blocks; each object after
-// what it owns.
+// what it owns. Containers are read by index with their size read afresh, so
+// a visit that removes objects (under an Orb_Model::FreeHold, which keeps
+// them in memory) may make the walk miss some, but never read freed memory.
 template <class F> void Orb_VisitPostOrder(Orb_Persistent *object, F const &visit) {
+  auto each = [&visit](auto const &items) {
+    for (std::size_t i = 0; i < items.size(); ++i)
+      Orb_VisitPostOrder(items[i], visit);
+  };
   switch (object->GetKind()) {
   case Orb_Kind::DesignMgr:
-    for (Orb_Design *design : static_cast<Orb_DesignMgr *>(object)->GetDesigns())
-      Orb_VisitPostOrder(design, visit);
+    each(static_cast<Orb_DesignMgr *>(object)->GetDesigns());
     break;
   case Orb_Kind::Design:
-    for (Orb_View *view : static_cast<Orb_Design *>(object)->GetViews())
-      Orb_VisitPostOrder(view, visit);
+    each(static_cast<Orb_Design *>(object)->GetViews());
     break;
   case Orb_Kind::View: {
     auto *view = static_cast<Orb_View *>(object);
-    for (Orb_Network *network : view->GetNetworks())
-      Orb_VisitPostOrder(network, visit);
+    each(view->GetNetworks());
     if (view->GetBlock())
       Orb_VisitPostOrder(view->GetBlock(), visit);
     break;
   }
   case Orb_Kind::Block: {
     auto *block = static_cast<Orb_Block *>(object);
-    for (Orb_Pin *pin : block->GetPins())
-      Orb_VisitPostOrder(pin, visit);
-    for (Orb_Signal *signal : block->GetSignals())
-      Orb_VisitPostOrder(signal, visit);
-    for (Orb_Block *child : block->GetBlocks())
-      Orb_VisitPostOrder(child, visit);
+    each(block->GetPins());
+    each(block->GetSignals());
+    each(block->GetBlocks());
     break;
   }
   case Orb_Kind::Pin:
@@ -297,6 +319,12 @@ class LUM_PLATFORM_API Orb_ModelCompanion {
 public:
   virtual ~Orb_ModelCompanion();
   virtual Orb_Model const *GetModelToSave() const = 0;
+  // Called when an Open is refused after this companion took a waiting model
+  // (Orb_Model::TakeLoadedCompanion) during its events: undo what was built
+  // over that model and hand it back, so that it waits again. The default
+  // hands back nothing, and the waiting model is then lost with the
+  // companion.
+  virtual std::unique_ptr<Orb_Model> ReleaseTakenModel();
 };
 
 // A host model. Built standalone by a caller, or by an Orb_ModelDerived that
@@ -331,14 +359,19 @@ public:
   // its designs; per design the design, its views; per view the view, its
   // block tree in pre-order with each block's pins and signals, then its
   // networks) to every subscribed context. All or nothing: an unreadable,
-  // corrupt, truncated or newer file, or a design manager name already in
-  // the model, throws Orb_Exception naming the file and loads nothing; an
+  // corrupt, truncated or newer file, a design manager name or a companion
+  // key already in the model, or an Open from inside an Open's event
+  // handler, throws Orb_Exception naming the file and loads nothing; an
   // event handler that throws makes the model delete what it loaded (with
-  // the delete events) and the exception passes unchanged.
+  // the delete events), puts its companions back as they were, and the
+  // exception passes unchanged.
   void Open(char const *path);
 
   // Companions saved with this model. A companion whose section was read by
-  // Open waits, as a bare host model, until its owner takes it.
+  // Open waits, as a bare host model, until its owner takes it. A live
+  // companion that replaces another destroys it, except during an Open's
+  // events: then the replaced one is kept until the Open succeeds, to be put
+  // back if it is refused.
   void SetCompanion(std::string const &key, std::unique_ptr<Orb_ModelCompanion> companion);
   Orb_ModelCompanion *GetCompanion(std::string const &key) const;
   std::unique_ptr<Orb_Model> TakeLoadedCompanion(std::string const &key);
@@ -352,7 +385,15 @@ public:
   // Counts of live host objects by kind (for tests and reports).
   std::size_t GetObjectCount(Orb_Kind kind) const;
 
-  // Deletes any host object with its subtree (see Orb_Block::DeleteBlock).
+  // Deletes any host object with its subtree: fires the delete events,
+  // children before parents, takes the object out of its parent and frees
+  // it. Event handlers may delete, create and change other objects. An
+  // object of the subtree that a handler deletes meanwhile is already going
+  // and is left to this deletion; anything else a handler deletes leaves its
+  // container at once, but memory is freed only when the outermost deletion
+  // (or open, or client model teardown) ends, so no walk meets a freed
+  // object. A handler that throws does not stop the deletion: the remaining
+  // events fire, the objects are freed, then the first exception passes.
   void Delete(Orb_Persistent *object);
 
 private:
@@ -362,6 +403,32 @@ private:
   friend class Orb_View;
   friend class Orb_Block;
   friend class Orb_ModelIO;
+  friend class Orb_ModelDerived;
+
+  // While a hold is up, deleted objects leave their containers but stay in
+  // memory; the last hold to go frees them. Walks that run event handlers or
+  // client code hold the frees, so the objects they walk stay readable.
+  class FreeHold {
+  public:
+    explicit FreeHold(Orb_Model &model) : m_Model(model) { ++model.m_HoldDepth; }
+    FreeHold(FreeHold const &) = delete;
+    FreeHold &operator=(FreeHold const &) = delete;
+    ~FreeHold() { m_Model.ReleaseHold(); }
+
+  private:
+    Orb_Model &m_Model;
+  };
+  void ReleaseHold() noexcept;
+
+  // What an Open's refusal must put back: the live companions as they were
+  // (those replaced meanwhile are kept here) and the keys of the companions
+  // that were waiting.
+  struct OpenJournal {
+    std::map<std::string, Orb_ModelCompanion *> liveBefore;
+    std::set<std::string> waitingBefore;
+    std::map<std::string, std::unique_ptr<Orb_ModelCompanion>> replaced;
+  };
+  void RestoreCompanions(OpenJournal &journal) noexcept;
 
   unsigned AllocateBridgeId(Orb_Kind kind);
   void ReleaseBridgeId(Orb_Kind kind, unsigned id) noexcept;
@@ -375,10 +442,11 @@ private:
   void FireDelete(Orb_Persistent *object);
   // Removes the object from its parent's containers.
   void Unlink(Orb_Persistent *object);
-  // Frees the object and its subtree without events. Connections and network
-  // memberships never leave a view, so when a whole view goes (keepLinks
-  // false) nothing inside it needs unhooking.
-  void Free(Orb_Persistent *object, bool keepLinks = true);
+  // Frees the object and its subtree without events, with any client that
+  // some context still holds for them. Connections and network memberships
+  // never leave a view, so when a whole view goes (keepLinks false) nothing
+  // inside it needs unhooking.
+  void Free(Orb_Persistent *object, bool keepLinks = true) noexcept;
 
   std::string m_Name;
   std::string m_DbName;
@@ -392,4 +460,10 @@ private:
   std::size_t m_ObjectCount[Orb_KindCount] = {};
   std::map<std::string, std::unique_ptr<Orb_ModelCompanion>> m_Companions;
   std::map<std::string, std::unique_ptr<Orb_Model>> m_LoadedCompanions;
+  unsigned m_HoldDepth = 0;
+  // Deleted objects waiting for the last hold, in the order of their Delete
+  // calls: a later one never lies inside an earlier one.
+  std::vector<Orb_Persistent *> m_PendingFrees;
+  // Set while an Open fires its events.
+  OpenJournal *m_pOpenJournal = nullptr;
 };

@@ -6,7 +6,10 @@
 // managers, designs, views and blocks end with an 'E' record; properties
 // follow the record of the object they belong to. Pins and signals are
 // numbered per view in the order they are written, and a view's connections
-// and networks, written after its block tree, refer to them by number.
+// and networks, written after its block tree, refer to them by number. A
+// connection's side follows from where the pin is: a pin of the signal's own
+// block connects inside, a pin of one of its child blocks outside; any other
+// pin is corrupt.
 // Companion models follow the design managers, each as an embedded model
 // section. A 'Z' record ends every model section, so a cut file shows.
 //
@@ -19,7 +22,7 @@
 //   B <name> ... E               block (a view's top block, or a child block)
 //   I <direction> <name>         pin (0 input, 1 output, 2 bidirectional)
 //   S <name>                     signal
-//   C <signal> <n> <pin>...      pins connected to a signal, in connection order
+//   C <signal> <n> <pin>...      pins connected to a signal (either side), in order
 //   N <name> <n> <signal>...     network and its signals, in order
 //   P <name> <value>             string property
 //   L <name> <n> <value>...      string list property
@@ -542,6 +545,11 @@ void Orb_ModelIO::WriteProperties(Orb_PropertyHolder const *holder) {
 void Orb_Model::Open(char const *path) { Orb_ModelIO::Open(*this, path ? path : ""); }
 
 void Orb_ModelIO::Open(Orb_Model &model, std::string const &path) {
+  if (model.m_pOpenJournal)
+    throw Orb_Exception(kSource, __LINE__, path.c_str(),
+                        ("Cannot open design database " + Quote(path) + " into model " +
+                         Quote(model.m_Name) + " while another open is under way.")
+                            .c_str());
   Section section(model);
   {
     ByteReader in(path);
@@ -551,19 +559,31 @@ void Orb_ModelIO::Open(Orb_Model &model, std::string const &path) {
     if (in.Get() >= 0)
       in.Corrupt("data after the end record");
   }
+  // Two companions of one key cannot both be kept, and dropping either loses
+  // data: refused before anything is loaded.
+  for (auto const &entry : section.companions)
+    if (model.GetCompanion(entry.first) || model.m_LoadedCompanions.count(entry.first))
+      throw Orb_Exception(kSource, __LINE__, path.c_str(),
+                          ("Design database " + Quote(path) + " carries companion " +
+                           Quote(entry.first) + ", which model " + Quote(model.m_Name) +
+                           " already has.")
+                              .c_str());
+
+  Orb_Model::OpenJournal journal;
+  for (auto const &[key, companion] : model.m_Companions)
+    journal.liveBefore.emplace(key, companion.get());
+  for (auto const &entry : model.m_LoadedCompanions)
+    journal.waitingBefore.insert(entry.first);
+  std::vector<std::string> companionKeys;
+  for (auto const &entry : section.companions)
+    companionKeys.push_back(entry.first);
 
   std::vector<Orb_DesignMgr *> const loaded = Commit(section);
-  // A companion already in the model, live or waiting, wins over the copy
-  // in the file.
-  std::vector<std::string> companionKeys;
-  for (auto &[key, companion] : section.companions) {
-    if (model.m_Companions.count(key) || model.m_LoadedCompanions.count(key))
-      continue;
-    model.m_LoadedCompanions.emplace(key, std::move(companion));
-    companionKeys.push_back(key);
-  }
-
+  model.m_pOpenJournal = &journal;
   try {
+    for (auto &[key, companion] : section.companions)
+      model.m_LoadedCompanions.emplace(key, std::move(companion));
+    Orb_Model::FreeHold hold(model);
     for (Orb_DesignMgr *designMgr : loaded)
       model.AnnounceLoadTree(designMgr);
     // Index loop: a handler may subscribe another context.
@@ -571,8 +591,11 @@ void Orb_ModelIO::Open(Orb_Model &model, std::string const &path) {
       model.m_Subscribers[i]->SyncEventSpecializeModelOnLoad(&model);
   } catch (...) {
     Rollback(model, loaded, companionKeys);
+    model.RestoreCompanions(journal);
+    model.m_pOpenJournal = nullptr;
     throw;
   }
+  model.m_pOpenJournal = nullptr;
 }
 
 void Orb_ModelIO::FreeDesignMgrs(Orb_Model &model, std::vector<Orb_DesignMgr *> const &designMgrs) {
@@ -590,7 +613,8 @@ std::vector<Orb_DesignMgr *> Orb_ModelIO::Commit(Section &section) {
 
 void Orb_ModelIO::Rollback(Orb_Model &model, std::vector<Orb_DesignMgr *> const &loaded,
                            std::vector<std::string> const &companionKeys) {
-  // A handler may itself have deleted a loaded design manager.
+  // A handler may itself have deleted a loaded design manager; its hold is
+  // down, so such a one is gone from the list and from memory.
   std::unordered_set<Orb_DesignMgr *> const live(model.m_DesignMgrs.Items().begin(),
                                                  model.m_DesignMgrs.Items().end());
   for (Orb_DesignMgr *designMgr : loaded) {
@@ -795,9 +819,17 @@ void Orb_ModelIO::ReadConnections() {
   Orb_Signal *signal = SignalAt(m_pIn->Num());
   for (std::uint64_t n = m_pIn->Num(); n > 0; --n) {
     Orb_Pin *pin = PinAt(m_pIn->Num());
-    if (pin->GetSignal())
-      m_pIn->Corrupt("pin " + Quote(pin->GetNameString()) + " is connected twice");
-    pin->Connect(signal);
+    Orb_Block *block = pin->GetParent();
+    bool const inner = block == signal->GetParent();
+    if (!inner && block->GetParent() != signal->GetParent())
+      m_pIn->Corrupt(
+          "pin " + Quote(pin->GetNameString()) + " of block " + Quote(block->GetNameString()) +
+          " connects to signal " + Quote(signal->GetNameString()) + " of block " +
+          Quote(signal->GetParent()->GetNameString()) + ", neither its own block nor its parent");
+    if (inner ? pin->GetInnerSignal() : pin->GetSignal())
+      m_pIn->Corrupt("pin " + Quote(pin->GetNameString()) + " is connected twice " +
+                     (inner ? "inside" : "outside"));
+    pin->Link(inner ? pin->m_pInnerSignal : pin->m_pSignal, signal);
   }
   m_pIn->End();
 }

@@ -140,16 +140,4 @@ TEST_F(TdmModelTest, BothConstructorsSubscribe) {
   EXPECT_TRUE(host.GetContexts().empty());
 }
 
-// The graft hooks do nothing, in any number and order.
-TEST_F(TdmModelTest, GraftHooksDoNothing) {
-  TypedDesign design;
-  std::size_t const clients = design.Model().GetClientCount();
-  design.Model().CleanupGraftProps();
-  design.Model().UnregisterGraftEventHandlers();
-  design.Model().RegisterGraftEventHandlers();
-  design.Model().RegisterGraftEventHandlers();
-  design.Model().CleanupGraftProps();
-  EXPECT_EQ(design.Model().GetClientCount(), clients);
-}
-
 } // namespace

@@ -7,6 +7,7 @@
 #include "Orb_Templates.h"
 
 #include <cstddef>
+#include <functional>
 #include <memory>
 #include <stdexcept>
 #include <string>
@@ -45,8 +46,9 @@ struct RecTraits {
 };
 
 // Logs "create|load|delete kind name" (with " +properties" when the object
-// already has some) and "load model name", and makes a RecClient in each
-// specialization event. Subscribes to all events unless told not to.
+// already has some) and "load model name", makes a RecClient in each
+// specialization event and runs the hooks. Subscribes to all events unless
+// told not to.
 class RecModel : public Orb_ModelT<RecTraits> {
 public:
   explicit RecModel(EventLog *eventLog)
@@ -63,6 +65,9 @@ public:
   // The client of an object of this name, or the load event of a model of
   // this name, throws.
   std::string refuse;
+  // Run after an object's load event made its client, and after its delete
+  // event destroyed it.
+  std::function<void(Orb_Persistent *)> onLoad, onDelete;
   void ThrowIfRefused(std::string const &name) const {
     if (name == refuse)
       throw std::runtime_error("refused " + name);
@@ -82,6 +87,8 @@ public:
   void SyncEventDelete##Kind(Orb_##Kind *o) override {                                             \
     log->push_back("delete " + Describe(o));                                                       \
     delete GetClient(o);                                                                           \
+    if (onDelete)                                                                                  \
+      onDelete(o);                                                                                 \
   }
   HOSTTEST_EVENTS(DesignMgr)
   HOSTTEST_EVENTS(Design)
@@ -98,6 +105,8 @@ private:
     log->push_back((create ? "create " : "load ") + Describe(object) +
                    (object->GetProperties().empty() ? "" : " +properties"));
     new Client(this, object, create);
+    if (!create && onLoad)
+      onLoad(object);
   }
 };
 
@@ -174,7 +183,8 @@ inline std::string PathIn(Orb_Persistent const *object) {
 }
 
 // An object and everything below it, one line per object with its
-// properties, direction and connections, children indented.
+// properties, direction and connections (a pin's outer signal after "->",
+// its inner one after "=>"), children indented.
 inline std::string Dump(Orb_Persistent const *object, std::size_t depth = 0) {
   std::string out = std::string(depth, ' ') + Describe(object);
   std::string const properties = PropertiesOf(*object);
@@ -199,7 +209,8 @@ inline std::string Dump(Orb_Persistent const *object, std::size_t depth = 0) {
   }
   if (auto const *pin = dynamic_cast<Orb_Pin const *>(object))
     out += std::string(" ") + Orb_PinDirectionName(pin->GetDirection()) +
-           (pin->GetSignal() ? " -> " + PathIn(pin->GetSignal()) : "");
+           (pin->GetSignal() ? " -> " + PathIn(pin->GetSignal()) : "") +
+           (pin->GetInnerSignal() ? " => " + PathIn(pin->GetInnerSignal()) : "");
   if (auto const *signal = dynamic_cast<Orb_Signal const *>(object))
     for (Orb_Pin const *pin : signal->GetPins())
       out += " <- " + PathIn(pin);

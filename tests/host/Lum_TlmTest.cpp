@@ -11,6 +11,10 @@
 
 #include <cstdlib>
 #include <filesystem>
+#include <fstream>
+#include <iterator>
+#include <memory>
+#include <stdexcept>
 #include <string>
 #include <vector>
 
@@ -128,6 +132,90 @@ TEST_F(TlmTest, LoadsFromFileAndUnloadsAtLastRelease) {
   EXPECT_EQ(LoadedVersion(m_Pic), "7.3") << "the file is read again";
 }
 
+// One name loads per personality from that personality's file, each counted on its own.
+TEST_F(TlmTest, OneNameLoadsPerPersonality) {
+  SaveGates("P1", 1);
+  SaveGates("P2", 2);
+  SaveGates("", 5);
+  Lum_TlmCatalog::AddSearchDirectory(m_Dir.c_str());
+  PM_PIC const p2("P2", "part", nullptr), p3("P3", "part", nullptr);
+  Lum_TlmLibrary const *first = Lum_TlmLibrary::LoadLibrary("gates", m_Pic);
+  Lum_TlmLibrary const *second = Lum_TlmLibrary::LoadLibrary("gates", p2);
+  Lum_TlmLibrary const *plain = Lum_TlmLibrary::LoadLibrary("gates", p3);
+  EXPECT_EQ(Version(first) + " " + Version(second) + " " + Version(plain), "1.3 2.3 5.3");
+  EXPECT_EQ(Lum_TlmLibrary::LoadLibrary("gates", m_Pic), first);
+  EXPECT_EQ(Lum_TlmCatalog::GetReferenceCount("gates", m_Pic), 2u);
+  EXPECT_EQ(Lum_TlmCatalog::GetReferenceCount("gates", p2), 1u);
+  EXPECT_EQ(Lum_TlmCatalog::GetReferenceCount("gates"), 4u);
+
+  Lum_TlmLibrary::ReleaseLibrary(second);
+  EXPECT_FALSE(Lum_TlmCatalog::IsLoaded("gates", p2));
+  EXPECT_TRUE(Lum_TlmCatalog::IsLoaded("gates", m_Pic));
+  EXPECT_EQ(Version(first), "1.3") << "the other personality's library stays";
+  for (Lum_TlmLibrary const *library : {first, first, plain})
+    Lum_TlmLibrary::ReleaseLibrary(library);
+  EXPECT_FALSE(Lum_TlmCatalog::IsLoaded("gates"));
+}
+
+// A library file that cannot be read is an invalid library, named with the file and the fault.
+TEST_F(TlmTest, UnreadableLibraryFileIsInvalidLibrary) {
+  SaveGates("", 1);
+  std::string const path = m_Dir + "/gates.tlm";
+  Lum_TlmCatalog::AddSearchDirectory(m_Dir.c_str());
+  std::string bytes;
+  {
+    std::ifstream in(path, std::ios::binary);
+    bytes.assign(std::istreambuf_iterator<char>(in), std::istreambuf_iterator<char>());
+  }
+  std::string corrupt = bytes;
+  corrupt[corrupt.find("\nG ") + 1] = 'X';
+  struct {
+    std::string content;
+    char const *fault;
+  } const cases[] = {
+      {corrupt, "corrupt at byte"},
+      {bytes.substr(0, bytes.size() / 2), "truncated at byte"},
+      {"not a library", "not a design database"},
+  };
+  for (auto const &c : cases) {
+    std::ofstream(path, std::ios::binary | std::ios::trunc) << c.content;
+    try {
+      Lum_TlmLibrary::LoadLibrary("gates", m_Pic);
+      ADD_FAILURE() << "loaded a broken file (" << c.fault << ")";
+    } catch (Lum_ExceptionInvalidLibrary const &e) {
+      EXPECT_EQ(e.GetObjectName(), "gates");
+      EXPECT_NE(e.GetMessage().find(path), std::string::npos) << e.what();
+      EXPECT_NE(e.GetMessage().find(c.fault), std::string::npos) << e.what();
+    }
+    EXPECT_FALSE(Lum_TlmCatalog::IsLoaded("gates"));
+  }
+}
+
+// A type block of a second library model means nothing to the first model's lookups, though its
+// bridge id is that of the first model's own type block.
+TEST_F(TlmTest, LookupsNeverCrossModels) {
+  Lum_TlmModel first("a", "a", "", false), second("b", "b", "", false);
+  Lum_TlmBlock *own = BuildGates(first)->GetTypeBlock("AND2");
+  Lum_TlmBlock *foreign = second.CreateLibrary("other", 1, 0)->CreateTypeBlock("AND2");
+  Orb_Block *block = foreign->GetOrbBlock();
+  ASSERT_EQ(block->GetBridgeId(), own->GetOrbBlock()->GetBridgeId());
+
+  EXPECT_EQ(first.GetClient(block), nullptr);
+  EXPECT_EQ(Orb_BlockDerived::OrbResolve(&first, block), nullptr);
+  EXPECT_EQ(Orb_BlockDerived::OrbResolve(&second, block), foreign);
+  std::size_t const clients = first.GetClientCount();
+  try {
+    first.Specialize(block);
+    ADD_FAILURE() << "specialized another model's block";
+  } catch (Orb_Exception const &e) {
+    EXPECT_NE(e.GetMessage().find("<a>"), std::string::npos) << e.what();
+    EXPECT_NE(e.GetMessage().find("<b>"), std::string::npos) << e.what();
+  }
+  EXPECT_THROW(std::make_unique<Lum_TlmBlock>(&first, block), Orb_Exception);
+  EXPECT_EQ(first.GetClientCount(), clients);
+  EXPECT_EQ(first.GetClient(own->GetOrbBlock()), own);
+}
+
 // Added dirs precede LUM_TLM_PATH, personality subdirs their parent; misses say where.
 TEST_F(TlmTest, SearchPathOrderAndMissingLibraries) {
   std::string const plain = SaveGates("plain", 1);
@@ -175,6 +263,70 @@ TEST_F(TlmTest, LocalLibraryTravelsWithTheDatabase) {
   ASSERT_NE(local->GetTypeBlock("CELL"), nullptr);
   EXPECT_EQ(Dump(local->GetTypeBlock("CELL")->GetOrbBlock()), "block CELL\n pin Q bidirectional\n");
   EXPECT_EQ(Lum_TlmLibrary::GetLocalLibrary(&reopened, m_Pic), local);
+}
+
+// Takes the design database's local library when a design loads, as block loading does.
+class TakingModel : public HostTest::RecModel {
+public:
+  TakingModel(HostTest::EventLog *eventLog, Orb_Model *model) : RecModel(eventLog, model) {}
+  void SyncEventSpecializeDesignOnLoad(Orb_Design *o) override {
+    Lum_TlmLibrary::GetLocalLibrary(GetOrbModel(), PM_PIC("P1", "part", nullptr));
+    RecModel::SyncEventSpecializeDesignOnLoad(o);
+  }
+};
+
+// A refused open leaves the companions as they were, whichever local library the handler took;
+// a file with a local library does not open into a model that has one.
+TEST_F(TlmTest, RefusedOpenLeavesLocalLibraryAsBefore) {
+  auto readBytes = [](std::string const &path) {
+    std::ifstream in(path, std::ios::binary);
+    return std::string(std::istreambuf_iterator<char>(in), std::istreambuf_iterator<char>());
+  };
+  std::string const withLocal = m_Dir + "/with_local.odb";
+  std::string const plain = m_Dir + "/plain.odb";
+  {
+    Orb_Model source("d", "d", "", false);
+    source.CreateDesignMgr("loaded")->CreateDesign("refused");
+    source.Save(plain.c_str());
+    Lum_TlmLibrary::GetLocalLibrary(&source, m_Pic)->CreateTypeBlock("CELL");
+    source.Save(withLocal.c_str());
+  }
+  HostTest::EventLog log;
+  for (std::string const &file : {withLocal, plain}) {
+    SCOPED_TRACE(file);
+    Orb_Model target("t", "t", "", false);
+    target.CreateDesignMgr("mine");
+    TakingModel client(&log, &target);
+    client.refuse = "refused";
+    target.Save((m_Dir + "/before.odb").c_str());
+    EXPECT_THROW(target.Open(file.c_str()), std::runtime_error);
+    EXPECT_EQ(target.GetCompanion(Lum_TlmNames::kLocalLibraryCompanion), nullptr);
+    target.Save((m_Dir + "/after.odb").c_str());
+    EXPECT_EQ(readBytes(m_Dir + "/after.odb"), readBytes(m_Dir + "/before.odb"));
+  }
+
+  // A local library that was waiting before the refused open waits again.
+  Orb_Model target("t", "t", "", false);
+  target.Open(withLocal.c_str());
+  target.DeleteDesignMgr(target.GetDesignMgrByName("loaded"));
+  target.Save((m_Dir + "/before.odb").c_str());
+  {
+    TakingModel client(&log, &target);
+    client.refuse = "refused";
+    EXPECT_THROW(target.Open(plain.c_str()), std::runtime_error);
+  }
+  target.Save((m_Dir + "/after.odb").c_str());
+  EXPECT_EQ(readBytes(m_Dir + "/after.odb"), readBytes(m_Dir + "/before.odb"));
+  EXPECT_NE(Lum_TlmLibrary::GetLocalLibrary(&target, m_Pic)->GetTypeBlock("CELL"), nullptr);
+
+  // Now live: a second file with its own local library is refused, naming the file.
+  try {
+    target.Open(withLocal.c_str());
+    ADD_FAILURE() << "opened a second local library";
+  } catch (Orb_Exception const &e) {
+    EXPECT_NE(e.GetMessage().find(withLocal), std::string::npos) << e.what();
+  }
+  EXPECT_TRUE(target.GetDesignMgrs().empty());
 }
 
 // Type IDs represent exactly their block or pin (default: null); the registry counts by name.

@@ -55,7 +55,10 @@ protected:
   static Orb_Pin *Connected(Orb_Block *block, char const *name, Orb_Pin::PIN_DIRECTION direction,
                             Orb_Signal *signal) {
     Orb_Pin *pin = block->CreatePin(name, direction);
-    pin->Connect(signal);
+    if (signal->GetParent() == block)
+      pin->ConnectInner(signal);
+    else
+      pin->Connect(signal);
     return pin;
   }
   Orb_Block *AddInstance(char const *name) {
@@ -74,10 +77,11 @@ protected:
   Orb_Network *gnd = nullptr, *vcc = nullptr;
 };
 
-// H onto inst: H's pins map to inst's of the same name, so sa loses C, which inst lacks.
+// H onto inst: H's pins map to inst's of the same name, whose inner sides take the copies; sa
+// loses C, which inst lacks.
 char const *const kGrafted = "block inst\n"
-                             " pin A input -> top/inst/sa\n"
-                             " pin B output -> top/inst/sb\n"
+                             " pin A input => top/inst/sa\n"
+                             " pin B output => top/inst/sb\n"
                              " signal sa <W=1> <- top/inst/A <- top/inst/u1/i\n"
                              " signal sb <- top/inst/B <- top/inst/u2/o\n"
                              " signal mid <- top/inst/u1/o <- top/inst/u2/i\n"
@@ -106,36 +110,76 @@ TEST_F(GraftTest, CopiesStructureAndConnectionsAndSurvivesReopen) {
   EXPECT_EQ(Dump(reopened), Dump(*design.GetOrbModel()));
 }
 
+// The graft sets only inner sides: outer wiring made before or after it stays, also on reopen.
+TEST_F(GraftTest, GraftAndOuterWiringKeepBothSidesInEitherOrder) {
+  Orb_Signal *a = top->CreateSignal("a");
+  Orb_Signal *b = top->CreateSignal("b");
+  Orb_Block *wiredFirst = AddInstance("wiredFirst");
+  wiredFirst->GetPinByName("A")->Connect(a);
+  wiredFirst->GetPinByName("B")->Connect(b);
+  Ora_GraftMgr(false, false).Graft(h, wiredFirst);
+  Ora_GraftMgr(false, false).Graft(h, inst);
+  inst->GetPinByName("A")->Connect(a);
+  inst->GetPinByName("B")->Connect(b);
+
+  auto pinsOf = [](Orb_Block const *block) {
+    return Dump(block->GetPinByName("A")) + Dump(block->GetPinByName("B"));
+  };
+  EXPECT_EQ(pinsOf(wiredFirst), "pin A input -> top/a => top/wiredFirst/sa\n"
+                                "pin B output -> top/b => top/wiredFirst/sb\n");
+  EXPECT_EQ(pinsOf(inst), "pin A input -> top/a => top/inst/sa\n"
+                          "pin B output -> top/b => top/inst/sb\n");
+  EXPECT_EQ(Dump(a), "signal a <- top/wiredFirst/A <- top/inst/A\n");
+
+  std::string const path = ::testing::TempDir() + "Ora_GraftMgrTest_sides.db";
+  design.Save(path.c_str());
+  Orb_Model reopened("reopened", "db", "", false);
+  reopened.Open(path.c_str());
+  std::remove(path.c_str());
+  EXPECT_EQ(Dump(reopened), Dump(*design.GetOrbModel()));
+  Orb_Block const *top2 = reopened.GetDesignMgrs()[0]->GetDesigns()[0]->GetViews()[0]->GetBlock();
+  EXPECT_EQ(pinsOf(top2->GetBlockByName("wiredFirst")) + pinsOf(top2->GetBlockByName("inst")),
+            pinsOf(wiredFirst) + pinsOf(inst));
+}
+
 // Each copy is created (OnCreate, pre-order) before it gets the source's properties.
 TEST_F(GraftTest, CopiesAreCreatedBeforeTheyGetProperties) {
   Ora_GraftMgr(false, false).Graft(h, inst);
-  EXPECT_EQ(Joined(log), "create signal sa; create signal sb; create signal mid; "
-                         "create block u1; create pin i; create pin o; create signal inner; "
-                         "create network GND; create block leaf; create pin x; "
-                         "create block u2; create pin i; create pin o");
+  EXPECT_EQ(Joined(log), "create signal sa; create signal sb; create network top/inst/VCC; "
+                         "create signal mid; create block u1; create pin i; create pin o; "
+                         "create signal inner; create network top/inst/GND; create block leaf; "
+                         "create pin x; create block u2; create pin i; create pin o");
 }
 
-// Signals join same-named networks (made if absent); back references name sources when on.
-TEST_F(GraftTest, NetworksAndBackReferences) {
+// Two grafts of one hierarchy make two sets of networks, named uniquely, each with its source.
+TEST_F(GraftTest, EachGraftMakesItsOwnNetworks) {
+  Orb_Block *second = AddInstance("inst2");
+  view->CreateNetwork("top/inst2/GND");
   Ora_GraftMgr networksOnly(false, false);
   networksOnly.SetNetworkBackReferences(true);
   networksOnly.Graft(h, inst);
   Ora_GraftMgr blocksOnly(true, false);
-  Orb_Block *second = AddInstance("inst2");
   blocksOnly.Graft(h, second);
 
-  EXPECT_EQ(Names(view->GetNetworks()), "VCC GND");
-  Orb_Network const *copiedGnd = view->GetNetworkByName("GND");
-  EXPECT_EQ(Dump(copiedGnd), "network GND <ROLE=ground> top/inst/u1/inner top/inst2/u1/inner\n");
-  EXPECT_EQ(Dump(vcc), "network VCC <ROLE=supply> top/inst/sb top/inst2/sb\n");
-  EXPECT_EQ(networksOnly.GetNetworkSource(copiedGnd), gnd);
+  EXPECT_EQ(Names(view->GetNetworks()), "VCC top/inst2/GND top/inst/VCC top/inst/GND "
+                                        "top/inst2/VCC top/inst2/GND_1");
+  EXPECT_EQ(Dump(vcc), "network VCC <ROLE=supply>\n") << "a network of the view is never joined";
+  Orb_Network const *firstGnd = view->GetNetworkByName("top/inst/GND");
+  EXPECT_EQ(Dump(firstGnd), "network top/inst/GND <ROLE=ground> top/inst/u1/inner\n");
+  EXPECT_EQ(Dump(view->GetNetworkByName("top/inst2/GND_1")),
+            "network top/inst2/GND_1 <ROLE=ground> top/inst2/u1/inner\n");
+  EXPECT_EQ(Dump(view->GetNetworkByName("top/inst2/VCC")), "network top/inst2/VCC top/inst2/sb\n");
+
+  EXPECT_EQ(networksOnly.GetNetworkSource(firstGnd), gnd);
+  EXPECT_EQ(networksOnly.GetNetworkSource(view->GetNetworkByName("top/inst/VCC")),
+            h->GetSignalByName("sb")->GetNetwork());
   EXPECT_EQ(networksOnly.GetNetworkSource(vcc), nullptr);
   EXPECT_EQ(networksOnly.GetBlockSource(inst->GetBlockByName("u1")), nullptr);
   Orb_Block const *u1Copy = second->GetBlockByName("u1");
   EXPECT_EQ(blocksOnly.GetBlockSource(u1Copy), u1);
   EXPECT_EQ(blocksOnly.GetBlockSource(u1Copy->GetBlockByName("leaf")), leaf);
   EXPECT_EQ(blocksOnly.GetBlockSource(second), nullptr);
-  EXPECT_EQ(blocksOnly.GetNetworkSource(copiedGnd), nullptr);
+  EXPECT_EQ(blocksOnly.GetNetworkSource(view->GetNetworkByName("top/inst2/GND_1")), nullptr);
 }
 
 // Grafts into the own subtree are refused; a name clash throws and keeps earlier copies.
@@ -149,7 +193,9 @@ TEST_F(GraftTest, RefusesOwnSubtreeAndNameClashes) {
 
   Orb_Block *u2 = h->GetBlockByName("u2");
   EXPECT_TRUE(Ora_GraftMgr(false, false).Graft(u1, u2));
-  EXPECT_EQ(Names(gnd->GetSignals()), "inner inner");
+  EXPECT_EQ(Names(gnd->GetSignals()), "inner");
+  EXPECT_EQ(Dump(h->GetView()->GetNetworkByName("H/u2/GND")),
+            "network H/u2/GND <ROLE=ground> H/u2/inner\n");
 
   inst->CreateBlock("u1");
   try {

@@ -23,7 +23,7 @@ namespace {
 
 using namespace HostTest;
 
-// Nested blocks, pins out of name order, cross-block connections, networks, awkward properties.
+// Nested blocks, pins out of name order, connections on both sides, networks, awkward properties.
 void BuildSample(Orb_Model &model) {
   Orb_DesignMgr *designMgr = model.CreateDesignMgr("lib one");
   designMgr->CreatePropertyString("note", "a b:c\nd \xc3\xa9\xff 12:x");
@@ -38,8 +38,11 @@ void BuildSample(Orb_Model &model) {
   Orb_Signal *clk = top->CreateSignal("clk");
   Orb_Signal *carry = alu->CreateSignal("carry");
   alu->CreatePin("in", Orb_Pin::PIN_INPUT)->Connect(clk);
-  alu->CreatePin("out", Orb_Pin::PIN_OUTPUT)->Connect(carry);
-  z->Connect(carry);
+  Orb_Pin *out = alu->CreatePin("out", Orb_Pin::PIN_OUTPUT);
+  out->ConnectInner(carry);
+  out->Connect(top->CreateSignal("sum"));
+  alu->GetBlockByName("adder")->CreatePin("ci", Orb_Pin::PIN_INPUT)->Connect(carry);
+  z->ConnectInner(clk);
   Orb_Property *strings = alu->CreatePropertyStringList("lines");
   for (char const *value : {"", "x y", "\n", ":"})
     strings->AppendString(value);
@@ -140,7 +143,7 @@ TEST_F(Orb_ModelIOTest, OpensHandWrittenDatabaseWithLoadEvents) {
   RecModel client(&log, &model);
   model.Open(m_Path.c_str());
   EXPECT_EQ(Dump(model), "design manager dm\n design g\n  view v\n   block top\n"
-                         "    pin p input -> top/s\n    signal s <- top/p\n    block c\n"
+                         "    pin p input => top/s\n    signal s <- top/p\n    block c\n"
                          "     pin q output\n   network n top/s\n");
   EXPECT_EQ(Joined(log), "load design manager dm; load design g; load view v; load block top; "
                          "load pin p; load signal s; load block c; load pin q; "
@@ -169,6 +172,9 @@ TEST_F(Orb_ModelIOTest, RefusesBrokenFiles) {
       {"B 3:top", "B 3top", "expected ':'"},
       {"B 3:top\nI", "B 9:top\nI", "expected end of record"},
       {"C 0 1 0", "C 0 1 7", "pin 7 of a view with 2 pins"},
+      {"C 0 1 0", "C 0 2 0 0", "pin 'p' is connected twice inside"},
+      {"I 1 1:q\nE\nE\nC 0 1 0", "I 1 1:q\nS 1:t\nE\nE\nC 1 1 0",
+       "connects to signal 't' of block 'c', neither its own block nor its parent"},
       {"S 1:s\n", "I 2 1:p\n", "second pin named 'p'"},
       {"S 1:s\n", "S 1:s\nP 1:k 0:\nP 1:k 0:\n", "second property named 'k'"},
       {"1:p", std::string_view("1:\0", 3), "NUL byte"},
@@ -214,7 +220,7 @@ TEST_F(Orb_ModelIOTest, FailedSaveKeepsPreviousFile) {
   EXPECT_EQ(entries, 0u) << "temporary file left behind";
 }
 
-// Companions come back without events, survive an unclaimed save, and yield to live ones.
+// Companions come back without events, survive an unclaimed save, and go with a refused open.
 TEST_F(Orb_ModelIOTest, CompanionsRoundTrip) {
   Orb_Model original("orig", "db", "", false);
   original.CreateDesignMgr("main");
@@ -237,18 +243,81 @@ TEST_F(Orb_ModelIOTest, CompanionsRoundTrip) {
   EXPECT_EQ(Dump(*loaded), Dump(m_Sample));
   EXPECT_EQ(reopened.TakeLoadedCompanion("local"), nullptr);
 
-  Orb_Model live("target", "db", "", false);
-  auto *companion = new TestCompanion(std::make_unique<Orb_Model>("mine", "db", "", false));
-  live.SetCompanion("local", std::unique_ptr<Orb_ModelCompanion>(companion));
-  live.Open(m_Path.c_str());
-  EXPECT_EQ(live.TakeLoadedCompanion("local"), nullptr);
-  EXPECT_EQ(live.GetCompanion("local"), companion);
-
   Orb_Model failed("target", "db", "", false);
   RecModel refusing(&log, &failed);
   refusing.refuse = "main";
   EXPECT_THROW(failed.Open(m_Path.c_str()), std::runtime_error);
   EXPECT_EQ(failed.TakeLoadedCompanion("local"), nullptr);
+}
+
+// A file's companion that the model has already, live or waiting, refuses the whole open.
+TEST_F(Orb_ModelIOTest, CompanionTheModelHasRefusesTheOpen) {
+  Orb_Model original("orig", "db", "", false);
+  original.CreateDesignMgr("main");
+  original.SetCompanion("local", std::make_unique<TestCompanion>(
+                                     std::make_unique<Orb_Model>("lib", "libdb", "", false)));
+  original.Save(m_Path.c_str());
+  Orb_Model onlyCompanion("other", "db", "", false);
+  onlyCompanion.SetCompanion("local", std::make_unique<TestCompanion>(
+                                          std::make_unique<Orb_Model>("lib", "libdb", "", false)));
+  onlyCompanion.Save(PathOf("b.db").c_str());
+
+  auto expectRefused = [](Orb_Model &model, std::string const &path) {
+    try {
+      model.Open(path.c_str());
+      ADD_FAILURE() << "opened " << path;
+    } catch (Orb_Exception const &e) {
+      EXPECT_NE(e.GetMessage().find(path), std::string::npos) << e.what();
+      EXPECT_NE(e.GetMessage().find("'local'"), std::string::npos) << e.what();
+    }
+  };
+  Orb_Model live("target", "db", "", false);
+  auto *companion = new TestCompanion(std::make_unique<Orb_Model>("mine", "db", "", false));
+  live.SetCompanion("local", std::unique_ptr<Orb_ModelCompanion>(companion));
+  expectRefused(live, m_Path);
+  EXPECT_EQ(ObjectCount(live), 0u);
+  EXPECT_EQ(live.GetCompanion("local"), companion);
+  EXPECT_EQ(live.TakeLoadedCompanion("local"), nullptr);
+
+  Orb_Model waiting("target", "db", "", false);
+  waiting.Open(m_Path.c_str());
+  expectRefused(waiting, PathOf("b.db"));
+  std::unique_ptr<Orb_Model> kept = waiting.TakeLoadedCompanion("local");
+  ASSERT_NE(kept, nullptr);
+  EXPECT_STREQ(kept->GetName(), "lib");
+}
+
+// A refused open puts back a live companion that a handler replaced, and drops the new one.
+TEST_F(Orb_ModelIOTest, RefusedOpenRestoresReplacedCompanion) {
+  Orb_Model target("target", "db", "", false);
+  auto *mine = new TestCompanion(nullptr);
+  target.SetCompanion("mine", std::unique_ptr<Orb_ModelCompanion>(mine));
+  RecModel client(&log, &target);
+  bool replacementFreed = false;
+  client.onLoad = [&](Orb_Persistent *object) {
+    if (object->GetNameString() == "cpu")
+      target.SetCompanion("mine", std::make_unique<TestCompanion>(nullptr, &replacementFreed));
+  };
+  client.refuse = "io";
+  EXPECT_THROW(target.Open(m_Path.c_str()), std::runtime_error);
+  EXPECT_EQ(target.GetCompanion("mine"), mine);
+  EXPECT_TRUE(replacementFreed);
+  EXPECT_EQ(ObjectCount(target), 0u);
+}
+
+// A load handler may delete objects still to be loaded, its own block's parent included.
+TEST_F(Orb_ModelIOTest, LoadHandlerMayDeleteWhatIsStillToLoad) {
+  Orb_Model model("target", "db", "", false);
+  RecModel client(&log, &model);
+  client.onLoad = [](Orb_Persistent *object) {
+    if (object->GetNameString() == "adder")
+      static_cast<Orb_Block *>(object)->GetView()->DeleteTopBlock();
+  };
+  model.Open(m_Path.c_str());
+  Orb_View const *view = model.GetDesignMgrs()[0]->GetDesigns()[0]->GetViewByName("schematic");
+  EXPECT_EQ(view->GetBlock(), nullptr);
+  EXPECT_EQ(Dump(view), "view schematic\n network clocks <kind=clock net>\n network none\n");
+  EXPECT_EQ(client.GetClientCount(), ObjectCount(model));
 }
 
 } // namespace

@@ -16,12 +16,12 @@ namespace {
 using namespace HostTest;
 
 // dm / d / v with top block "top" (pin p, signal s, child block c with pin
-// cp) and network n holding s; p and cp connect to s.
+// cp) and network n holding s; p connects to s inside, cp outside.
 class HostModelTest : public ::testing::Test {
 protected:
   void SetUp() override {
     n->AddSignal(s);
-    p->Connect(s);
+    p->ConnectInner(s);
     cp->Connect(s);
   }
 
@@ -140,7 +140,7 @@ TEST_F(HostModelTest, DeleteFiresEventsChildrenFirstAndUndoesLinks) {
   c->DeletePin(cp);
   EXPECT_EQ(Names(s->GetPins()), "p");
   top->DeleteSignal(s);
-  EXPECT_EQ(p->GetSignal(), nullptr);
+  EXPECT_EQ(p->GetInnerSignal(), nullptr);
   EXPECT_TRUE(n->GetSignals().empty());
 
   log.clear();
@@ -150,6 +150,109 @@ TEST_F(HostModelTest, DeleteFiresEventsChildrenFirstAndUndoesLinks) {
                          "delete view v; ~view v; delete design d; ~design d");
   EXPECT_EQ(model->GetClientCount(), 1u);
   EXPECT_EQ(ObjectCount(*host), 1u);
+}
+
+// A pin takes its parent block's signals outside and its own block's inside, listed by each signal;
+// a signal of any other block is refused naming pin and signal, changing nothing.
+TEST_F(HostModelTest, PinSidesTakeOnlyTheirOwnBlocksSignals) {
+  Orb_Signal *cs = c->CreateSignal("cs");
+  cp->ConnectInner(cs);
+  Orb_Signal *elsewhere = d->CreateView("v2")->CreateTopBlock("t2")->CreateSignal("x");
+  EXPECT_EQ(Dump(cp), "pin cp output -> top/s => top/c/cs\n");
+  EXPECT_EQ(Names(s->GetPins()) + " | " + Names(cs->GetPins()), "p cp | cp");
+
+  std::string const before = Dump(top);
+  struct {
+    Orb_Pin *pin;
+    Orb_Signal *signal;
+    bool inner;
+  } const refused[] = {
+      {p, s, false},          // a top block's pin has no outer side
+      {p, cs, true},          // a child's signal, inside
+      {cp, cs, false},        // the own block's signal, outside
+      {cp, s, true},          // the parent's signal, inside
+      {cp, elsewhere, false}, // another view
+  };
+  for (auto const &r : refused) {
+    try {
+      r.inner ? r.pin->ConnectInner(r.signal) : r.pin->Connect(r.signal);
+      ADD_FAILURE() << r.pin->GetName() << " took " << r.signal->GetName();
+    } catch (Orb_Exception const &e) {
+      EXPECT_EQ(e.GetObjectName(), r.pin->GetName()) << e.what();
+      EXPECT_NE(e.GetMessage().find(r.signal->GetName()), std::string::npos) << e.what();
+    }
+  }
+  EXPECT_EQ(Dump(top), before);
+
+  // Null and deletion undo one side only.
+  c->DeleteSignal(cs);
+  EXPECT_EQ(Dump(cp), "pin cp output -> top/s\n");
+  cp->Connect(nullptr);
+  p->ConnectInner(nullptr);
+  EXPECT_TRUE(s->GetPins().empty());
+}
+
+// A delete handler may delete a sibling or an ancestor, or fail: each object gets one delete
+// event, its client goes, and the host frees everything once.
+TEST_F(HostModelTest, DeleteHandlerMayDeleteSiblingsAndAncestors) {
+  auto addSiblings = [this] {
+    for (char const *name : {"a", "b"})
+      top->CreateBlock(name)->CreatePin("x", Orb_Pin::PIN_INPUT);
+  };
+  auto deleteOnEvent = [this](char const *trigger, std::function<void()> action) {
+    model->onDelete = [trigger, action](Orb_Persistent *object) {
+      if (object->GetNameString() == trigger)
+        action();
+    };
+  };
+  auto block = [this](char const *name) { return top->GetBlockByName(name); };
+
+  // Deleting a alone: its handler deletes b, which goes at once.
+  addSiblings();
+  deleteOnEvent("a", [&] { top->DeleteBlock(block("b")); });
+  log.clear();
+  top->DeleteBlock(block("a"));
+  EXPECT_EQ(Joined(log), "delete pin x; ~pin x; delete block a; ~block a; "
+                         "delete pin x; ~pin x; delete block b; ~block b");
+  EXPECT_EQ(Names(top->GetBlocks()), "c");
+
+  // Deleting their parent: b is already going, and gets its events in turn.
+  addSiblings();
+  log.clear();
+  v->DeleteTopBlock();
+  EXPECT_EQ(Joined(log),
+            "delete pin p; ~pin p; delete signal s; ~signal s; delete pin cp; ~pin cp; "
+            "delete block c; ~block c; delete pin x; ~pin x; delete block a; ~block a; "
+            "delete pin x; ~pin x; delete block b; ~block b; "
+            "delete block top; ~block top");
+  EXPECT_EQ(v->GetBlock(), nullptr);
+
+  // Deleting a, whose pin's handler deletes the whole tree above it.
+  top = v->CreateTopBlock("top");
+  addSiblings();
+  Orb_Pin *ax = block("a")->GetPinByName("x");
+  model->onDelete = [this, ax](Orb_Persistent *object) {
+    if (object == ax)
+      v->DeleteTopBlock();
+  };
+  log.clear();
+  top->DeleteBlock(block("a"));
+  EXPECT_EQ(Joined(log), "delete pin x; ~pin x; delete block a; ~block a; "
+                         "delete pin x; ~pin x; delete block b; ~block b; "
+                         "delete block top; ~block top");
+  EXPECT_EQ(v->GetBlock(), nullptr);
+
+  // A handler that fails (here: creating in a block being deleted) stops nothing.
+  top = v->CreateTopBlock("top");
+  addSiblings();
+  deleteOnEvent("x", [&] { block("a")->CreatePin("late", Orb_Pin::PIN_INPUT); });
+  EXPECT_THROW(top->DeleteBlock(block("a")), Orb_Exception);
+  EXPECT_EQ(Names(top->GetBlocks()), "b");
+
+  model->onDelete = nullptr;
+  EXPECT_EQ(host->GetObjectCount(Orb_Kind::Block), 2u);
+  EXPECT_EQ(host->GetObjectCount(Orb_Kind::Pin), 1u);
+  EXPECT_EQ(model->GetClientCount(), ObjectCount(*host));
 }
 
 // A duplicate sibling name is refused per kind, naming the object, and creates nothing.
