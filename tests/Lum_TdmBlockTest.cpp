@@ -76,15 +76,18 @@ protected:
     m_pAbc->CreatePin("C", Orb_Pin::PIN_OUTPUT);
   }
 
-  // Saves a design "top" whose view lists LIBT and whose top block holds the
-  // child u1 as stored; returns the file. The database may carry a local
-  // library that the view does not use.
+  // Saves a design "top" whose view lists LIBT (and, when asked, the local
+  // library, saved with the database) and whose top block holds the child u1
+  // as stored; returns the file.
   std::string WriteDesign(StoredBlock const &stored, bool dontCreatePins = false,
                           bool withLocalLibrary = false) {
     TypedDesign design;
-    design.m_pView->CreatePropertyStringList("TDS_VIEW_TYPE_LIBS")->AppendString("LIBT 2.1");
-    if (withLocalLibrary)
+    Orb_Property *libs = design.m_pView->CreatePropertyStringList("TDS_VIEW_TYPE_LIBS");
+    libs->AppendString("LIBT 2.1");
+    if (withLocalLibrary) {
+      libs->AppendString(Lum_TlmLibrary::LOCAL_LIBRARY_NAME);
       Lum_TlmLibrary::GetLocalLibrary(design.Host(), PM_PIC("pm1", "part1", nullptr));
+    }
     if (dontCreatePins)
       design.m_pView->CreatePropertyString("LUM_DONT_CREATE_UNUSED_PINS", "");
     Lum_TdmBlock *top = design.m_pView->CreateTopBlock("top");
