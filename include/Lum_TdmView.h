@@ -7,8 +7,11 @@
 
 #include <cstdint>
 #include <memory>
+#include <string>
+#include <unordered_map>
 #include <vector>
 
+class Lum_TlmBlock;
 class Lum_TlmLibrary;
 class PM_PIC;
 
@@ -16,7 +19,10 @@ class PM_PIC;
 // (TDS_TDM_VERSION), refuses to load views of too old or too new a format,
 // and keeps the list of type libraries that the view's blocks draw from
 // (TDS_VIEW_TYPE_LIBS), which it builds on first use, writes back at every
-// commit and gives back when it is destroyed.
+// commit and gives back when it is destroyed. A list whose building failed
+// keeps the libraries loaded before the failure and is not built again; its
+// view then never rewrites TDS_VIEW_TYPE_LIBS, so a save cannot drop the
+// libraries after the failing one.
 class LUM_TDM_API Lum_TdmView : public Orb_ViewT<Lum_TdmTraits> {
 public:
   // On creation (isNew true) stamps the view 3.1 and removes
@@ -26,7 +32,9 @@ public:
   // Lum_ExceptionCorruptDatabase with the name of the design manager that
   // holds the view. A view without a stamp is accepted as version 0.0.
   Lum_TdmView(Lum_TdmModel *model, Orb_View *view, bool isNew);
-  // Gives back every non-local library of the list, once per entry.
+  // Gives back every non-local library of the list, once per entry. Which
+  // entries are local was noted when they entered the list: the libraries
+  // themselves are not read, as they may already be gone.
   ~Lum_TdmView() override;
 
   // The current format: version 3, revision 1.
@@ -72,7 +80,18 @@ protected:
   virtual void DbgImpl() const;
 
 private:
+  friend class Lum_TdmBlock;
+
+  // The type block that a block's stored TDS_BLOCK_TYPE value resolved to
+  // earlier in this view, or null. Blocks of one type resolve through the
+  // libraries once; the type blocks live as long as the libraries of the
+  // list, which the view holds until it is destroyed.
+  Lum_TlmBlock const *FindTypeBlock(std::string const &storedType) const;
+  void NoteTypeBlock(std::string const &storedType, Lum_TlmBlock const *typeBlock) const;
+
   std::vector<Lum_TlmLibrary const *> &GetLibraryList() const;
+  void BuildLibraryList() const;
+  void AppendLibrary(Lum_TlmLibrary const *library) const;
   void GetDevicePic(PM_PIC &personality) const;
   static bool IsLocalLibrary(Lum_TlmLibrary const *library);
   void CheckTdmVersion();
@@ -83,4 +102,9 @@ private:
   std::uint32_t m_Revision;
   // Owned; null until the list is first needed (const operations build it).
   mutable std::unique_ptr<std::vector<Lum_TlmLibrary const *>> m_pLibrary;
+  // Per entry of the list, whether it is the local library (never released).
+  mutable std::vector<bool> m_LocalEntries;
+  // Set when building the list failed: TDS_VIEW_TYPE_LIBS is left as stored.
+  mutable bool m_LibraryListFailed;
+  mutable std::unordered_map<std::string, Lum_TlmBlock const *> m_TypeBlocks;
 };

@@ -48,7 +48,8 @@ std::vector<std::string> LibraryEntries(Orb_Property const *property) {
 } // namespace
 
 Lum_TdmView::Lum_TdmView(Lum_TdmModel *model, Orb_View *view, bool isNew)
-    : Orb_ViewT<Lum_TdmTraits>(model, view), m_Version(kUnsetVersion), m_Revision(kUnsetVersion) {
+    : Orb_ViewT<Lum_TdmTraits>(model, view), m_Version(kUnsetVersion), m_Revision(kUnsetVersion),
+      m_LibraryListFailed(false) {
   if (isNew) {
     m_Version = kTdmVersion;
     m_Revision = kTdmRevision;
@@ -61,10 +62,12 @@ Lum_TdmView::Lum_TdmView(Lum_TdmModel *model, Orb_View *view, bool isNew)
 Lum_TdmView::~Lum_TdmView() {
   if (!m_pLibrary)
     return;
-  // One release per entry: a library listed twice was loaded twice.
-  for (Lum_TlmLibrary const *library : *m_pLibrary)
-    if (!IsLocalLibrary(library))
-      Lum_TlmLibrary::ReleaseLibrary(library);
+  // One release per entry: a library listed twice was loaded twice. The
+  // libraries are not read here; an in-memory one may already be destroyed.
+  std::vector<Lum_TlmLibrary const *> const &list = *m_pLibrary;
+  for (std::size_t i = 0; i < list.size(); ++i)
+    if (!m_LocalEntries[i])
+      Lum_TlmLibrary::ReleaseLibrary(list[i]);
   m_pLibrary.reset();
 }
 
@@ -130,7 +133,9 @@ void Lum_TdmView::WriteTdmProperties() {
   else
     CreatePropertyString(kVersionProperty, stamp.c_str());
 
-  if (!m_pLibrary)
+  // A list that failed to build lacks the libraries after the failing entry:
+  // writing it would drop them from the database.
+  if (!m_pLibrary || m_LibraryListFailed)
     return;
   Orb_Property *libraries = GetPropertyByName(kLibrariesProperty);
   if (libraries && libraries->GetKind() == Orb_Property::STRING_LIST)
@@ -176,13 +181,29 @@ void Lum_TdmView::GetDevicePic(PM_PIC &personality) const {
   personality = PM_PIC(pm->GetStringValue(), part->GetStringValue(), nullptr);
 }
 
+void Lum_TdmView::AppendLibrary(Lum_TlmLibrary const *library) const {
+  m_LocalEntries.reserve(m_pLibrary->size() + 1);
+  m_pLibrary->push_back(library);
+  m_LocalEntries.push_back(IsLocalLibrary(library));
+}
+
 std::vector<Lum_TlmLibrary const *> &Lum_TdmView::GetLibraryList() const {
   if (m_pLibrary)
     return *m_pLibrary;
-  // Stored before anything loads: AddLocalLibrary, called below, comes back
-  // here and must find this list.
+  // Stored before anything loads: AddLocalLibrary, called while building,
+  // comes back here and must find this list. A failure leaves the list as
+  // far as it got, counted as built.
   m_pLibrary = std::make_unique<std::vector<Lum_TlmLibrary const *>>();
+  try {
+    BuildLibraryList();
+  } catch (...) {
+    m_LibraryListFailed = true;
+    throw;
+  }
+  return *m_pLibrary;
+}
 
+void Lum_TdmView::BuildLibraryList() const {
   // The personality is built only when a library has to be loaded.
   PM_PIC personality("", "", nullptr);
   bool havePersonality = false;
@@ -210,10 +231,9 @@ std::vector<Lum_TlmLibrary const *> &Lum_TdmView::GetLibraryList() const {
     if (!library)
       throw Lum_ExceptionInvalidLibrary("Lum", kSourcePath, kRevision, __LINE__, name.c_str(),
                                         "Null library pointer specified.", false);
-    m_pLibrary->push_back(library);
+    AppendLibrary(library);
     Lum_Tlm::pTypeIDRegistry->RegisterTypeLibrary(library);
   }
-  return *m_pLibrary;
 }
 
 void Lum_TdmView::SetLibrary(Lum_TlmLibrary const *library) const {
@@ -224,8 +244,8 @@ void Lum_TdmView::SetLibrary(Lum_TlmLibrary const *library) const {
   for (Lum_TlmLibrary const *present : list)
     if (present == library)
       return;
-  list.push_back(library);
-  if (!IsLocalLibrary(library))
+  AppendLibrary(library);
+  if (!m_LocalEntries.back())
     Lum_Tlm::pTypeIDRegistry->RegisterTypeLibrary(library);
 }
 
@@ -260,6 +280,16 @@ Lum_TlmLibrary const *Lum_TdmView::GetLibrary(Port::StringBase<char> name) const
 
 Lum_TlmLibrary const *Lum_TdmView::GetLocalLibrary() const {
   return GetLibrary(Port::StringBase<char>(Lum_TlmLibrary::LOCAL_LIBRARY_NAME));
+}
+
+Lum_TlmBlock const *Lum_TdmView::FindTypeBlock(std::string const &storedType) const {
+  auto const found = m_TypeBlocks.find(storedType);
+  return found == m_TypeBlocks.end() ? nullptr : found->second;
+}
+
+void Lum_TdmView::NoteTypeBlock(std::string const &storedType,
+                                Lum_TlmBlock const *typeBlock) const {
+  m_TypeBlocks.emplace(storedType, typeBlock);
 }
 
 // ---------------------------------------------------------------------------

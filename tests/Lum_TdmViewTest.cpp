@@ -370,6 +370,27 @@ TEST_F(TdmViewLibraryTest, FailureMidListKeepsEarlierLibraries) {
   EXPECT_EQ(view->GetLibrary("LIBC"), nullptr);
   EXPECT_EQ(Lum_TlmCatalog::GetReferenceCount("LIBA"), 1u);
   EXPECT_EQ(Lum_TlmCatalog::GetReferenceCount("LIBC"), 0u);
+  // The commit goes on but keeps the stored list: writing the partial list
+  // would drop LIBC from the database.
+  view->CommitAll();
+  view->CommitAll();
+  EXPECT_EQ(ListValue(view, "TDS_VIEW_TYPE_LIBS"), "LIBA|NOSUCHLIB|LIBC");
+  EXPECT_EQ(PropertyValue(view, "TDS_TDM_VERSION"), "3.1");
+  m_Reopened.reset();
+  EXPECT_EQ(Lum_TlmCatalog::GetReferenceCount("LIBA"), 0u);
+}
+
+// A view outliving an in-memory library it loaded, and the local library,
+// goes away without reading either.
+TEST_F(TdmViewLibraryTest, ViewOutlivesItsLibraries) {
+  auto doomed = std::make_unique<TestLibrary>("DOOMED", 1, 0);
+  SetLibs({"DOOMED", Lum_TlmLibrary::LOCAL_LIBRARY_NAME, "LIBA"});
+  HookedView *view = Reopen();
+  std::vector<Lum_TlmLibrary const *> libraries;
+  view->GetLibraries(libraries);
+  EXPECT_EQ(Names(libraries),
+            std::string("DOOMED,") + Lum_TlmLibrary::LOCAL_LIBRARY_NAME + ",LIBA");
+  doomed.reset();
   m_Reopened.reset();
   EXPECT_EQ(Lum_TlmCatalog::GetReferenceCount("LIBA"), 0u);
 }

@@ -1,0 +1,589 @@
+// Typed blocks: binding from the stored type on load, pin reconciliation, the
+// pin name order, the block's commit and the commit walk.
+
+#include "Lum_TdmTestSupport.h"
+
+#include "Lum_TdmPinAlpaSorter.h"
+
+#include "Lum_Exception.h"
+#include "Orb_Debug.h"
+#include "Port_Stream.h"
+
+#include <gtest/gtest.h>
+
+#include <algorithm>
+#include <cstring>
+#include <fstream>
+#include <iterator>
+#include <map>
+#include <sstream>
+#include <utility>
+
+using namespace lumtest;
+
+namespace {
+
+char const kCompanionKey[] = "Lum_TlmLocalLibrary";
+
+// The pins of a block in host order: each name, then ">type pin" when the
+// type pin's name differs and "!" when the pin has none.
+std::string PinText(Lum_TdmBlock const *block) {
+  std::string text;
+  for (std::size_t i = 0; i < block->GetPins().size(); ++i) {
+    Lum_TdmPin const *pin = block->GetPin(i);
+    text += (i ? "," : "") + std::string(pin->GetName());
+    Lum_TlmPin const *typePin = pin->GetTypePin();
+    if (!typePin)
+      text += "!";
+    else if (std::strcmp(typePin->GetName(), pin->GetName()) != 0)
+      text += std::string(">") + typePin->GetName();
+  }
+  return text;
+}
+
+// The members of a list property as "name=value|...", or "<absent>".
+std::string Members(Orb_ClientObject const *object, char const *name) {
+  Orb_Property const *property = object->GetPropertyByName(name);
+  if (!property)
+    return "<absent>";
+  std::string text;
+  for (auto const &member : property->GetMembers())
+    text += (text.empty() ? "" : "|") + std::string(member->GetName()) + "=" + member->GetValue();
+  return text;
+}
+
+std::string FileBytes(std::string const &path) {
+  std::ifstream in(path, std::ios::binary);
+  return std::string(std::istreambuf_iterator<char>(in), std::istreambuf_iterator<char>());
+}
+
+// What a test design's child block "u1" is stored with.
+struct StoredBlock {
+  char const *type;                                          // TDS_BLOCK_TYPE, or null for none
+  std::vector<std::pair<char const *, bool>> pins;           // name, connected
+  std::vector<std::pair<char const *, char const *>> pinMap; // TDS_BLOCK_PIN_MAP members
+};
+
+// Type library LIBT with REG (D0, D1, CLK inputs, Q output, EN bidirectional)
+// and ABC (A, B inputs, C output), and designs that use it.
+class TdmBlockTest : public ::testing::Test {
+protected:
+  TdmBlockTest() : m_Library("LIBT", 2, 1) {
+    m_pReg = m_Library.AddTypeBlock("REG", {"D0", "D1", "CLK"});
+    m_pReg->CreatePin("Q", Orb_Pin::PIN_OUTPUT);
+    m_pReg->CreatePin("EN", Orb_Pin::PIN_BIDIRECTIONAL);
+    m_pAbc = m_Library.AddTypeBlock("ABC", {"A", "B"});
+    m_pAbc->CreatePin("C", Orb_Pin::PIN_OUTPUT);
+  }
+
+  // Saves a design "top" whose view lists LIBT (and, when asked, the local
+  // library, saved with the database) and whose top block holds the child u1
+  // as stored; returns the file.
+  std::string WriteDesign(StoredBlock const &stored, bool dontCreatePins = false,
+                          bool withLocalLibrary = false) {
+    TypedDesign design;
+    Orb_Property *libs = design.m_pView->CreatePropertyStringList("TDS_VIEW_TYPE_LIBS");
+    libs->AppendString("LIBT 2.1");
+    if (withLocalLibrary) {
+      libs->AppendString(Lum_TlmLibrary::LOCAL_LIBRARY_NAME);
+      Lum_TlmLibrary::GetLocalLibrary(design.Host(), PM_PIC("pm1", "part1", nullptr));
+    }
+    if (dontCreatePins)
+      design.m_pView->CreatePropertyString("LUM_DONT_CREATE_UNUSED_PINS", "");
+    Lum_TdmBlock *top = design.m_pView->CreateTopBlock("top");
+    Lum_TdmSignal *signal = top->CreateSignal("s");
+    Lum_TdmBlock *u1 = top->CreateBlock("u1", 0);
+    for (auto const &[name, connected] : stored.pins) {
+      Lum_TdmPin *pin = u1->CreatePin(name, Orb_Pin::PIN_INPUT);
+      if (connected)
+        pin->GetOrbPin()->Connect(signal->GetOrbSignal());
+    }
+    if (stored.type)
+      u1->CreatePropertyString("TDS_BLOCK_TYPE", stored.type);
+    if (!stored.pinMap.empty()) {
+      Orb_Property *pinMap = u1->CreatePropertyList("TDS_BLOCK_PIN_MAP");
+      for (auto const &[name, value] : stored.pinMap)
+        pinMap->CreatePropertyString(name, value);
+    }
+    std::string path = m_Dir.File("d" + std::to_string(m_Files++) + ".odb");
+    design.Model().Save(path.c_str());
+    return path;
+  }
+
+  static std::unique_ptr<Lum_TdmModel> Open(std::string const &path) {
+    auto model = std::make_unique<Lum_TdmModel>("r", "r", "");
+    model->Open(path.c_str());
+    return model;
+  }
+
+  static Lum_TdmBlock *U1(Lum_TdmModel &model) {
+    return FirstView(model)->GetBlock()->GetBlockByName("u1");
+  }
+
+  TempDir m_Dir;
+  TestLibrary m_Library;
+  Lum_TlmBlock *m_pReg = nullptr;
+  Lum_TlmBlock *m_pAbc = nullptr;
+  int m_Files = 0;
+};
+
+StoredBlock const kMappedReg{"LIBT:REG",
+                             {{"DATA0", true}, {"CLK", false}, {"DATA1", true}},
+                             {{"DATA0", "D0"}, {"DATA1", "D1"}}};
+
+// ---------------------------------------------------------------------------
+// Round trip
+
+// A loaded block binds to its stored type, maps DATA0 and DATA1, creates the
+// pins it lacks with their directions and sorts; its commit writes exactly
+// its type and its two mapped pins; a second commit changes nothing; a
+// reopen finds everything bound and creates nothing.
+TEST_F(TdmBlockTest, TypedDesignSurvivesSaveAndReopen) {
+  auto model = Open(WriteDesign(kMappedReg));
+  Lum_TdmBlock *u1 = U1(*model);
+  EXPECT_EQ(u1->GetTypeBlock(), m_pReg);
+  EXPECT_EQ(PinText(u1), "CLK,DATA0>D0,DATA1>D1,EN,Q");
+  EXPECT_EQ(u1->GetPinByName("EN")->GetDirection(), Orb_Pin::PIN_BIDIRECTIONAL);
+  EXPECT_EQ(u1->GetPinByName("Q")->GetDirection(), Orb_Pin::PIN_OUTPUT);
+  EXPECT_EQ(u1->GetPinByName("Q")->GetTypePin(), m_pReg->GetPinByName("Q"));
+  EXPECT_EQ(u1->GetParent()->GetTypeBlock(), nullptr) << "the top block has no stored type";
+
+  Lum_TdmView *view = FirstView(*model);
+  view->CommitAll();
+  EXPECT_EQ(PropertyValue(u1, "TDS_BLOCK_TYPE"), "LIBT:REG");
+  EXPECT_EQ(Members(u1, "TDS_BLOCK_PIN_MAP"), "DATA0=D0|DATA1=D1");
+  EXPECT_EQ(PropertyValue(u1->GetParent(), "TDS_BLOCK_TYPE"), "<absent>");
+  EXPECT_EQ(Members(u1->GetParent(), "TDS_BLOCK_PIN_MAP"), "<absent>");
+
+  std::string const once = m_Dir.File("once.odb");
+  std::string const twice = m_Dir.File("twice.odb");
+  model->Save(once.c_str());
+  view->CommitAll();
+  model->Save(twice.c_str());
+  EXPECT_EQ(FileBytes(once), FileBytes(twice)) << "a second commit changed the database";
+
+  auto again = Open(twice);
+  Lum_TdmBlock *reopened = U1(*again);
+  EXPECT_EQ(reopened->GetTypeBlock(), m_pReg);
+  EXPECT_EQ(PinText(reopened), "CLK,DATA0>D0,DATA1>D1,EN,Q");
+  EXPECT_EQ(reopened->GetNumPins(), 5u);
+}
+
+// With LUM_DONT_CREATE_UNUSED_PINS on the view nothing is created and the
+// pins keep their stored order.
+TEST_F(TdmBlockTest, ViewSwitchKeepsUnusedPinsOut) {
+  auto model = Open(WriteDesign(kMappedReg, true));
+  EXPECT_EQ(PinText(U1(*model)), "DATA0>D0,CLK,DATA1>D1");
+}
+
+// A created block drops stored typing but keeps TDS_LIBRARY_ASSOC; a loaded
+// block without TDS_BLOCK_TYPE ignores TDS_BLOCK_PIN_MAP, stays untyped and
+// loses the map at its commit.
+TEST_F(TdmBlockTest, UntypedBlocksCarryNoTyping) {
+  Orb_Model host("h", "h", "", false);
+  Orb_View *hostView = host.CreateDesignMgr("dm")->CreateDesign("d")->CreateView("v");
+  Orb_Block *hostTop = hostView->CreateTopBlock("top");
+  Lum_TdmModel model(&host);
+  // A block the library sees for the first time through its creation event.
+  Orb_Block *hostChild = hostTop->CreateBlock("c", 0);
+  for (char const *name : {"TDS_BLOCK_TYPE", "TDS_LIBRARY_ASSOC"})
+    hostChild->CreatePropertyString(name, "LIBT:REG");
+  hostChild->CreatePropertyList("TDS_BLOCK_PIN_MAP")->CreatePropertyString("P", "D0");
+  hostChild->CreatePin("P", Orb_Pin::PIN_INPUT);
+  delete model.GetClient(hostChild);
+  model.FireSpecialize(hostChild, true);
+  auto *child = static_cast<Lum_TdmBlock *>(model.GetClient(hostChild));
+  EXPECT_EQ(PropertyValue(child, "TDS_BLOCK_TYPE"), "<absent>");
+  EXPECT_EQ(Members(child, "TDS_BLOCK_PIN_MAP"), "<absent>");
+  EXPECT_EQ(PropertyValue(child, "TDS_LIBRARY_ASSOC"), "LIBT:REG");
+
+  auto loaded = Open(WriteDesign({nullptr, {{"P", true}}, {{"P", "D0"}}}));
+  Lum_TdmBlock *u1 = U1(*loaded);
+  EXPECT_EQ(u1->GetTypeBlock(), nullptr);
+  EXPECT_EQ(PinText(u1), "P!");
+  FirstView(*loaded)->CommitAll();
+  EXPECT_EQ(Members(u1, "TDS_BLOCK_PIN_MAP"), "<absent>");
+  u1->CreatePropertyString("TDS_BLOCK_TYPE", "LIBT:REG");
+  FirstView(*loaded)->CommitAll();
+  EXPECT_EQ(PropertyValue(u1, "TDS_BLOCK_TYPE"), "<absent>") << "an untyped block drops it";
+}
+
+// ---------------------------------------------------------------------------
+// Reconciliation
+
+struct ReconcileCase {
+  char const *name;
+  StoredBlock stored;
+  char const *pins;    // PinText after the load
+  char const *members; // TDS_BLOCK_PIN_MAP after a commit
+};
+
+std::ostream &operator<<(std::ostream &out, ReconcileCase const &c) { return out << c.name; }
+
+class TdmBlockReconcileTest : public TdmBlockTest,
+                              public ::testing::WithParamInterface<ReconcileCase> {};
+
+// Each stored block ends with the pins, type pins and order given, and its
+// commit records exactly the pins whose names differ from their type pins'.
+TEST_P(TdmBlockReconcileTest, PinsEndAsExpected) {
+  auto model = Open(WriteDesign(GetParam().stored));
+  Lum_TdmBlock *u1 = U1(*model);
+  EXPECT_EQ(u1->GetTypeBlock(), m_pAbc);
+  EXPECT_EQ(PinText(u1), GetParam().pins);
+  bool const storedC =
+      std::any_of(GetParam().stored.pins.begin(), GetParam().stored.pins.end(),
+                  [](auto const &pin) { return std::strcmp(pin.first, "C") == 0; });
+  Lum_TdmPin const *c = u1->GetPinByName("C");
+  if (c && !storedC) {
+    EXPECT_EQ(c->GetDirection(), Orb_Pin::PIN_OUTPUT) << "created with the type pin's direction";
+  }
+  FirstView(*model)->CommitAll();
+  EXPECT_EQ(PropertyValue(u1, "TDS_BLOCK_TYPE"), "LIBT:ABC");
+  EXPECT_EQ(Members(u1, "TDS_BLOCK_PIN_MAP"), GetParam().members);
+}
+
+INSTANTIATE_TEST_SUITE_P(
+    Cases, TdmBlockReconcileTest,
+    ::testing::Values(
+        // The missing C is created and the pins sorted.
+        ReconcileCase{
+            "MissingPinCreated", {"LIBT:ABC", {{"B", true}, {"A", true}}, {}}, "A,B,C", "<absent>"},
+        // Three type pins against two pins: B and C are created, X stays
+        // without a type pin.
+        ReconcileCase{"FewerPinsGetTheRest",
+                      {"LIBT:ABC", {{"A", true}, {"X", false}}, {}},
+                      "A,B,C,X!",
+                      "<absent>"},
+        // Equal counts: nothing is created and the order stays.
+        ReconcileCase{"EqualCountsCreateNothing",
+                      {"LIBT:ABC", {{"X", false}, {"A", true}, {"B", true}}, {}},
+                      "X!,A,B",
+                      "<absent>"},
+        // The last member of a name counts; a member for a missing pin
+        // changes nothing.
+        ReconcileCase{"LastMemberWins",
+                      {"LIBT:ABC",
+                       {{"P", true}, {"A", true}, {"C", true}},
+                       {{"P", "C"}, {"Z", "A"}, {"P", "B"}}},
+                      "P>B,A,C",
+                      "P=B"},
+        // Two pins may take one type pin.
+        ReconcileCase{
+            "SharedTypePin",
+            {"LIBT:ABC", {{"P", true}, {"Q", true}, {"C", true}}, {{"P", "A"}, {"Q", "A"}}},
+            "P>A,Q>A,C",
+            "P=A|Q=A"},
+        // Names differing in case only make a mapped pin.
+        ReconcileCase{"CaseDiffers",
+                      {"LIBT:ABC", {{"a", true}, {"B", true}, {"C", true}}, {{"a", "A"}}},
+                      "a>A,B,C",
+                      "a=A"},
+        // An unconnected pin whose mapped name is unknown stays untyped.
+        ReconcileCase{"UnknownMappedNameUnconnected",
+                      {"LIBT:ABC", {{"P", false}, {"A", true}, {"B", true}}, {{"P", "NOPE"}}},
+                      "P!,A,B",
+                      "<absent>"}),
+    [](::testing::TestParamInfo<ReconcileCase> const &caseInfo) {
+      return std::string(caseInfo.param.name);
+    });
+
+// ---------------------------------------------------------------------------
+// Failures on load
+
+struct FailureCase {
+  char const *name;
+  StoredBlock stored;
+  char const *objectName;
+  char const *message;
+};
+
+std::ostream &operator<<(std::ostream &out, FailureCase const &c) { return out << c.name; }
+
+class TdmBlockLoadFailureTest : public TdmBlockTest,
+                                public ::testing::WithParamInterface<FailureCase> {};
+
+// Each failure names its object with the exact message, and the open leaves
+// no host object, no client, no library reference and no companion behind.
+TEST_P(TdmBlockLoadFailureTest, OpenFailsAndLeavesNothing) {
+  FailureCase const &c = GetParam();
+  std::string const path = WriteDesign(c.stored, false, true);
+  Lum_TdmModel model("r", "r", "");
+  try {
+    model.Open(path.c_str());
+    FAIL() << "the design loaded";
+  } catch (Lum_ExceptionCorruptDatabase const &e) {
+    EXPECT_EQ(e.GetObjectName(), c.objectName);
+    EXPECT_EQ(e.GetMessage(), c.message);
+    EXPECT_EQ(e.GetFile(), "../s/Lum_TdmBlock");
+    EXPECT_EQ(e.GetSubsystem(), "Lum");
+    EXPECT_FALSE(e.GetFlag());
+  }
+  Orb_Model *host = model.GetOrbModel();
+  for (unsigned k = 0; k < Orb_KindCount; ++k)
+    EXPECT_EQ(host->GetObjectCount(static_cast<Orb_Kind>(k)), 0u) << Orb_KindName(Orb_Kind(k));
+  EXPECT_EQ(model.GetClientCount(), 0u);
+  EXPECT_EQ(Lum_TlmCatalog::GetReferenceCount("LIBT"), 0u);
+  EXPECT_EQ(host->GetCompanion(kCompanionKey), nullptr);
+  EXPECT_EQ(host->TakeLoadedCompanion(kCompanionKey), nullptr);
+}
+
+INSTANTIATE_TEST_SUITE_P(
+    Cases, TdmBlockLoadFailureTest,
+    ::testing::Values(
+        FailureCase{"UnknownLibrary",
+                    {"NOLIB:REG", {}, {}},
+                    "NOLIB",
+                    "Could not locate the specified library."},
+        FailureCase{"UnknownTypeBlock",
+                    {"LIBT:NOPE", {}, {}},
+                    "NOPE",
+                    "\nCouldn't find type block <NOPE> in library <LIBT>.\n"},
+        // Without ":" the whole value names the library.
+        FailureCase{
+            "NoColon", {"LIBT", {}, {}}, "", "\nCouldn't find type block <> in library <LIBT>.\n"},
+        FailureCase{"ConnectedPinWithoutTypePin",
+                    {"LIBT:ABC", {{"A", true}, {"X", true}}, {}},
+                    "X",
+                    "Could not locate the specified pin."},
+        FailureCase{"ConnectedPinMappedToNothing",
+                    {"LIBT:ABC", {{"P", true}}, {{"P", "NOPE"}}},
+                    "P",
+                    "Could not locate the specified pin."},
+        // A takes B through the map; the untaken type pin A then meets the
+        // block's pin A.
+        FailureCase{"PatchUpMeetsExistingPin",
+                    {"LIBT:ABC", {{"A", true}}, {{"A", "B"}}},
+                    "top",
+                    "While trying to patch up design block <u1> with new type pin <A>\nof type "
+                    "block <ABC>, found that the block already had a pin by that\nname.  This "
+                    "could have been due to an earlier and inappropriate\nclient call to "
+                    "pin->SetName().\n"}),
+    [](::testing::TestParamInfo<FailureCase> const &caseInfo) {
+      return std::string(caseInfo.param.name);
+    });
+
+// ---------------------------------------------------------------------------
+// Several client models, and the load walk
+
+// A second client model on the same host model binds its own blocks; pins
+// that the first model's blocks create reach it through their creation
+// events, and nothing is made twice.
+TEST_F(TdmBlockTest, SecondClientModelBindsToo) {
+  std::string const path = WriteDesign(kMappedReg);
+  Orb_Model host("h", "h", "", false);
+  {
+    Lum_TdmModel first(&host);
+    Lum_TdmModel second(&host);
+    host.Open(path.c_str());
+    std::size_t objects = 0;
+    for (unsigned k = 0; k < Orb_KindCount; ++k)
+      objects += host.GetObjectCount(static_cast<Orb_Kind>(k));
+    for (Lum_TdmModel *model : {&first, &second}) {
+      Lum_TdmBlock *u1 = U1(*model);
+      EXPECT_EQ(u1->GetTypeBlock(), m_pReg);
+      EXPECT_EQ(PinText(u1), "CLK,DATA0>D0,DATA1>D1,EN,Q");
+      EXPECT_EQ(model->GetClientCount(), objects) << "one client per host object";
+    }
+    EXPECT_EQ(Lum_TlmCatalog::GetReferenceCount("LIBT"), 2u) << "one list per view client";
+  }
+  EXPECT_EQ(Lum_TlmCatalog::GetReferenceCount("LIBT"), 0u);
+}
+
+class RecordingModel;
+
+// A client class that logs its commits in its model.
+template <class Base> class Recording : public Base {
+public:
+  using Base::Base;
+
+protected:
+  void CommitToOrb() override;
+};
+
+// Builds recording clients, and counts the pin clients it builds per pin.
+class RecordingModel : public Lum_TdmModel {
+public:
+  using Lum_TdmModel::Lum_TdmModel;
+  void SyncEventSpecializeDesignOnCreate(Orb_Design *o) override {
+    new Recording<Lum_TdmDesign>(this, o, true);
+  }
+  void SyncEventSpecializeDesignOnLoad(Orb_Design *o) override {
+    new Recording<Lum_TdmDesign>(this, o, false);
+  }
+  void SyncEventSpecializeViewOnCreate(Orb_View *o) override {
+    new Recording<Lum_TdmView>(this, o, true);
+  }
+  void SyncEventSpecializeViewOnLoad(Orb_View *o) override {
+    new Recording<Lum_TdmView>(this, o, false);
+  }
+  void SyncEventSpecializeBlockOnCreate(Orb_Block *o) override {
+    new Recording<Lum_TdmBlock>(this, o, true);
+  }
+  void SyncEventSpecializeBlockOnLoad(Orb_Block *o) override {
+    new Recording<Lum_TdmBlock>(this, o, false);
+  }
+  void SyncEventSpecializePinOnCreate(Orb_Pin *o) override {
+    ++m_PinsMade[o->GetName()];
+    new Recording<Lum_TdmPin>(this, o, true);
+  }
+  void SyncEventSpecializePinOnLoad(Orb_Pin *o) override {
+    ++m_PinsMade[o->GetName()];
+    new Recording<Lum_TdmPin>(this, o, false);
+  }
+  void SyncEventSpecializeSignalOnCreate(Orb_Signal *o) override {
+    new Recording<Lum_TdmSignal>(this, o, true);
+  }
+  void SyncEventSpecializeSignalOnLoad(Orb_Signal *o) override {
+    new Recording<Lum_TdmSignal>(this, o, false);
+  }
+  void SyncEventSpecializeNetworkOnLoad(Orb_Network *o) override {
+    new Recording<Lum_TdmNetwork>(this, o);
+  }
+
+  std::string m_Commits;
+  std::map<std::string, int> m_PinsMade;
+};
+
+template <class Base> void Recording<Base>::CommitToOrb() {
+  std::string &log = static_cast<RecordingModel *>(this->GetClientOrbModel())->m_Commits;
+  log += (log.empty() ? "" : ",") + std::string(this->GetName());
+  Base::CommitToOrb();
+}
+
+// The load walk skips pins that their block's reconciliation already gave a
+// client: every pin's client is built once.
+TEST_F(TdmBlockTest, LoadWalkSkipsObjectsThatHaveAClient) {
+  std::string const path = WriteDesign(kMappedReg);
+  RecordingModel model("r", "r", "");
+  model.Open(path.c_str());
+  std::string made;
+  for (auto const &[name, count] : model.m_PinsMade)
+    made += name + "=" + std::to_string(count) + " ";
+  EXPECT_EQ(made, "CLK=1 DATA0=1 DATA1=1 EN=1 Q=1 ");
+}
+
+class TdmCommitOrderTest : public ::testing::Test {
+protected:
+  // Design "design", view "view" with networks N1, N2 and top block T with
+  // pins P1, P2, signal S1 and children C1 (pin Q1) and C2.
+  TdmCommitOrderTest() {
+    Lum_TdmDesign *design = m_Model.CreateDesignMgr("dm")->CreateDesign("design");
+    m_pView = design->CreateView("view");
+    m_pView->CreatePropertyString("TDS_DEVICE_PM", "pm1");
+    m_pView->CreatePropertyString("TDS_DEVICE_PART", "part1");
+    m_pView->CreateNetwork("N1");
+    m_pView->CreateNetwork("N2");
+    m_pTop = m_pView->CreateTopBlock("T");
+    m_pTop->CreatePin("P1", Orb_Pin::PIN_INPUT);
+    m_pTop->CreatePin("P2", Orb_Pin::PIN_OUTPUT);
+    m_pTop->CreateSignal("S1");
+    m_pTop->CreateBlock("C1", 0)->CreatePin("Q1", Orb_Pin::PIN_INPUT);
+    m_pTop->CreateBlock("C2", 0);
+    m_Model.m_Commits.clear();
+  }
+
+  RecordingModel m_Model{"m", "db", ""};
+  Lum_TdmView *m_pView = nullptr;
+  Lum_TdmBlock *m_pTop = nullptr;
+};
+
+// The view, its networks, its block tree depth first (pins, signals, then
+// children), then its user design.
+TEST_F(TdmCommitOrderTest, CommitWalksInOrder) {
+  m_pView->CommitAll();
+  EXPECT_EQ(m_Model.m_Commits, "view,N1,N2,T,P1,P2,S1,C1,Q1,C2,design");
+}
+
+// A design with a foreign mark is not committed, and keeps its mark.
+TEST_F(TdmCommitOrderTest, ForeignDesignIsNotCommitted) {
+  Lum_TdmDesign *design = m_pView->GetParent();
+  design->CreatePropertyString("TDS_DESIGN_TYPE", "OTHER");
+  m_pView->CommitAll();
+  EXPECT_EQ(m_Model.m_Commits, "view,N1,N2,T,P1,P2,S1,C1,Q1,C2");
+  EXPECT_EQ(PropertyValue(design, "TDS_DESIGN_TYPE"), "OTHER");
+}
+
+// Objects whose clients were discarded get new ones, built by the model, and
+// are committed in their places.
+TEST_F(TdmCommitOrderTest, DiscardedClientsAreRebuiltAndCommitted) {
+  Orb_Block *c1 = m_pTop->GetOrbBlock()->GetBlockByName("C1");
+  for (Orb_Persistent *object : std::vector<Orb_Persistent *>{
+           c1->GetPins().front(), c1, m_pTop->GetOrbBlock()->GetSignals().front(),
+           m_pView->GetOrbView()->GetNetworks().back()})
+    delete m_Model.GetClient(object);
+  m_pView->CommitAll();
+  EXPECT_EQ(m_Model.m_Commits, "view,N1,N2,T,P1,P2,S1,C1,Q1,C2,design");
+  EXPECT_NE(dynamic_cast<Recording<Lum_TdmBlock> *>(m_Model.GetClient(c1)), nullptr);
+}
+
+// ---------------------------------------------------------------------------
+// Pin name order
+
+struct SortCase {
+  std::vector<char const *> typePins; // in creation order
+  char const *sorted;
+};
+
+std::ostream &operator<<(std::ostream &out, SortCase const &c) { return out << c.sorted; }
+
+class TdmPinOrderTest : public ::testing::TestWithParam<SortCase> {};
+
+// A block bound to a type block whose pins it lacks gets them all, in name
+// byte order.
+TEST_P(TdmPinOrderTest, CreatedPinsAreSortedByBytes) {
+  TestLibrary library("LIBS", 1, 0);
+  library.AddTypeBlock("T", GetParam().typePins);
+  TypedDesign design;
+  design.m_pView->CreatePropertyStringList("TDS_VIEW_TYPE_LIBS")->AppendString("LIBS");
+  Orb_Block *host = design.m_pView->CreateTopBlock("top")->GetOrbBlock();
+  // Loading the block again binds it from the stored type.
+  host->CreatePropertyString("TDS_BLOCK_TYPE", "LIBS:T");
+  delete design.Model().GetClient(host);
+  auto *block = static_cast<Lum_TdmBlock *>(design.Model().Specialize(host));
+  EXPECT_EQ(PinText(block), GetParam().sorted);
+}
+
+INSTANTIATE_TEST_SUITE_P(Cases, TdmPinOrderTest,
+                         ::testing::Values(SortCase{{"b", "B", "a10", "a2"}, "B,a10,a2,b"},
+                                           SortCase{{"AB", "A"}, "A,AB"},
+                                           SortCase{{"z", "\xC3\xA9", "Z", "0"}, "0,Z,z,\xC3\xA9"},
+                                           SortCase{{"P10", "P2", "P1"}, "P1,P10,P2"}));
+
+// Equal names compare false both ways, so a stable sort keeps their order.
+TEST(TdmPinAlpaSorterTest, EqualNamesAreNotOrdered) {
+  Orb_Model host("h", "h", "", false);
+  Orb_Block *top =
+      host.CreateDesignMgr("dm")->CreateDesign("d")->CreateView("v")->CreateTopBlock("t");
+  Orb_Pin *first = top->CreatePin("X", Orb_Pin::PIN_INPUT);
+  Orb_Pin *second = top->CreateBlock("c")->CreatePin("X", Orb_Pin::PIN_INPUT);
+  PinAlpaSorter const sorter;
+  EXPECT_FALSE(sorter(first, second));
+  EXPECT_FALSE(sorter(second, first));
+  Orb_SortFtor<Orb_Pin> const delegating(&sorter);
+  EXPECT_FALSE(delegating(first, second));
+  EXPECT_FALSE(delegating(second, first));
+}
+
+// ---------------------------------------------------------------------------
+// Dump
+
+// The own dump shows the type block's address and name, or null and an
+// empty name.
+TEST_F(TdmBlockTest, DumpShowsTheTypeBlock) {
+  auto model = Open(WriteDesign(kMappedReg));
+  Port::StringStream out;
+  Port::Stream *previous = Orb_Debug::SetOutput(&out);
+  U1(*model)->Dbg();
+  U1(*model)->GetParent()->Dbg();
+  Orb_Debug::SetOutput(previous);
+  std::ostringstream address;
+  address << std::hex << reinterpret_cast<std::uintptr_t>(m_pReg);
+  std::string const typed = "Data for class <Lum_TdmBlock>:\n(Lum_TlmBlock *) m_pTypeBlock = <0x" +
+                            address.str() + ">, (REG)\n";
+  std::string const untyped =
+      "Data for class <Lum_TdmBlock>:\n(Lum_TlmBlock *) m_pTypeBlock = <0x0>, ()\n";
+  EXPECT_LT(out.GetText().find(typed), out.GetText().find(untyped)) << out.GetText();
+  EXPECT_NE(out.GetText().find(untyped), std::string::npos) << out.GetText();
+}
+
+} // namespace

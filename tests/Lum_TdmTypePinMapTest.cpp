@@ -1,0 +1,135 @@
+// Type pin maps: first entry wins, equality by identity, copies and the dump.
+
+#include "Lum_TdmTypePinMap.h"
+
+#include "Lum_TdmTestSupport.h"
+
+#include "Lum_Exception.h"
+#include "Orb_Debug.h"
+#include "Port_Stream.h"
+
+#include <gtest/gtest.h>
+
+#include <cstdint>
+#include <sstream>
+
+using namespace lumtest;
+
+namespace {
+
+class TdmTypePinMapTest : public ::testing::Test {
+protected:
+  TdmTypePinMapTest() : m_Library("LIBM", 1, 0) {
+    Lum_TlmBlock *typeBlock = m_Library.AddTypeBlock("REG", {"D0", "D1", "CLK"});
+    m_pD0 = typeBlock->GetPinByName("D0");
+    m_pD1 = typeBlock->GetPinByName("D1");
+    m_pClk = typeBlock->GetPinByName("CLK");
+  }
+
+  TestLibrary m_Library;
+  Lum_TlmPin const *m_pD0 = nullptr;
+  Lum_TlmPin const *m_pD1 = nullptr;
+  Lum_TlmPin const *m_pClk = nullptr;
+};
+
+// The first entry of a name stays; names differing in case are two entries;
+// the pin forms use the design pin's name both ways.
+TEST_F(TdmTypePinMapTest, FirstEntryWinsAndPinFormsUseTheName) {
+  TypedDesign design;
+  Lum_TdmBlock *top = design.m_pView->CreateTopBlock("top");
+  Lum_TdmPin *data0 = top->CreatePin("DATA0", Orb_Pin::PIN_INPUT);
+  Lum_TdmPin *clk = top->CreatePin("clk", Orb_Pin::PIN_INPUT);
+
+  Lum_TdmTypePinMap map;
+  EXPECT_FALSE(map.IsDefaultMap());
+  map.SetPinMap("DATA0", m_pD0);
+  map.SetPinMap(data0, m_pD1);
+  map.SetPinMap("DATA0", nullptr);
+  EXPECT_EQ(map.GetNumPins(), 1u);
+  EXPECT_EQ(map.GetPinMapping(data0), m_pD0);
+
+  map.SetPinMap(clk, m_pClk);
+  map.SetPinMap("CLK", m_pD1);
+  EXPECT_EQ(map.GetNumPins(), 3u);
+  EXPECT_EQ(map.GetPinMapping("clk"), m_pClk);
+  EXPECT_EQ(map.GetPinMapping("CLK"), m_pD1);
+  EXPECT_EQ(map.GetPinMapping("DATA"), nullptr);
+  EXPECT_EQ(map.GetPinMapping(""), nullptr);
+}
+
+// Equality ignores insertion order and the default flag, compares type pins
+// by identity and sizes first; copies are equal and independent.
+TEST_F(TdmTypePinMapTest, EqualityIsByEntriesOnly) {
+  Lum_TdmTypePinMap left, right;
+  left.SetDefaultMap(true);
+  EXPECT_TRUE(left == right) << "empty maps";
+
+  left.SetPinMap("A", m_pD0);
+  left.SetPinMap("B", m_pD1);
+  right.SetPinMap("B", m_pD1);
+  right.SetPinMap("A", m_pD0);
+  EXPECT_TRUE(left == right);
+  EXPECT_TRUE(right == left);
+
+  Lum_TdmTypePinMap other;
+  other.SetPinMap("A", m_pD0);
+  other.SetPinMap("B", m_pClk);
+  EXPECT_FALSE(left == other) << "one type pin differs";
+
+  Lum_TdmTypePinMap larger(left);
+  EXPECT_TRUE(larger == left);
+  EXPECT_TRUE(larger.IsDefaultMap());
+  larger.SetPinMap("C", m_pClk);
+  EXPECT_FALSE(left == larger);
+  EXPECT_FALSE(larger == left);
+  right = larger;
+  EXPECT_TRUE(right == larger);
+  EXPECT_TRUE(right.IsDefaultMap());
+}
+
+// A name mapped to null on the left matches a missing name on the right,
+// but not the other way round.
+TEST_F(TdmTypePinMapTest, StoredNullMakesEqualityAsymmetric) {
+  Lum_TdmTypePinMap withNull, withOther;
+  withNull.SetPinMap("A", nullptr);
+  withNull.SetPinMap("B", m_pD1);
+  withOther.SetPinMap("B", m_pD1);
+  withOther.SetPinMap("C", m_pClk);
+  EXPECT_TRUE(withNull == withOther);
+  EXPECT_FALSE(withOther == withNull);
+}
+
+// A null design pin is refused with an exception, never dereferenced.
+TEST_F(TdmTypePinMapTest, NullDesignPinIsRefused) {
+  Lum_TdmTypePinMap map;
+  EXPECT_THROW(map.SetPinMap(static_cast<Lum_TdmPin const *>(nullptr), m_pD0),
+               Lum_ExceptionInvalidTypeBlock);
+  EXPECT_EQ(map.GetNumPins(), 0u);
+  EXPECT_THROW(map.GetPinMapping(static_cast<Lum_TdmPin const *>(nullptr)),
+               Lum_ExceptionInvalidTypeBlock);
+}
+
+// The dump shows the flag, the count and each entry in name order.
+TEST_F(TdmTypePinMapTest, DumpListsEntriesInNameOrder) {
+  Lum_TdmTypePinMap map;
+  Port::StringStream out;
+  Port::Stream *previous = Orb_Debug::SetOutput(&out);
+  map.Dbg();
+  std::string const head = "---------------------------------------\n"
+                           "Data for class <Lum_TdmTypePinMap>:\n";
+  EXPECT_EQ(out.GetText(), head + "m_IsDefault = <false>\nm_PinMaps (# = 0:\n");
+
+  out.Clear();
+  map.SetDefaultMap(true);
+  map.SetPinMap("b", m_pD1);
+  map.SetPinMap("B", nullptr);
+  map.Dbg();
+  Orb_Debug::SetOutput(previous);
+  std::ostringstream d1;
+  d1 << std::hex << reinterpret_cast<std::uintptr_t>(m_pD1);
+  EXPECT_EQ(out.GetText(), head + "m_IsDefault = <true>\nm_PinMaps (# = 2:\n" +
+                               "  design pin name = <B>, Lum_TlmPin * = <0x0> \n" +
+                               "  design pin name = <b>, Lum_TlmPin * = <0x" + d1.str() + "> \n");
+}
+
+} // namespace
