@@ -357,7 +357,6 @@ std::uint64_t Lum_TdmView::DbgGetSize(std::uint64_t &blockBytes, std::uint64_t &
   std::uint64_t total = 0;
   Orb_Context *context = GetContext();
   Orb_BridgeHandle const pins = context->GetBridgeHandle(Orb_Kind::Pin);
-  Orb_BridgeHandle const signals = context->GetBridgeHandle(Orb_Kind::Signal);
 
   // The host's list of block clients, taken as this library's blocks without
   // a second copy.
@@ -368,15 +367,11 @@ std::uint64_t Lum_TdmView::DbgGetSize(std::uint64_t &blockBytes, std::uint64_t &
     Count(block->DbgMySize(), blockBytes, blockCount, total);
     for (Orb_Pin *pin : block->GetPins())
       Count(MeasuredClient<Lum_TdmPin>(context, pins, pin)->DbgMySize(), pinBytes, pinCount, total);
-    // A signal in a network is counted with its network below; one in none
-    // would otherwise be missed.
-    for (Orb_Signal *signal : block->GetSignals())
-      if (!signal->GetNetwork())
-        Count(MeasuredClient<Lum_TdmSignal>(context, signals, signal)->DbgMySize(), signalBytes,
-              signalCount, total);
   }
 
+  // Signals are counted through their networks.
   Orb_BridgeHandle const networks = context->GetBridgeHandle(Orb_Kind::Network);
+  Orb_BridgeHandle const signals = context->GetBridgeHandle(Orb_Kind::Signal);
   for (Orb_Network *network : GetNetworks()) {
     Count(MeasuredClient<Lum_TdmNetwork>(context, networks, network)->DbgMySize(), networkBytes,
           networkCount, total);
@@ -402,23 +397,27 @@ void Lum_TdmView::DbgReportSize(Port::Stream *stream) const {
   char const rule[] = "==================================================================\n";
   Orb_Debug::Printf(stream, 0, rule);
   Orb_Debug::Printf(stream, 0, "Design <%s> View <%s> consumes %lU bytes of memory\n",
-                    GetOrbView()->GetParent()->GetName(), GetName(), total);
+                    GetParent()->GetName(), GetName(), total);
   Orb_Debug::Printf(stream, 1, "%lU specialized objects\n",
                     blockCount + networkCount + signalCount + pinCount);
   // A derived class may report 0 bytes, so the total can be 0 even with
   // objects present: its share then prints as 0.
-  auto const section = [&](char const *kind, std::uint64_t bytes, std::uint64_t count) {
+  auto const section = [&](char const *countFormat, char const *averageFormat, std::uint64_t bytes,
+                           std::uint64_t count) {
     if (count == 0)
       return;
     std::uint64_t const share = total == 0 ? 0 : bytes * 100 / total;
-    Orb_Debug::Printf(stream, 2, "%lU %ss consume %lU bytes of memory (%lU%%)\n", count, kind,
-                      bytes, share);
-    Orb_Debug::Printf(stream, 3, "Average %s size is %lU bytes\n", kind, bytes / count);
+    Orb_Debug::Printf(stream, 2, countFormat, count, bytes, share);
+    Orb_Debug::Printf(stream, 3, averageFormat, bytes / count);
   };
-  section("block", blockBytes, blockCount);
-  section("network", networkBytes, networkCount);
-  section("signal", signalBytes, signalCount);
-  section("pin", pinBytes, pinCount);
+  section("%lU blocks consume %lU bytes of memory (%lU%%)\n", "Average block size is %lU bytes\n",
+          blockBytes, blockCount);
+  section("%lU networks consume %lU bytes of memory (%lU%%)\n",
+          "Average network size is %lU bytes\n", networkBytes, networkCount);
+  section("%lU signals consume %lU bytes of memory (%lU%%)\n", "Average signal size is %lU bytes\n",
+          signalBytes, signalCount);
+  section("%lU pins consume %lU bytes of memory (%lU%%)\n", "Average pin size is %lU bytes\n",
+          pinBytes, pinCount);
   Orb_Debug::Printf(stream, 0, rule);
 }
 
