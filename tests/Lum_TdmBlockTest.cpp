@@ -1,12 +1,18 @@
 // Typed blocks: binding from the stored type on load, pin reconciliation, the
-// pin name order, the block's commit and the commit walk.
+// pin name order, the block's commit and the commit walk; the caller's
+// operations: creating children from type blocks, rebinding, typed queries
+// and pin manifestation.
 
 #include "Lum_TdmTestSupport.h"
 
 #include "Lum_TdmPinAlpaSorter.h"
 
 #include "Lum_Exception.h"
+#include "Lum_TdmTypePinMap.h"
+#include "Lum_TlmTypeID.h"
+#include "Ora_GraftMgr.h"
 #include "Orb_Debug.h"
+#include "Orb_Exception.h"
 #include "Port_Stream.h"
 
 #include <gtest/gtest.h>
@@ -14,8 +20,10 @@
 #include <algorithm>
 #include <cstring>
 #include <fstream>
+#include <functional>
 #include <iterator>
 #include <map>
+#include <regex>
 #include <sstream>
 #include <utility>
 
@@ -584,6 +592,242 @@ TEST_F(TdmBlockTest, DumpShowsTheTypeBlock) {
       "Data for class <Lum_TdmBlock>:\n(Lum_TlmBlock *) m_pTypeBlock = <0x0>, ()\n";
   EXPECT_LT(out.GetText().find(typed), out.GetText().find(untyped)) << out.GetText();
   EXPECT_NE(out.GetText().find(untyped), std::string::npos) << out.GetText();
+}
+
+// ---------------------------------------------------------------------------
+// Caller operations
+
+class CallerModel;
+
+// A block that counts its InitTypeBlock calls in its model.
+class CallerBlock : public Lum_TdmBlock {
+public:
+  using Lum_TdmBlock::Lum_TdmBlock;
+
+protected:
+  void InitTypeBlock() override;
+};
+
+// A model that logs its graft hooks and makes CallerBlocks.
+class CallerModel : public Lum_TdmModel {
+public:
+  CallerModel() : Lum_TdmModel("caller", "callerdb", "") {}
+  void RegisterGraftEventHandlers() override { m_Hooks += "register,"; }
+  void CleanupGraftProps() override { m_Hooks += "cleanup,"; }
+  void UnregisterGraftEventHandlers() override { m_Hooks += "unregister,"; }
+  void SyncEventSpecializeBlockOnCreate(Orb_Block *block) override {
+    new CallerBlock(this, block, true);
+  }
+  void SyncEventSpecializeBlockOnLoad(Orb_Block *block) override {
+    new CallerBlock(this, block, false);
+  }
+
+  std::string m_Hooks;
+  int m_Inits = 0;
+  std::string m_SignalOnInit; // a signal InitTypeBlock makes, when not empty
+};
+
+void CallerBlock::InitTypeBlock() {
+  CallerModel *model = static_cast<CallerModel *>(GetClientOrbModel());
+  ++model->m_Inits;
+  if (!model->m_SignalOnInit.empty())
+    CreateSignal(model->m_SignalOnInit.c_str());
+}
+
+// What a failure said: "class|object|message".
+template <class Action> std::string Failure(Action const &action) {
+  try {
+    action();
+  } catch (Lum_ExceptionInvalidTypeBlock const &e) {
+    return "InvalidTypeBlock|" + e.GetObjectName() + "|" + e.GetMessage();
+  } catch (Lum_ExceptionCorruptDatabase const &e) {
+    return "CorruptDatabase|" + e.GetObjectName() + "|" + e.GetMessage();
+  }
+  return "no failure";
+}
+
+// Library LIBC, listed by the design's view: REG (D0, D1, CLK in, Q out; D0
+// carries LOC=P1) with a hierarchy for "netlist" (a child a1 of type AND on
+// signal n1 of network VCC, n1 also inside D0), AND (A, B in, Y out), EMPTY
+// (no pins). Library LIBO, not listed, with AND.
+class TdmCallerTest : public ::testing::Test {
+protected:
+  TdmCallerTest() : m_Library("LIBC", 1, 0), m_Unlisted("LIBO", 1, 0) {
+    m_pReg = m_Library.AddTypeBlock("REG", {"D0", "D1", "CLK"});
+    m_pReg->CreatePin("Q", Orb_Pin::PIN_OUTPUT);
+    m_pReg->GetPinByName("D0")->CreatePropertyString("LOC", "P1");
+    m_pAnd = m_Library.AddTypeBlock("AND", {"A", "B"});
+    m_pAnd->CreatePin("Y", Orb_Pin::PIN_OUTPUT);
+    m_pEmpty = m_Library.AddTypeBlock("EMPTY");
+    m_pForeign = m_Unlisted.AddTypeBlock("AND", {"A", "B"});
+
+    Lum_TlmBlock *hier = m_pReg->CreateHier("netlist");
+    Lum_TlmSignal *n1 = hier->CreateSignal("n1");
+    hier->GetView()->CreateNetwork("VCC")->GetOrbNetwork()->AddSignal(n1->GetOrbSignal());
+    hier->CreatePin("D0", Orb_Pin::PIN_INPUT)->GetOrbPin()->ConnectInner(n1->GetOrbSignal());
+    Lum_TlmBlock *a1 = hier->CreateBlock("a1", 0);
+    a1->CreatePin("A", Orb_Pin::PIN_INPUT)->GetOrbPin()->Connect(n1->GetOrbSignal());
+    a1->CreatePropertyString("TDS_BLOCK_TYPE", "LIBC:AND");
+
+    m_Design.m_pView->CreatePropertyStringList("TDS_VIEW_TYPE_LIBS")->AppendString("LIBC 1.0");
+    m_pTop = m_Design.m_pView->CreateTopBlock("top");
+  }
+
+  CallerModel &Model() { return static_cast<CallerModel &>(m_Design.Model()); }
+
+  TempDir m_Dir;
+  TestLibrary m_Library;
+  TestLibrary m_Unlisted;
+  Lum_TlmBlock *m_pReg = nullptr;
+  Lum_TlmBlock *m_pAnd = nullptr;
+  Lum_TlmBlock *m_pEmpty = nullptr;
+  Lum_TlmBlock *m_pForeign = nullptr;
+  TypedDesign m_Design{std::make_unique<CallerModel>()};
+  Lum_TdmBlock *m_pTop = nullptr;
+};
+
+// Refused creations name the right object and create no child.
+TEST_F(TdmCallerTest, RefusedCreationsCreateNothing) {
+  EXPECT_EQ(Failure([&] { m_pTop->CreateTypedBlock("u", nullptr, true, true); }),
+            "InvalidTypeBlock|top|Null type block specified in CreateTypedBlock.");
+  EXPECT_EQ(Failure([&] { m_pTop->CreateUntypedBlock("u", nullptr); }),
+            "InvalidTypeBlock|top|Null type block specified in CreateUntypedBlock.");
+  EXPECT_EQ(Failure([&] { m_pTop->CreateTypedBlock("u", m_pForeign, true, true); }),
+            "CorruptDatabase|AND|Could not locate the specified library.");
+  EXPECT_TRUE(m_pTop->GetBlocks().empty());
+  EXPECT_EQ(Model().m_Hooks, "");
+}
+
+// The pins flag gives one bound pin per type pin in type order, or none; the
+// child is typed either way and InitTypeBlock ran once per child.
+TEST_F(TdmCallerTest, TypedChildPins) {
+  Lum_TdmBlock *with = m_pTop->CreateTypedBlock("with", m_pReg, false, true);
+  Lum_TdmBlock *without = m_pTop->CreateTypedBlock("without", m_pReg, false, false);
+  Lum_TdmBlock *empty = m_pTop->CreateTypedBlock("empty", m_pEmpty, true, true);
+  Lum_TdmBlock *untypedEmpty = m_pTop->CreateUntypedBlock("uempty", m_pEmpty);
+  EXPECT_EQ(PinText(with), "D0,D1,CLK,Q");
+  EXPECT_EQ(with->GetPinByName("Q")->GetDirection(), Orb_Pin::PIN_OUTPUT);
+  EXPECT_EQ(with->GetPin(0)->GetTypePin(), m_pReg->GetPin(0));
+  EXPECT_EQ(PinText(without), "");
+  EXPECT_EQ(PinText(empty), "");
+  EXPECT_EQ(PinText(untypedEmpty), "");
+  EXPECT_EQ(without->GetTypeBlock(), m_pReg);
+  EXPECT_EQ(empty->GetTypeBlock(), m_pEmpty);
+  EXPECT_EQ(untypedEmpty->GetTypeBlock(), nullptr);
+  EXPECT_EQ(Model().m_Inits, 3);
+  EXPECT_EQ(Model().m_Hooks, "") << "no hierarchy grafted";
+}
+
+// The hooks run around a graft only: typed register, cleanup, unregister;
+// untyped (always grafting) register, unregister.
+TEST_F(TdmCallerTest, GraftHooksInOrder) {
+  struct Case {
+    char const *what;
+    std::function<void(Lum_TdmBlock *)> create;
+    char const *hooks;
+  };
+  std::vector<Case> const cases{
+      {"typed, graft", [&](Lum_TdmBlock *top) { top->CreateTypedBlock("u", m_pReg, true, false); },
+       "register,cleanup,unregister,"},
+      {"typed, no graft",
+       [&](Lum_TdmBlock *top) { top->CreateTypedBlock("u", m_pReg, false, true); }, ""},
+      {"typed, no hierarchy",
+       [&](Lum_TdmBlock *top) { top->CreateTypedBlock("u", m_pAnd, true, true); }, ""},
+      {"untyped", [&](Lum_TdmBlock *top) { top->CreateUntypedBlock("u", m_pReg); },
+       "register,unregister,"},
+      {"untyped, no hierarchy", [&](Lum_TdmBlock *top) { top->CreateUntypedBlock("u", m_pAnd); },
+       ""},
+  };
+  for (Case const &c : cases) {
+    Model().m_Hooks.clear();
+    Lum_TdmBlock *top = m_Design.m_pView->GetBlock();
+    c.create(top);
+    EXPECT_EQ(Model().m_Hooks, c.hooks) << c.what;
+    top->DeleteBlock(top->GetBlocks().front());
+  }
+}
+
+// A graft that fails part way (a name already taken under the child) lets
+// the host's exception out, unregistered, and the child stays.
+TEST_F(TdmCallerTest, FailedGraftUnregisters) {
+  Model().m_SignalOnInit = "n1";
+  EXPECT_THROW(m_pTop->CreateTypedBlock("u", m_pReg, true, true), Orb_Exception);
+  EXPECT_EQ(Model().m_Hooks, "register,unregister,");
+  ASSERT_EQ(m_pTop->GetBlocks().size(), 1u);
+  EXPECT_EQ(PinText(m_pTop->GetBlock(0)), "D0,D1,CLK,Q");
+}
+
+// After a typed graft nothing under the child has a client until it is
+// reached again; the grafted a1 then binds from its copied type.
+TEST_F(TdmCallerTest, GraftedObjectsAreBoundAfresh) {
+  Lum_TdmBlock *u = m_pTop->CreateTypedBlock("u", m_pReg, true, true);
+  Lum_TdmModel &model = Model();
+  EXPECT_EQ(model.GetClient(u->GetOrbBlock()), u);
+  for (Orb_Pin const *pin : u->GetPins())
+    EXPECT_NE(model.GetClient(pin), nullptr) << "the child's own pin " << pin->GetName();
+  ASSERT_EQ(u->GetSignals().size(), 1u);
+  Orb_Signal const *n1 = u->GetSignals().front();
+  ASSERT_NE(n1->GetNetwork(), nullptr);
+  EXPECT_EQ(model.GetClient(n1), nullptr);
+  EXPECT_EQ(model.GetClient(n1->GetNetwork()), nullptr);
+  Orb_Block const *a1 = u->GetOrbBlock()->GetBlocks().front();
+  EXPECT_EQ(model.GetClient(a1), nullptr);
+  EXPECT_EQ(model.GetClient(a1->GetPins().front()), nullptr);
+
+  Lum_TdmBlock *reached = u->GetBlockByName("a1");
+  EXPECT_EQ(reached->GetTypeBlock(), m_pAnd);
+  EXPECT_EQ(PinText(reached), "A,B,Y") << "the missing pins come with the binding";
+  EXPECT_NE(u->GetSignal(0)->GetNetwork(), nullptr);
+}
+
+// The caller wires the new child outside; its grafted inside stays, and both
+// sides and the binding survive commit, save and reopen. Two children of one
+// type block get separate inner networks.
+TEST_F(TdmCallerTest, WiredTypedChildrenSurviveReopen) {
+  Lum_TdmBlock *u1 = m_pTop->CreateTypedBlock("u1", m_pReg, true, true);
+  Lum_TdmBlock *u2 = m_pTop->CreateTypedBlock("u2", m_pReg, true, true);
+  Orb_Signal *wire = m_pTop->CreateSignal("w")->GetOrbSignal();
+  u1->GetPinByName("D0")->GetOrbPin()->Connect(wire);
+  u2->GetPinByName("D0")->GetOrbPin()->Connect(wire);
+  m_Design.m_pView->CommitAll();
+
+  auto reopened = SaveAndReopen(Model(), m_Dir.File("wired.odb"));
+  Lum_TdmBlock *top = FirstView(*reopened)->GetBlock();
+  std::vector<Orb_Network const *> inner;
+  for (char const *name : {"u1", "u2"}) {
+    Lum_TdmBlock *child = top->GetBlockByName(name);
+    ASSERT_NE(child, nullptr) << name;
+    EXPECT_EQ(child->GetTypeBlock(), m_pReg) << name;
+    EXPECT_EQ(PinText(child), "D0,D1,CLK,Q") << name;
+    Orb_Pin const *d0 = child->GetPinByName("D0")->GetOrbPin();
+    ASSERT_NE(d0->GetSignal(), nullptr) << name;
+    EXPECT_STREQ(d0->GetSignal()->GetName(), "w") << name;
+    ASSERT_NE(d0->GetInnerSignal(), nullptr) << name;
+    EXPECT_STREQ(d0->GetInnerSignal()->GetName(), "n1") << name;
+    inner.push_back(d0->GetInnerSignal()->GetNetwork());
+    EXPECT_EQ(child->GetBlockByName("a1")->GetTypeBlock(), m_pAnd) << name;
+  }
+  ASSERT_NE(inner[0], nullptr);
+  EXPECT_NE(inner[0], inner[1]);
+}
+
+// An untyped copy: the type's pins with their properties but no type pins,
+// the hierarchy, and where it came from.
+TEST_F(TdmCallerTest, UntypedCopy) {
+  Lum_TdmBlock *u = m_pTop->CreateUntypedBlock("u", m_pReg);
+  EXPECT_EQ(u->GetTypeBlock(), nullptr);
+  EXPECT_EQ(PinText(u), "D0!,D1!,CLK!,Q!");
+  EXPECT_EQ(u->GetPinByName("Q")->GetDirection(), Orb_Pin::PIN_OUTPUT);
+  EXPECT_EQ(PropertyValue(u->GetPinByName("D0"), "LOC"), "P1");
+  EXPECT_EQ(PropertyValue(u->GetPinByName("D1"), "LOC"), "<absent>");
+  EXPECT_NE(u->GetBlockByName("a1"), nullptr);
+  std::string const association = PropertyValue(u, "TDS_LIBRARY_ASSOC");
+  EXPECT_TRUE(std::regex_match(association,
+                               std::regex("LIBC:REG \\d{4}-\\d\\d-\\d\\dT\\d\\d:\\d\\d:\\d\\dZ")))
+      << association;
+  EXPECT_EQ(Model().m_Inits, 0);
+  m_Design.m_pView->CommitAll();
+  EXPECT_EQ(PropertyValue(u, "TDS_LIBRARY_ASSOC"), association) << "a commit keeps it";
 }
 
 } // namespace
