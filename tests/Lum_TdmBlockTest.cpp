@@ -830,4 +830,195 @@ TEST_F(TdmCallerTest, UntypedCopy) {
   EXPECT_EQ(PropertyValue(u, "TDS_LIBRARY_ASSOC"), association) << "a commit keeps it";
 }
 
+// Rebinding. Besides the fixture's: OLD (B, A), OLD2 (R), MAPT (P, Q, R),
+// AND2 (A, B, Y, Z) and TGT (A, BB, Y), all in LIBC.
+class TdmRebindTest : public TdmCallerTest {
+protected:
+  TdmRebindTest() {
+    m_pOld = m_Library.AddTypeBlock("OLD", {"B", "A"});
+    m_pOld2 = m_Library.AddTypeBlock("OLD2", {"R"});
+    m_pMapt = m_Library.AddTypeBlock("MAPT", {"P", "Q", "R"});
+    m_pAnd2 = m_Library.AddTypeBlock("AND2", {"A", "B", "Y", "Z"});
+    m_pTgt = m_Library.AddTypeBlock("TGT", {"A", "BB", "Y"});
+    m_pWire = m_pTop->CreateSignal("s")->GetOrbSignal();
+  }
+
+  // A child of AND with its pins, A connected.
+  Lum_TdmBlock *AndChild(char const *name = "v") {
+    Lum_TdmBlock *child = m_pTop->CreateTypedBlock(name, m_pAnd, false, true);
+    child->GetPinByName("A")->GetOrbPin()->Connect(m_pWire);
+    return child;
+  }
+
+  // The block's type block, then each pin as name=typeblock.typepin (or
+  // name=- without one), in host order.
+  static std::string State(Lum_TdmBlock const *block) {
+    Lum_TlmBlock const *type = block->GetTypeBlock();
+    std::string text = type ? type->GetName() : "-";
+    for (std::size_t i = 0; i < block->GetPins().size(); ++i) {
+      Lum_TdmPin const *pin = block->GetPin(i);
+      Lum_TlmPin const *typePin = pin->GetTypePin();
+      text +=
+          std::string(" ") + pin->GetName() + "=" +
+          (typePin ? std::string(typePin->GetParent()->GetName()) + "." + typePin->GetName() : "-");
+    }
+    return text;
+  }
+
+  static Lum_TdmTypePinMap Map(std::vector<std::pair<char const *, Lum_TlmPin const *>> const &e) {
+    Lum_TdmTypePinMap map;
+    for (auto const &[name, typePin] : e)
+      map.SetPinMap(Port::StringBase<char>(name), typePin);
+    return map;
+  }
+
+  Lum_TlmBlock *m_pOld = nullptr;
+  Lum_TlmBlock *m_pOld2 = nullptr;
+  Lum_TlmBlock *m_pMapt = nullptr;
+  Lum_TlmBlock *m_pAnd2 = nullptr;
+  Lum_TlmBlock *m_pTgt = nullptr;
+  Orb_Signal *m_pWire = nullptr;
+};
+
+// The current type block again, or null on an untyped block, does nothing in
+// either form, even when the pins would not match.
+TEST_F(TdmRebindTest, SameBindingDoesNothing) {
+  Lum_TdmBlock *v = AndChild();
+  v->CreatePin("X", Orb_Pin::PIN_INPUT)->GetOrbPin()->Connect(m_pWire);
+  Lum_TdmBlock *plain = m_pTop->CreateBlock("plain", 0);
+  plain->CreatePin("Q", Orb_Pin::PIN_INPUT);
+  std::string const before = State(v);
+  int const inits = Model().m_Inits;
+  v->SetTypeBlock(m_pAnd);
+  v->SetTypeBlock(m_pAnd, Lum_TdmTypePinMap());
+  plain->SetTypeBlock(nullptr);
+  plain->SetTypeBlock(nullptr, Lum_TdmTypePinMap());
+  EXPECT_EQ(State(v), before);
+  EXPECT_EQ(State(plain), "- Q=-");
+  EXPECT_EQ(Model().m_Inits, inits);
+}
+
+// Null on a typed block, in either form, clears the block and every pin,
+// calls InitTypeBlock once, and the next commit drops the stored typing.
+TEST_F(TdmRebindTest, NullUnbinds) {
+  for (bool withMap : {false, true}) {
+    Lum_TdmBlock *v = AndChild(withMap ? "m" : "a");
+    m_Design.m_pView->CommitAll();
+    ASSERT_EQ(PropertyValue(v, "TDS_BLOCK_TYPE"), "LIBC:AND");
+    int const inits = Model().m_Inits;
+    if (withMap)
+      v->SetTypeBlock(nullptr, Lum_TdmTypePinMap());
+    else
+      v->SetTypeBlock(nullptr);
+    EXPECT_EQ(State(v), "- A=- B=- Y=-") << withMap;
+    EXPECT_EQ(Model().m_Inits, inits + 1) << withMap;
+    m_Design.m_pView->CommitAll();
+    EXPECT_EQ(PropertyValue(v, "TDS_BLOCK_TYPE"), "<absent>") << withMap;
+  }
+}
+
+// Each refusal names its object and leaves the block exactly as it was: its
+// type block, every pin's type pin, no pin created by the call, no
+// InitTypeBlock.
+TEST_F(TdmRebindTest, FailuresChangeNothing) {
+  struct Case {
+    char const *what;
+    std::function<Lum_TdmBlock *()> setup;
+    std::function<void(Lum_TdmBlock *)> rebind;
+    std::string failure;
+  };
+  auto andChild = [this] { return AndChild(); };
+  std::vector<Case> const cases{
+      {"alone, unlisted library", andChild, [&](Lum_TdmBlock *v) { v->SetTypeBlock(m_pForeign); },
+       "InvalidTypeBlock|AND|Could not resolve the Type Block."},
+      {"alone, connected pin missing", andChild, [&](Lum_TdmBlock *v) { v->SetTypeBlock(m_pReg); },
+       "InvalidTypeBlock|REG|Could not resolve the Type Block."},
+      {"map, unlisted library", andChild,
+       [&](Lum_TdmBlock *v) { v->SetTypeBlock(m_pForeign, Lum_TdmTypePinMap()); },
+       "CorruptDatabase|AND|Could not locate the specified library."},
+      {"map, connected pin missing", andChild,
+       [&](Lum_TdmBlock *v) { v->SetTypeBlock(m_pReg, Lum_TdmTypePinMap()); },
+       "CorruptDatabase|REG|Could not locate the specified library."},
+      {"map, more entries than pins", andChild,
+       [&](Lum_TdmBlock *v) {
+         v->SetTypeBlock(m_pAnd2, Map({{"A", m_pAnd2->GetPinByName("A")},
+                                       {"B", m_pAnd2->GetPinByName("B")},
+                                       {"Y", m_pAnd2->GetPinByName("Y")},
+                                       {"Z", m_pAnd2->GetPinByName("Z")}}));
+       },
+       "CorruptDatabase|AND2|The specified pin map has more pins then the library block."},
+      {"map, pin of another type block", andChild,
+       [&](Lum_TdmBlock *v) {
+         v->SetTypeBlock(m_pAnd2, Map({{"A", m_pAnd2->GetPinByName("A")},
+                                       {"B", m_pAnd->GetPinByName("B")},
+                                       {"Y", m_pAnd2->GetPinByName("Y")}}));
+       },
+       "CorruptDatabase|B|Invalid type pin specified in type pin map."},
+      {"map, pin unmapped", andChild,
+       [&](Lum_TdmBlock *v) {
+         v->SetTypeBlock(
+             m_pAnd2, Map({{"A", m_pAnd2->GetPinByName("A")}, {"Y", m_pAnd2->GetPinByName("Y")}}));
+       },
+       "CorruptDatabase|B|Invalid type pin specified in type pin map."},
+      {"alone, matching fails after a pin was rebound",
+       [&] {
+         Lum_TdmBlock *v = m_pTop->CreateTypedBlock("v", m_pOld, false, true);
+         v->GetPinByName("A")->GetOrbPin()->Connect(m_pWire);
+         v->CreatePropertyList("TDS_BLOCK_PIN_MAP")->CreatePropertyString("A", "ZZ");
+         return v;
+       },
+       [&](Lum_TdmBlock *v) { v->SetTypeBlock(m_pAnd); },
+       "CorruptDatabase|A|Could not locate the specified pin."},
+      {"alone, matching fails after a pin was created",
+       [&] {
+         Lum_TdmBlock *v = m_pTop->CreateTypedBlock("v", m_pOld2, false, true);
+         v->CreatePropertyList("TDS_BLOCK_PIN_MAP")->CreatePropertyString("R", "P");
+         return v;
+       },
+       [&](Lum_TdmBlock *v) { v->SetTypeBlock(m_pMapt); },
+       "CorruptDatabase|top|While trying to patch up design block <v> with new type pin <R>\nof "
+       "type block <MAPT>, found that the block already had a pin by that\nname.  This could "
+       "have been due to an earlier and inappropriate\nclient call to pin->SetName().\n"},
+  };
+  for (Case const &c : cases) {
+    Lum_TdmBlock *v = c.setup();
+    std::string const before = State(v);
+    int const inits = Model().m_Inits;
+    EXPECT_EQ(Failure([&] { c.rebind(v); }), c.failure) << c.what;
+    EXPECT_EQ(State(v), before) << c.what;
+    EXPECT_EQ(Model().m_Inits, inits) << c.what;
+    m_pTop->DeleteBlock(v->GetOrbBlock());
+  }
+}
+
+// An unconnected pin that the type block lacks passes the check and ends
+// without a type pin.
+TEST_F(TdmRebindTest, UnconnectedExtraPinPasses) {
+  Lum_TdmBlock *v = AndChild();
+  v->CreatePin("X", Orb_Pin::PIN_INPUT);
+  v->SetTypeBlock(m_pAnd2);
+  EXPECT_EQ(State(v), "AND2 A=AND2.A B=AND2.B Y=AND2.Y X=-");
+}
+
+// A rebinding through a map reaches the store at the next commit and comes
+// back from a reopen; so does one through the stored map alone.
+TEST_F(TdmRebindTest, RebindingSurvivesReopen) {
+  Lum_TdmBlock *v = AndChild("v");
+  v->SetTypeBlock(m_pTgt, Map({{"A", m_pTgt->GetPinByName("A")},
+                               {"B", m_pTgt->GetPinByName("BB")},
+                               {"Y", m_pTgt->GetPinByName("Y")}}));
+  Lum_TdmBlock *w = AndChild("w");
+  w->SetTypeBlock(m_pAnd2);
+  Lum_TdmBlock *empty = m_pTop->CreateBlock("empty", 0);
+  int const inits = Model().m_Inits;
+  empty->SetTypeBlock(m_pEmpty, Lum_TdmTypePinMap());
+  EXPECT_EQ(Model().m_Inits, inits + 1);
+  m_Design.m_pView->CommitAll();
+  auto reopened = SaveAndReopen(Model(), m_Dir.File("rebound.odb"));
+  Lum_TdmBlock *top = FirstView(*reopened)->GetBlock();
+  EXPECT_EQ(State(top->GetBlockByName("v")), "TGT A=TGT.A B=TGT.BB Y=TGT.Y");
+  EXPECT_EQ(State(top->GetBlockByName("w")), "AND2 A=AND2.A B=AND2.B Y=AND2.Y Z=AND2.Z");
+  EXPECT_EQ(State(top->GetBlockByName("empty")), "EMPTY");
+}
+
 } // namespace
