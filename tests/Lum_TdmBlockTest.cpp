@@ -1021,4 +1021,133 @@ TEST_F(TdmRebindTest, RebindingSurvivesReopen) {
   EXPECT_EQ(State(top->GetBlockByName("empty")), "EMPTY");
 }
 
+// The names of blocks, joined with ",".
+template <class Block> std::string Names(std::vector<Block *> const &blocks) {
+  std::string text;
+  for (Block *block : blocks)
+    text += (text.empty() ? "" : ",") + std::string(block->GetName());
+  return text;
+}
+
+// Queries over children u1 (REG), u2 (AND), u3 (untyped), u4 (REG), and REG
+// as a second client model of the library's host model sees it.
+class TdmQueryTest : public TdmCallerTest {
+protected:
+  TdmQueryTest() : m_Second(m_pReg->GetClientOrbModel()->GetOrbModel()) {
+    m_pU1 = m_pTop->CreateTypedBlock("u1", m_pReg, false, true);
+    m_pTop->CreateTypedBlock("u2", m_pAnd, false, true);
+    m_pTop->CreateBlock("u3", 0);
+    m_pTop->CreateTypedBlock("u4", m_pReg, false, false);
+    m_pSecondReg = m_Second.GetLibrary()->GetTypeBlock(Port::StringBase<char>("REG"));
+  }
+
+  Lum_TlmModel m_Second;
+  Lum_TlmBlock const *m_pSecondReg = nullptr;
+  Lum_TdmBlock *m_pU1 = nullptr;
+};
+
+// Children by type block, by identifier, in both forms and both twins.
+TEST_F(TdmQueryTest, ChildBlocksOfType) {
+  Lum_TdmBlock const *top = m_pTop;
+  ASSERT_NE(m_pSecondReg, nullptr);
+  ASSERT_NE(m_pSecondReg, m_pReg);
+  // The returning form matches by host block, so another model's REG too.
+  EXPECT_EQ(Names(m_pTop->GetChildBlocksOfType(m_pReg)), "u1,u4");
+  EXPECT_EQ(Names(m_pTop->GetChildBlocksOfType(m_pSecondReg)), "u1,u4");
+  EXPECT_EQ(Names(top->GetChildBlocksOfType(m_pSecondReg)), "u1,u4");
+  EXPECT_EQ(Names(m_pTop->GetChildBlocksOfType(nullptr)), "u3");
+  EXPECT_EQ(Names(top->GetChildBlocksOfType(nullptr)), "u3");
+  EXPECT_TRUE(m_pU1->GetChildBlocksOfType(m_pReg).empty());
+
+  // The filling form matches the very object and appends.
+  std::vector<Lum_TdmBlock *> blocks{m_pU1};
+  m_pTop->GetChildBlocksOfType(m_pSecondReg, blocks);
+  EXPECT_EQ(Names(blocks), "u1");
+  m_pTop->GetChildBlocksOfType(m_pReg, blocks);
+  m_pTop->GetChildBlocksOfType(nullptr, blocks);
+  m_pTop->GetChildBlocksOfType(Lum_TlmBlockTypeID("LIBC", "AND"), blocks);
+  EXPECT_EQ(Names(blocks), "u1,u1,u4,u3,u2");
+  std::vector<Lum_TdmBlock const *> constBlocks;
+  top->GetChildBlocksOfType(m_pReg, constBlocks);
+  top->GetChildBlocksOfType(Lum_TlmBlockTypeID(), constBlocks);
+  top->GetChildBlocksOfType(m_pSecondReg, constBlocks);
+  EXPECT_EQ(Names(constBlocks), "u1,u4,u3");
+
+  Lum_TlmBlockTypeID const reg("LIBC", "REG");
+  EXPECT_EQ(m_pTop->GetFirstChildBlockOfType(reg), m_pU1);
+  EXPECT_EQ(m_pTop->GetChildBlockOfType(reg), m_pU1);
+  EXPECT_EQ(top->GetFirstChildBlockOfType(reg), m_pU1);
+  EXPECT_EQ(top->GetChildBlockOfType(Lum_TlmBlockTypeID())->GetName(), std::string("u3"));
+  EXPECT_EQ(m_pTop->GetChildBlockOfType(Lum_TlmBlockTypeID("LIBC", "EMPTY")), nullptr);
+  EXPECT_EQ(m_pU1->GetFirstChildBlockOfType(reg), nullptr);
+}
+
+// Pins by type pin (null: the first untyped one) and by identifier.
+TEST_F(TdmQueryTest, PinOfType) {
+  Lum_TdmPin *extra = m_pU1->CreatePin("X", Orb_Pin::PIN_INPUT);
+  Lum_TdmBlock const *u1 = m_pU1;
+  EXPECT_EQ(m_pU1->GetPinOfType(static_cast<Lum_TlmPin const *>(nullptr)), extra);
+  EXPECT_EQ(u1->GetPinOfType(static_cast<Lum_TlmPin const *>(nullptr)), extra);
+  EXPECT_EQ(m_pU1->GetPinOfType(m_pReg->GetPinByName("CLK")), m_pU1->GetPinByName("CLK"));
+  EXPECT_EQ(u1->GetPinOfType(Lum_TlmPinTypeID("LIBC", "REG", "Q")), m_pU1->GetPinByName("Q"));
+  EXPECT_EQ(m_pU1->GetPinOfType(Lum_TlmPinTypeID("LIBC", "AND", "A")), nullptr);
+  Lum_TdmBlock *u2 = m_pTop->GetBlockByName("u2");
+  EXPECT_EQ(u2->GetPinOfType(static_cast<Lum_TlmPin const *>(nullptr)), nullptr) << "all typed";
+  EXPECT_EQ(m_pTop->GetPinOfType(Lum_TlmPinTypeID()), nullptr) << "no pins";
+}
+
+// The block's own type: as resolved in a context, as a host block, by
+// identifier.
+TEST_F(TdmQueryTest, OwnType) {
+  Lum_TdmBlock const *u3 = m_pTop->GetBlockByName("u3");
+  EXPECT_EQ(m_pU1->GetTypeBlock(m_pReg->GetContext()), m_pReg);
+  EXPECT_EQ(m_pU1->GetTypeBlock(&m_Second), m_pSecondReg);
+  EXPECT_EQ(Failure([&] { m_pU1->GetTypeBlock(&Model()); }),
+            "InvalidTypeBlock|u1|Could not resolve the Type Block.");
+  EXPECT_EQ(u3->GetTypeBlock(&Model()), nullptr) << "untyped: nothing to resolve";
+  EXPECT_EQ(m_pU1->GetNativeTypeBlock(), m_pReg->GetOrbBlock());
+  EXPECT_EQ(u3->GetNativeTypeBlock(), nullptr);
+  EXPECT_TRUE(m_pU1->IsTypeOf(Lum_TlmBlockTypeID("LIBC", "REG")));
+  EXPECT_FALSE(m_pU1->IsTypeOf(Lum_TlmBlockTypeID()));
+  EXPECT_TRUE(u3->IsTypeOf(Lum_TlmBlockTypeID()));
+}
+
+// Manifestation creates the missing typed pins and sorts, only for a typed
+// block with fewer pins than its type; NormalizePins only sorts.
+TEST_F(TdmCallerTest, ManifestAllTypedPins) {
+  struct Case {
+    char const *what;
+    Lum_TlmBlock const *type;
+    std::vector<char const *> pins; // a pin named like a REG pin gets that type pin
+    bool manifested;
+    char const *after;
+  };
+  std::vector<Case> const cases{
+      {"untyped", nullptr, {"Z", "A"}, false, "Z!,A!"},
+      {"as many pins, other names", m_pReg, {"Z", "Y", "X", "W"}, false, "Z!,Y!,X!,W!"},
+      {"fewer pins", m_pReg, {"X", "Q"}, true, "CLK,D0,D1,Q,X!"},
+      {"no pins", m_pReg, {}, true, "CLK,D0,D1,Q"},
+  };
+  for (Case const &c : cases) {
+    Lum_TdmBlock *u =
+        c.type ? m_pTop->CreateTypedBlock("u", c.type, false, false) : m_pTop->CreateBlock("u", 0);
+    for (char const *name : c.pins)
+      u->CreatePin(name, Orb_Pin::PIN_OUTPUT)->SetTypePin(m_pReg->GetPinByName(name));
+    EXPECT_EQ(u->ManifestAllTypedPins(), c.manifested) << c.what;
+    EXPECT_EQ(PinText(u), c.after) << c.what;
+    if (c.manifested) {
+      EXPECT_EQ(u->GetPinByName("CLK")->GetTypePin(), m_pReg->GetPinByName("CLK")) << c.what;
+      EXPECT_EQ(u->GetPinByName("D0")->GetDirection(), Orb_Pin::PIN_INPUT) << c.what;
+    }
+    m_pTop->DeleteBlock(u->GetOrbBlock());
+  }
+
+  m_pTop->NormalizePins();
+  EXPECT_EQ(PinText(m_pTop), "");
+  for (char const *name : {"b", "B", "a"})
+    m_pTop->CreatePin(name, Orb_Pin::PIN_INPUT);
+  m_pTop->NormalizePins();
+  EXPECT_EQ(PinText(m_pTop), "B!,a!,b!");
+}
+
 } // namespace
