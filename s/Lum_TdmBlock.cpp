@@ -556,9 +556,14 @@ std::vector<Lum_TdmBlock *> Lum_TdmBlock::GetChildBlocksOfType(Lum_TlmBlock cons
 
 std::vector<Lum_TdmBlock const *>
 Lum_TdmBlock::GetChildBlocksOfType(Lum_TlmBlock const *typeBlock) const {
-  std::vector<Lum_TdmBlock *> const found =
-      const_cast<Lum_TdmBlock *>(this)->GetChildBlocksOfType(typeBlock);
-  return std::vector<Lum_TdmBlock const *>(found.begin(), found.end());
+  Orb_Block const *typeHost = typeBlock ? typeBlock->GetOrbBlock() : nullptr;
+  std::vector<Lum_TdmBlock const *> blocks;
+  FindChild(this, [typeHost, &blocks](Lum_TdmBlock const *child) {
+    if (child->GetNativeTypeBlock() == typeHost)
+      blocks.push_back(child);
+    return false;
+  });
+  return blocks;
 }
 
 Lum_TdmPin const *Lum_TdmBlock::GetPinOfType(Lum_TlmPinTypeID const &typeId) const {
