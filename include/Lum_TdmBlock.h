@@ -183,6 +183,9 @@ private:
   void ReconcilePins(Lum_TlmBlock const *typeBlock);
   // Puts the pins in name order.
   void SortPinsByName();
+  // Whether the type block belongs to one of the view's libraries (which
+  // builds the view's list if needed).
+  bool IsOfViewLibrary(Lum_TlmBlock const *typeBlock) const;
   // Throws Lum_ExceptionCorruptDatabase (type block's name) when the type
   // block belongs to no library of the view, or a connected pin has no type
   // pin of its name. Changes nothing.

@@ -87,28 +87,38 @@ template <class Visit> Lum_TdmPin *FindPin(Lum_TdmBlock const *block, Visit cons
 }
 
 // Destroys the clients that `context` holds for what a graft put under
-// `block` (its signals with their networks, its child blocks with their pins,
-// all the way down), so that each is specialized afresh, and bound from its
-// copied properties, when next reached. The block and its own pins keep
+// `block`, so that each is specialized afresh, and bound from its copied
+// properties, when next reached: the block's signals with their networks,
+// then each child block's pins and the child itself, followed at once by the
+// child's own contents, in host order. The block and its own pins keep
 // theirs. Walks with a stack of its own, as a hierarchy may be deep.
 void DiscardGraftedClients(Orb_Block const *block, Orb_Context *context) {
-  std::vector<Orb_Block const *> pending{block};
-  while (!pending.empty()) {
-    Orb_Block const *current = pending.back();
-    pending.pop_back();
-    for (Orb_Signal const *signal : current->GetSignals()) {
+  struct Frame {
+    Orb_Block const *block;
+    std::size_t nextChild;
+  };
+  std::vector<Frame> stack;
+  auto enter = [&stack, context](Orb_Block const *entered) {
+    for (Orb_Signal const *signal : entered->GetSignals()) {
       delete context->GetClient(signal);
       if (Orb_Network const *network = signal->GetNetwork())
         delete context->GetClient(network);
     }
-    std::vector<Orb_Block *> const &children = current->GetBlocks();
-    // Reversed onto the stack so that children are handled in host order.
-    for (std::size_t i = children.size(); i-- > 0;) {
-      for (Orb_Pin const *pin : children[i]->GetPins())
-        delete context->GetClient(pin);
-      delete context->GetClient(children[i]);
-      pending.push_back(children[i]);
+    stack.push_back(Frame{entered, 0});
+  };
+  enter(block);
+  while (!stack.empty()) {
+    Frame &frame = stack.back();
+    std::vector<Orb_Block *> const &children = frame.block->GetBlocks();
+    if (frame.nextChild == children.size()) {
+      stack.pop_back();
+      continue;
     }
+    Orb_Block const *child = children[frame.nextChild++];
+    for (Orb_Pin const *pin : child->GetPins())
+      delete context->GetClient(pin);
+    delete context->GetClient(child);
+    enter(child);
   }
 }
 
@@ -282,16 +292,22 @@ void Lum_TdmBlock::SortPinsByName() {
 // ---------------------------------------------------------------------------
 // Creating children from type blocks
 
+bool Lum_TdmBlock::IsOfViewLibrary(Lum_TlmBlock const *typeBlock) const {
+  // A type block belongs to the library that shares its client model.
+  Orb_ModelDerived const *typeModel = typeBlock->GetClientOrbModel();
+  std::vector<Lum_TlmLibrary const *> const &libraries = GetView()->GetLibraryList();
+  return std::any_of(libraries.begin(), libraries.end(),
+                     [typeModel](Lum_TlmLibrary const *library) {
+                       return library && library->GetClientOrbModel() == typeModel;
+                     });
+}
+
 Lum_TdmBlock *Lum_TdmBlock::CreateTypedBlock(char const *name, Lum_TlmBlock const *typeBlock,
                                              bool graft, bool pins) {
   if (!typeBlock)
     throw Lum_ExceptionInvalidTypeBlock("Lum", kSourcePath, kRevision, __LINE__, GetName(),
                                         "Null type block specified in CreateTypedBlock.", false);
-  Orb_ModelDerived const *typeModel = typeBlock->GetClientOrbModel();
-  std::vector<Lum_TlmLibrary const *> const &libraries = GetView()->GetLibraryList();
-  if (std::none_of(libraries.begin(), libraries.end(), [typeModel](Lum_TlmLibrary const *library) {
-        return library && library->GetClientOrbModel() == typeModel;
-      }))
+  if (!IsOfViewLibrary(typeBlock))
     throw Lum_ExceptionCorruptDatabase("Lum", kSourcePath, kRevision, __LINE__,
                                        typeBlock->GetName(),
                                        "Could not locate the specified library.", false);
@@ -358,11 +374,7 @@ Lum_TdmBlock *Lum_TdmBlock::CreateUntypedBlock(char const *name, Lum_TlmBlock co
 
 void Lum_TdmBlock::VerifyTypeBlock(Lum_TlmBlock const *typeBlock) const {
   assert(typeBlock && "VerifyTypeBlock needs a type block");
-  Orb_ModelDerived const *typeModel = typeBlock->GetClientOrbModel();
-  std::vector<Lum_TlmLibrary const *> const &libraries = GetView()->GetLibraryList();
-  if (std::none_of(libraries.begin(), libraries.end(), [typeModel](Lum_TlmLibrary const *library) {
-        return library && library->GetClientOrbModel() == typeModel;
-      }))
+  if (!IsOfViewLibrary(typeBlock))
     throw Lum_ExceptionCorruptDatabase("Lum", kSourcePath, kRevision, __LINE__,
                                        typeBlock->GetName(),
                                        "Could not locate the specified library.", false);
