@@ -484,11 +484,14 @@ Lum_TlmBlock const *Lum_TdmBlock::GetTypeBlock(Orb_Context const *context) const
   Orb_Block const *typeHost = m_pTypeBlock->GetOrbBlock();
   if (!typeHost)
     return nullptr;
-  Orb_BlockDerived const *resolved = Orb_BlockDerived::OrbResolve(context, typeHost);
+  // A context whose client of that block is no type block (another kind of
+  // client model over the library) cannot resolve it either.
+  auto const *resolved =
+      dynamic_cast<Lum_TlmBlock const *>(Orb_BlockDerived::OrbResolve(context, typeHost));
   if (!resolved)
     throw Lum_ExceptionInvalidTypeBlock("Lum", kSourcePath, kRevision, __LINE__, GetName(),
                                         "Could not resolve the Type Block.", false);
-  return static_cast<Lum_TlmBlock const *>(resolved);
+  return resolved;
 }
 
 Orb_Block const *Lum_TdmBlock::GetNativeTypeBlock() const {

@@ -1104,6 +1104,13 @@ TEST_F(TdmQueryTest, OwnType) {
   EXPECT_EQ(m_pU1->GetTypeBlock(&m_Second), m_pSecondReg);
   EXPECT_EQ(Failure([&] { m_pU1->GetTypeBlock(&Model()); }),
             "InvalidTypeBlock|u1|Could not resolve the Type Block.");
+  Lum_TdmModel designClients(m_pReg->GetClientOrbModel()->GetOrbModel());
+  ASSERT_NE(designClients.Specialize(m_pReg->GetOrbBlock()), nullptr);
+  EXPECT_EQ(Failure([&] { m_pU1->GetTypeBlock(&designClients); }),
+            "InvalidTypeBlock|u1|Could not resolve the Type Block.")
+      << "its client there is no type block";
+  EXPECT_EQ(Failure([&] { m_pU1->GetTypeBlock(nullptr); }),
+            "InvalidTypeBlock|u1|Could not resolve the Type Block.");
   EXPECT_EQ(u3->GetTypeBlock(&Model()), nullptr) << "untyped: nothing to resolve";
   EXPECT_EQ(m_pU1->GetNativeTypeBlock(), m_pReg->GetOrbBlock());
   EXPECT_EQ(u3->GetNativeTypeBlock(), nullptr);
