@@ -105,7 +105,8 @@ public:
   // The type block as specialized in `context` (the client there of its host
   // block), or null for an untyped block. Throws
   // Lum_ExceptionInvalidTypeBlock with this block's name when the host block
-  // has no client in that context.
+  // has no client in that context, or one that is no type block (a null
+  // context resolves nothing).
   Lum_TlmBlock const *GetTypeBlock(Orb_Context const *context) const;
   // The type block's host block, or null for an untyped block.
   Orb_Block const *GetNativeTypeBlock() const;
