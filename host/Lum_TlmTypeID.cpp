@@ -9,8 +9,14 @@ Lum_TlmBlockTypeID::Lum_TlmBlockTypeID(char const *libraryName, char const *type
 bool Lum_TlmBlockTypeID::RepresentsTypeBlock(Lum_TlmBlock const *typeBlock) const {
   if (!m_Named || !typeBlock)
     return !m_Named && !typeBlock;
-  Lum_TlmLibrary const *library = typeBlock->GetLibrary();
-  return library && m_Library == library->GetLibraryName() && m_Block == typeBlock->GetName();
+  // The names are compared as the host holds them, the type block's own
+  // (most often the one that differs) first; the library's name is its host
+  // design manager's, reached without specializing anything.
+  Orb_Block const *block = typeBlock->GetOrbBlock();
+  if (m_Block != block->GetNameString())
+    return false;
+  Orb_DesignMgr const *designMgr = block->GetView()->GetParent()->GetParent();
+  return m_Library == designMgr->GetNameString();
 }
 
 Lum_TlmPinTypeID::Lum_TlmPinTypeID(char const *libraryName, char const *typeBlockName,
@@ -20,7 +26,8 @@ Lum_TlmPinTypeID::Lum_TlmPinTypeID(char const *libraryName, char const *typeBloc
 bool Lum_TlmPinTypeID::RepresentsTypePin(Lum_TlmPin const *typePin) const {
   if (!m_Named || !typePin)
     return !m_Named && !typePin;
-  return m_Pin == typePin->GetName() && m_Block.RepresentsTypeBlock(typePin->GetParent());
+  return m_Pin == typePin->GetOrbPin()->GetNameString() &&
+         m_Block.RepresentsTypeBlock(typePin->GetParent());
 }
 
 namespace Lum_Tlm {

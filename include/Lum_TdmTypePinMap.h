@@ -5,6 +5,7 @@
 #include "Port_String.h"
 
 #include <map>
+#include <string_view>
 
 class Lum_TdmPin;
 class Lum_TlmPin;
@@ -52,6 +53,23 @@ public:
   void Dbg() const;
 
 private:
+  // Byte order of the names (that of Port::StringBase), also against a
+  // string_view, so that a lookup by a pin's name builds no string.
+  struct NameOrder {
+    using is_transparent = void;
+    bool operator()(Port::StringBase<char> const &a, Port::StringBase<char> const &b) const {
+      return a < b;
+    }
+    bool operator()(Port::StringBase<char> const &a, std::string_view b) const {
+      return std::string_view(a.str()) < b;
+    }
+    bool operator()(std::string_view a, Port::StringBase<char> const &b) const {
+      return a < std::string_view(b.str());
+    }
+  };
+
+  Lum_TlmPin const *Find(std::string_view name) const;
+
   bool m_IsDefault;
-  std::map<Port::StringBase<char>, Lum_TlmPin const *> m_PinMaps;
+  std::map<Port::StringBase<char>, Lum_TlmPin const *, NameOrder> m_PinMaps;
 };

@@ -27,6 +27,9 @@ char const *ShownMark(Orb_Property const *mark) {
 
 } // namespace
 
+static_assert(sizeof(Lum_TdmDesign) == sizeof(Orb_DesignT<Lum_TdmTraits>),
+              "Lum_TdmDesign adds no field to its host base");
+
 Lum_TdmDesign::Lum_TdmDesign(Lum_TdmModel *model, Orb_Design *design, bool isNew)
     : Orb_DesignT<Lum_TdmTraits>(model, design) {
   if (isNew) {

@@ -3,6 +3,9 @@
 #include "Lum_TdmDbg.h"
 #include "Lum_TdmModel.h"
 
+static_assert(sizeof(Lum_TdmDesignMgr) == sizeof(Orb_DesignMgrT<Lum_TdmTraits>),
+              "Lum_TdmDesignMgr adds no field to its host base");
+
 Lum_TdmDesignMgr::Lum_TdmDesignMgr(Lum_TdmModel *model, Orb_DesignMgr *designMgr)
     : Orb_DesignMgrT<Lum_TdmTraits>(model, designMgr) {}
 

@@ -3,6 +3,9 @@
 #include "Lum_TdmDbg.h"
 #include "Lum_TdmModel.h"
 
+static_assert(sizeof(Lum_TdmNetwork) == sizeof(Orb_NetworkT<Lum_TdmTraits>),
+              "Lum_TdmNetwork adds no field to its host base");
+
 Lum_TdmNetwork::Lum_TdmNetwork(Lum_TdmModel *model, Orb_Network *network)
     : Orb_NetworkT<Lum_TdmTraits>(model, network) {}
 

@@ -8,6 +8,10 @@
 
 #include <cstdint>
 
+// The pin adds its type pin to its host base, nothing else: there are many.
+static_assert(sizeof(Lum_TdmPin) == sizeof(Orb_PinT<Lum_TdmTraits>) + sizeof(void *),
+              "Lum_TdmPin carries only its type pin");
+
 Lum_TdmPin::Lum_TdmPin(Lum_TdmModel *model, Orb_Pin *pin, bool isNew)
     : Orb_PinT<Lum_TdmTraits>(model, pin), m_TypePin(nullptr) {
   // A loaded pin makes sure its block has a client; the answer is not kept.

@@ -3,6 +3,9 @@
 #include "Lum_TdmDbg.h"
 #include "Lum_TdmModel.h"
 
+static_assert(sizeof(Lum_TdmSignal) == sizeof(Orb_SignalT<Lum_TdmTraits>),
+              "Lum_TdmSignal adds no field to its host base");
+
 Lum_TdmSignal::Lum_TdmSignal(Lum_TdmModel *model, Orb_Signal *signal, bool /*isNew*/)
     : Orb_SignalT<Lum_TdmTraits>(model, signal) {}
 

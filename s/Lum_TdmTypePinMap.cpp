@@ -6,6 +6,8 @@
 #include "Lum_Exception.h"
 
 #include <cstdint>
+#include <string>
+#include <string_view>
 #include <utility>
 
 namespace {
@@ -15,11 +17,11 @@ char const kRevision[] = "$Revision: 1.1 $";
 
 // The name of a design pin handed to the map; a null pin is the caller's
 // error, reported rather than dereferenced.
-char const *DesignPinName(Lum_TdmPin const *designPin, int line) {
+std::string const &DesignPinName(Lum_TdmPin const *designPin, int line) {
   if (!designPin)
     throw Lum_ExceptionInvalidTypeBlock("Lum", kSourcePath, kRevision, line, "",
                                         "Null design pin specified for a type pin map.", false);
-  return designPin->GetName();
+  return designPin->GetOrbPin()->GetNameString();
 }
 
 } // namespace
@@ -45,13 +47,17 @@ void Lum_TdmTypePinMap::SetPinMap(Lum_TdmPin const *designPin, Lum_TlmPin const 
   SetPinMap(Port::StringBase<char>(DesignPinName(designPin, __LINE__)), typePin);
 }
 
-Lum_TlmPin const *Lum_TdmTypePinMap::GetPinMapping(Port::StringBase<char> name) const {
+Lum_TlmPin const *Lum_TdmTypePinMap::Find(std::string_view name) const {
   auto const found = m_PinMaps.find(name);
   return found == m_PinMaps.end() ? nullptr : found->second;
 }
 
+Lum_TlmPin const *Lum_TdmTypePinMap::GetPinMapping(Port::StringBase<char> name) const {
+  return Find(name.str());
+}
+
 Lum_TlmPin const *Lum_TdmTypePinMap::GetPinMapping(Lum_TdmPin const *designPin) const {
-  return GetPinMapping(Port::StringBase<char>(DesignPinName(designPin, __LINE__)));
+  return Find(DesignPinName(designPin, __LINE__));
 }
 
 bool Lum_TdmTypePinMap::operator==(Lum_TdmTypePinMap const &other) const {

@@ -8,6 +8,8 @@
 
 #include <gtest/gtest.h>
 
+#include <cstddef>
+
 using namespace lumtest;
 
 namespace {
@@ -50,6 +52,27 @@ TEST_F(TdmTypePinMapTest, FirstEntryWinsAndPinFormsUseTheName) {
   EXPECT_EQ(map.GetPinMapping("CLK"), m_pD1);
   EXPECT_EQ(map.GetPinMapping("DATA"), nullptr);
   EXPECT_EQ(map.GetPinMapping(""), nullptr);
+}
+
+// A lookup through a design pin finds exactly the entry of its name, among
+// names that are prefixes of one another or hold bytes above 0x7f (ordered
+// as unsigned), as a lookup by string does.
+TEST_F(TdmTypePinMapTest, PinLookupMatchesTheWholeName) {
+  TypedDesign design;
+  Lum_TdmBlock *top = design.m_pView->CreateTopBlock("top");
+  char const *const names[] = {"A", "AB", "ABC", "B", "\xC3\xA9", "\x7F"};
+  Lum_TlmPin const *const typePins[] = {m_pD0, m_pD1, m_pClk, nullptr, m_pD1, m_pD0};
+  Lum_TdmTypePinMap map;
+  for (std::size_t i = 0; i < 6; ++i)
+    if (i != 2)
+      map.SetPinMap(names[i], typePins[i]);
+  for (std::size_t i = 0; i < 6; ++i) {
+    Lum_TdmPin const *pin = top->CreatePin(names[i], Orb_Pin::PIN_INPUT);
+    Lum_TlmPin const *expected = i == 2 ? nullptr : typePins[i];
+    EXPECT_EQ(map.GetPinMapping(pin), expected) << i;
+    EXPECT_EQ(map.GetPinMapping(names[i]), expected) << i;
+  }
+  EXPECT_EQ(map.GetPinMapping(top->CreatePin("AA", Orb_Pin::PIN_INPUT)), nullptr);
 }
 
 // Equality ignores insertion order and the default flag, compares type pins

@@ -365,6 +365,11 @@ TEST_F(TlmTest, TypeIdentifiersAndRegistry) {
   EXPECT_FALSE(blockId.RepresentsTypeBlock(library->GetTypeBlock("MUX")));
   EXPECT_FALSE(blockId.RepresentsTypeBlock(nullptr));
   EXPECT_FALSE(Lum_TlmBlockTypeID("other", "AND2").RepresentsTypeBlock(and2));
+  // Whole names only, both of them.
+  EXPECT_FALSE(Lum_TlmBlockTypeID("gates", "AND").RepresentsTypeBlock(and2));
+  EXPECT_FALSE(Lum_TlmBlockTypeID("gates", "AND22").RepresentsTypeBlock(and2));
+  EXPECT_FALSE(Lum_TlmBlockTypeID("gate", "AND2").RepresentsTypeBlock(and2));
+  EXPECT_FALSE(Lum_TlmBlockTypeID("gatesx", "AND2").RepresentsTypeBlock(and2));
   EXPECT_TRUE(Lum_TlmPinTypeID().RepresentsTypePin(nullptr));
   EXPECT_FALSE(Lum_TlmPinTypeID().RepresentsTypePin(a));
   Lum_TlmPinTypeID const pinId("gates", "AND2", "A");
@@ -372,6 +377,8 @@ TEST_F(TlmTest, TypeIdentifiersAndRegistry) {
   EXPECT_FALSE(pinId.RepresentsTypePin(nullptr));
   EXPECT_FALSE(Lum_TlmPinTypeID("gates", "AND2", "B").RepresentsTypePin(a));
   EXPECT_FALSE(Lum_TlmPinTypeID("gates", "MUX", "A").RepresentsTypePin(a));
+  EXPECT_FALSE(Lum_TlmPinTypeID("gates", "AND2", "").RepresentsTypePin(a));
+  EXPECT_FALSE(Lum_TlmPinTypeID("gate", "AND2", "A").RepresentsTypePin(a));
 
   Lum_Tlm::TypeIDRegistry *registry = Lum_Tlm::pTypeIDRegistry;
   ASSERT_NE(registry, nullptr) << "the platform's own counter creates it";
