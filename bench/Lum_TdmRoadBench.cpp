@@ -427,7 +427,7 @@ void BM_Rebind(benchmark::State &state) {
       state, [](Workload &w) { EnsureOpened(w); },
       [&maps](Workload &w) {
         Library const &library = TheLibrary();
-        std::vector<Orb_Block *> const &children = TopOf(*w.opened)->GetOrbBlock()->GetBlocks();
+        auto const &children = TopOf(*w.opened)->GetOrbBlock()->GetBlocks();
         Orb_Context *context = w.opened.get();
         std::int64_t const shift = ++w.rebinds;
         for (std::size_t i = 0; i < children.size(); ++i) {

@@ -100,10 +100,10 @@ inline Lum_TdmBlock *CreateBlocks(Lum_TdmModel &model, Library const &library,
 inline void Wire(Orb_Block *top) {
   Orb_Signal *chain = nullptr;
   std::string name;
-  std::vector<Orb_Block *> const &children = top->GetBlocks();
+  auto const &children = top->GetBlocks();
   for (std::size_t i = 0; i < children.size(); ++i) {
     std::string const index = std::to_string(i);
-    std::vector<Orb_Pin *> const &pins = children[i]->GetPins();
+    auto const &pins = children[i]->GetPins();
     if (chain)
       pins[0]->Connect(chain);
     chain = top->CreateSignal(("c" + index).c_str());
