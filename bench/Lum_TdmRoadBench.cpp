@@ -474,8 +474,8 @@ void Register(char const *name, void (*phase)(benchmark::State &)) {
     benchmark::RegisterBenchmark(name, phase)
         ->Arg(blocks)
         ->Iterations(blocks >= 1000000  ? 1
-                     : blocks >= 100000 ? 3
-                                        : 10)
+                     : blocks >= 100000 ? 5
+                                        : 40)
         ->UseManualTime()
         ->Unit(benchmark::kMillisecond);
 }
