@@ -21,10 +21,11 @@
 // Counters: us_per_block, the process's CPU time per block (the lowest over
 // the iterations), and wall_us_per_block, its wall-clock time: on a shared
 // machine the wall clock mostly measures the other processes. Then
-// allocs_per_block (operator new calls, counted by this program),
-// and for the opens heap_B_per_block (growth of what malloc hands out) and
-// rss_B_per_block (growth of the resident set). The queries also give
-// us_per_child_per_type. bench/run prints them as one table.
+// allocs_per_block (operator new calls, counted by this program), and for
+// the opens heap_B_per_block (growth of what malloc hands out) and
+// rss_B_per_block (growth of the resident set), both of the first
+// iteration. The queries also give us_per_child_per_type. bench/run prints
+// them as one table.
 //
 // Phases share their models and file per size, so a run in registration
 // order builds everything once; a phase run alone (a filter) makes what it
@@ -170,8 +171,11 @@ struct Workload {
   double typedSeconds = 0;
   double wireSeconds = 0;
 
+  // A file kept for later processes (LUM_BENCH_DIR) stays.
+  bool keepFile = false;
+
   ~Workload() {
-    if (!path.empty())
+    if (!path.empty() && !keepFile)
       std::filesystem::remove(path);
   }
 };
@@ -215,14 +219,33 @@ void EnsureCommitted(Workload &w) {
   w.committed = true;
 }
 
+// The file of a size. With LUM_BENCH_DIR set, the file is
+// <dir>/Lum_TdmRoadBench.<size>.db and outlives the process: a later process
+// finds it there and opens it without building anything first, so that the
+// memory of an open is measured in a process that held nothing else (the
+// host may keep freed memory for reuse). Without it, a file of this process
+// in the temporary directory, removed at the end.
 void EnsureFile(Workload &w) {
   if (!w.path.empty())
     return;
+  std::string const size = std::to_string(w.blocks);
+  if (char const *dir = std::getenv("LUM_BENCH_DIR")) {
+    std::string const path =
+        (std::filesystem::path(dir) / ("Lum_TdmRoadBench." + size + ".db")).string();
+    w.keepFile = true;
+    if (!w.created && std::filesystem::exists(path)) {
+      w.path = path;
+      return;
+    }
+    EnsureCommitted(w);
+    w.created->Save(path.c_str());
+    w.path = path;
+    return;
+  }
   EnsureCommitted(w);
-  std::string const path =
-      (std::filesystem::temp_directory_path() /
-       ("Lum_TdmRoadBench." + std::to_string(::getpid()) + "." + std::to_string(w.blocks) + ".db"))
-          .string();
+  std::string const path = (std::filesystem::temp_directory_path() /
+                            ("Lum_TdmRoadBench." + std::to_string(::getpid()) + "." + size + ".db"))
+                               .string();
   w.created->Save(path.c_str());
   w.path = path;
 }
@@ -245,19 +268,29 @@ Lum_TdmBlock *TopOf(Lum_TdmModel &model) { return Lum_TdmWorkload::ViewOf(model)
 // Runs one phase per iteration: `setup` untimed, then `phase` measured.
 // `units(w)` is the number of blocks the phase's time is divided by.
 // Counters keep the lowest time per block over the iterations, with the
-// allocations and memory of that iteration.
+// allocations of that iteration, and the memory growth of the first: later
+// iterations may reuse what the host kept of the one before.
 template <class Setup, class Phase, class Units>
 void RunPhase(benchmark::State &state, Setup const &setup, Phase const &phase, Units const &units,
               bool memory, double queriesPerBlock = 0) {
+  // The library is registered before anything is opened: a process that
+  // opens a kept file builds nothing else.
+  TheLibrary();
   Workload &w = WorkloadOf(state.range(0));
   double best = std::numeric_limits<double>::infinity();
   Cost bestCost;
   double bestUnits = 1;
+  Cost firstCost;
+  double firstUnits = 0;
   for (auto _ : state) {
     setup(w);
     Cost const cost = Measure([&] { phase(w); });
     state.SetIterationTime(cost.cpuSeconds);
     auto const n = static_cast<double>(std::max<std::int64_t>(units(w), 1));
+    if (firstUnits == 0) {
+      firstCost = cost;
+      firstUnits = n;
+    }
     if (cost.cpuSeconds / n < best) {
       best = cost.cpuSeconds / n;
       bestCost = cost;
@@ -269,8 +302,8 @@ void RunPhase(benchmark::State &state, Setup const &setup, Phase const &phase, U
   state.counters["allocs_per_block"] = static_cast<double>(bestCost.allocations) / bestUnits;
   state.counters["blocks"] = bestUnits;
   if (memory) {
-    state.counters["heap_B_per_block"] = static_cast<double>(bestCost.heap) / bestUnits;
-    state.counters["rss_B_per_block"] = static_cast<double>(bestCost.rss) / bestUnits;
+    state.counters["heap_B_per_block"] = static_cast<double>(firstCost.heap) / firstUnits;
+    state.counters["rss_B_per_block"] = static_cast<double>(firstCost.rss) / firstUnits;
   }
   if (queriesPerBlock > 0)
     state.counters["us_per_child_per_type"] = best * 1e6 / queriesPerBlock;
@@ -312,7 +345,11 @@ void BM_Commit(benchmark::State &state) {
 
 void BM_Save(benchmark::State &state) {
   RunPhase(
-      state, [](Workload &w) { EnsureFile(w); },
+      state,
+      [](Workload &w) {
+        EnsureCommitted(w);
+        EnsureFile(w);
+      },
       [](Workload &w) { w.created->Save(w.path.c_str()); }, AllBlocks, false);
 }
 
