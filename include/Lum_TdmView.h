@@ -62,9 +62,24 @@ public:
   // The local library, obtained from the type-library component and added at
   // the end of the list if it is not there yet.
   virtual Lum_TlmLibrary const *AddLocalLibrary() const;
+  // The bytes of one view client: its class size plus what it owns outside
+  // itself, both taken through their virtual slots.
   virtual std::uint64_t DbgMySize() const;
   virtual std::uint64_t DbgClassSize() const;
   virtual std::uint64_t DbgSecondarySize() const;
+  // Measures the client objects under the view: every block with its pins,
+  // every network with its signals, and the block signals that belong to no
+  // network. Sets the counters (each one reset first) and returns the total
+  // bytes. Pins, networks and signals without a client get one, which stays.
+  // The view, its design, design manager and model are not counted.
+  virtual std::uint64_t DbgGetSize(std::uint64_t &blockBytes, std::uint64_t &blockCount,
+                                   std::uint64_t &pinBytes, std::uint64_t &pinCount,
+                                   std::uint64_t &networkBytes, std::uint64_t &networkCount,
+                                   std::uint64_t &signalBytes, std::uint64_t &signalCount) const;
+  // Prints the measurement to the stream (null: the debug printer's own
+  // output): the total, then per kind present its count, bytes, share of the
+  // total (0 when the total is 0) and average size.
+  virtual void DbgReportSize(Port::Stream *stream) const;
 
 protected:
   // Adds a library to the list unless this very library is there already,

@@ -6,6 +6,8 @@
 #include "Lum_TdmDesign.h"
 #include "Lum_TdmModel.h"
 #include "Lum_TdmNetwork.h"
+#include "Lum_TdmPin.h"
+#include "Lum_TdmSignal.h"
 
 #include "Lum_Exception.h"
 #include "Lum_Tlm.h"
@@ -13,8 +15,10 @@
 #include "PM_PIC.h"
 #include "Port_MsgManData.h"
 
+#include <cassert>
 #include <cstdint>
 #include <string>
+#include <vector>
 
 namespace {
 
@@ -319,6 +323,103 @@ std::uint64_t Lum_TdmView::DbgMySize() const { return DbgClassSize() + DbgSecond
 std::uint64_t Lum_TdmView::DbgClassSize() const { return sizeof(Lum_TdmView); }
 
 std::uint64_t Lum_TdmView::DbgSecondarySize() const { return 0; }
+
+namespace {
+
+// The client of a host object read from a bridge table fetched once for the
+// whole walk; an object without one is specialized on the spot.
+template <class Client, class Host>
+Client const *MeasuredClient(Orb_Context *context, Orb_BridgeHandle const &bridge, Host *object) {
+  Orb_ClientObject *client = bridge[object->GetBridgeId()];
+  if (!client)
+    client = context->Specialize(object);
+  assert(client && "the client model made no client for a host object");
+  return static_cast<Client const *>(client);
+}
+
+// Adds one object of `bytes` to a kind's counters and to the total.
+void Count(std::uint64_t bytes, std::uint64_t &kindBytes, std::uint64_t &kindCount,
+           std::uint64_t &total) {
+  kindBytes += bytes;
+  ++kindCount;
+  total += bytes;
+}
+
+} // namespace
+
+std::uint64_t Lum_TdmView::DbgGetSize(std::uint64_t &blockBytes, std::uint64_t &blockCount,
+                                      std::uint64_t &pinBytes, std::uint64_t &pinCount,
+                                      std::uint64_t &networkBytes, std::uint64_t &networkCount,
+                                      std::uint64_t &signalBytes,
+                                      std::uint64_t &signalCount) const {
+  blockBytes = blockCount = pinBytes = pinCount = 0;
+  networkBytes = networkCount = signalBytes = signalCount = 0;
+  std::uint64_t total = 0;
+  Orb_Context *context = GetContext();
+  Orb_BridgeHandle const pins = context->GetBridgeHandle(Orb_Kind::Pin);
+
+  // The host's list of block clients, taken as this library's blocks without
+  // a second copy.
+  std::vector<Orb_BlockDerived *> blocks;
+  Orb_ViewDerived::LoadAllBlocks(blocks);
+  for (Orb_BlockDerived const *hostBlock : blocks) {
+    auto const *block = static_cast<Lum_TdmBlock const *>(hostBlock);
+    Count(block->DbgMySize(), blockBytes, blockCount, total);
+    for (Orb_Pin *pin : block->GetPins())
+      Count(MeasuredClient<Lum_TdmPin>(context, pins, pin)->DbgMySize(), pinBytes, pinCount, total);
+  }
+
+  // Signals are counted through their networks.
+  Orb_BridgeHandle const networks = context->GetBridgeHandle(Orb_Kind::Network);
+  Orb_BridgeHandle const signals = context->GetBridgeHandle(Orb_Kind::Signal);
+  for (Orb_Network *network : GetNetworks()) {
+    Count(MeasuredClient<Lum_TdmNetwork>(context, networks, network)->DbgMySize(), networkBytes,
+          networkCount, total);
+    for (Orb_Signal *signal : network->GetSignals())
+      Count(MeasuredClient<Lum_TdmSignal>(context, signals, signal)->DbgMySize(), signalBytes,
+            signalCount, total);
+  }
+  return total;
+}
+
+void Lum_TdmView::DbgReportSize(Port::Stream *stream) const {
+  std::uint64_t blockBytes = 0;
+  std::uint64_t blockCount = 0;
+  std::uint64_t pinBytes = 0;
+  std::uint64_t pinCount = 0;
+  std::uint64_t networkBytes = 0;
+  std::uint64_t networkCount = 0;
+  std::uint64_t signalBytes = 0;
+  std::uint64_t signalCount = 0;
+  std::uint64_t const total = DbgGetSize(blockBytes, blockCount, pinBytes, pinCount, networkBytes,
+                                         networkCount, signalBytes, signalCount);
+
+  char const rule[] = "==================================================================\n";
+  Orb_Debug::Printf(stream, 0, rule);
+  Orb_Debug::Printf(stream, 0, "Design <%s> View <%s> consumes %lU bytes of memory\n",
+                    GetParent()->GetName(), GetName(), total);
+  Orb_Debug::Printf(stream, 1, "%lU specialized objects\n",
+                    blockCount + networkCount + signalCount + pinCount);
+  // A derived class may report 0 bytes, so the total can be 0 even with
+  // objects present: its share then prints as 0.
+  auto const section = [&](char const *countFormat, char const *averageFormat, std::uint64_t bytes,
+                           std::uint64_t count) {
+    if (count == 0)
+      return;
+    std::uint64_t const share = total == 0 ? 0 : bytes * 100 / total;
+    Orb_Debug::Printf(stream, 2, countFormat, count, bytes, share);
+    Orb_Debug::Printf(stream, 3, averageFormat, bytes / count);
+  };
+  section("%lU blocks consume %lU bytes of memory (%lU%%)\n", "Average block size is %lU bytes\n",
+          blockBytes, blockCount);
+  section("%lU networks consume %lU bytes of memory (%lU%%)\n",
+          "Average network size is %lU bytes\n", networkBytes, networkCount);
+  section("%lU signals consume %lU bytes of memory (%lU%%)\n", "Average signal size is %lU bytes\n",
+          signalBytes, signalCount);
+  section("%lU pins consume %lU bytes of memory (%lU%%)\n", "Average pin size is %lU bytes\n",
+          pinBytes, pinCount);
+  Orb_Debug::Printf(stream, 0, rule);
+}
 
 void Lum_TdmView::DbgImpl() const {
   Lum_TdmDbgFrame<Lum_TdmView>(

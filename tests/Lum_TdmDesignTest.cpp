@@ -3,8 +3,6 @@
 #include "Lum_TdmTestSupport.h"
 
 #include "Lum_Exception.h"
-#include "Orb_Debug.h"
-#include "Port_Stream.h"
 
 #include <gtest/gtest.h>
 
@@ -144,32 +142,6 @@ TEST_F(TdmDesignTest, TypeBlockDesignAsTheComponentSays) {
   EXPECT_EQ(Lum_TdmDesign::IsTypeBlockDesign(design), Lum_TlmDesign::IsTypeBlockDesign(design));
   EXPECT_TRUE(Lum_TdmDesign::IsTypeBlockDesign(design));
   EXPECT_FALSE(Lum_TdmDesign::IsUserDesign(design));
-}
-
-} // namespace
-
-namespace {
-
-// The design's own dump names its class and shows its mark (an absent mark
-// reads as a user design); the host's dump carries the design's lines.
-TEST_F(TdmDesignTest, DumpsShowTheMark) {
-  TypedDesign design;
-  design.m_pDesign->DeleteProperty("TDS_DESIGN_TYPE");
-  Port::StringStream out;
-  Port::Stream *previous = Orb_Debug::SetOutput(&out);
-  design.m_pDesign->Dbg();
-  Orb_Debug::SetOutput(previous);
-  std::string const rule = "=======================================\n";
-  std::string const head = rule + "Data for class <Lum_TdmDesign>:\n" +
-                           "Design type = <TDS_DESIGN_TYPE_USER>\n" + rule + "Orb data:\n";
-  EXPECT_EQ(out.GetText().substr(0, head.size()), head);
-
-  out.Clear();
-  design.m_pDesign->CreatePropertyString("TDS_DESIGN_TYPE", "FOREIGN");
-  design.m_pDesign->GetOrbDesign()->DebugDump(&out, 0);
-  std::string const plus = "  +++++++++++++++++++++++++++++++++++++++\n";
-  EXPECT_EQ(out.GetText(), "design <top>\n  TDS_DESIGN_TYPE = <FOREIGN>\n" + plus +
-                               "  Lum_TdmDesign Data\n  Design type = <FOREIGN>\n" + plus);
 }
 
 } // namespace

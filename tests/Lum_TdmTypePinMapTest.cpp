@@ -1,17 +1,12 @@
-// Type pin maps: first entry wins, equality by identity, copies and the dump.
+// Type pin maps: first entry wins, equality by identity and copies.
 
 #include "Lum_TdmTypePinMap.h"
 
 #include "Lum_TdmTestSupport.h"
 
 #include "Lum_Exception.h"
-#include "Orb_Debug.h"
-#include "Port_Stream.h"
 
 #include <gtest/gtest.h>
-
-#include <cstdint>
-#include <sstream>
 
 using namespace lumtest;
 
@@ -107,29 +102,6 @@ TEST_F(TdmTypePinMapTest, NullDesignPinIsRefused) {
   EXPECT_EQ(map.GetNumPins(), 0u);
   EXPECT_THROW(map.GetPinMapping(static_cast<Lum_TdmPin const *>(nullptr)),
                Lum_ExceptionInvalidTypeBlock);
-}
-
-// The dump shows the flag, the count and each entry in name order.
-TEST_F(TdmTypePinMapTest, DumpListsEntriesInNameOrder) {
-  Lum_TdmTypePinMap map;
-  Port::StringStream out;
-  Port::Stream *previous = Orb_Debug::SetOutput(&out);
-  map.Dbg();
-  std::string const head = "---------------------------------------\n"
-                           "Data for class <Lum_TdmTypePinMap>:\n";
-  EXPECT_EQ(out.GetText(), head + "m_IsDefault = <false>\nm_PinMaps (# = 0:\n");
-
-  out.Clear();
-  map.SetDefaultMap(true);
-  map.SetPinMap("b", m_pD1);
-  map.SetPinMap("B", nullptr);
-  map.Dbg();
-  Orb_Debug::SetOutput(previous);
-  std::ostringstream d1;
-  d1 << std::hex << reinterpret_cast<std::uintptr_t>(m_pD1);
-  EXPECT_EQ(out.GetText(), head + "m_IsDefault = <true>\nm_PinMaps (# = 2:\n" +
-                               "  design pin name = <B>, Lum_TlmPin * = <0x0> \n" +
-                               "  design pin name = <b>, Lum_TlmPin * = <0x" + d1.str() + "> \n");
 }
 
 } // namespace

@@ -1,14 +1,18 @@
-// The view's format stamp and its type-library list.
+// The view's format stamp, its type-library list and its memory report.
 
 #include "Lum_TdmTestSupport.h"
 
 #include "Lum_Exception.h"
 #include "Lum_TlmTypeID.h"
+#include "Port_Stream.h"
 
 #include <gtest/gtest.h>
 
+#include <array>
 #include <cctype>
+#include <cstdint>
 #include <functional>
+#include <string>
 
 using namespace lumtest;
 
@@ -422,6 +426,186 @@ TEST_F(TdmViewLibraryTest, BlankEntriesAreSkipped) {
   EXPECT_EQ(capture.GetReports().size(), 2u);
   view->CommitAll();
   EXPECT_EQ(ListValue(view, "TDS_VIEW_TYPE_LIBS"), "LIBB 2.0 fast");
+}
+
+} // namespace
+
+// ---------------------------------------------------------------------------
+// Memory report
+
+namespace {
+
+// A block whose class size its model sets.
+class SizedBlock : public Lum_TdmBlock {
+public:
+  SizedBlock(Lum_TdmModel *model, Orb_Block *block, bool isNew, std::uint64_t bytes)
+      : Lum_TdmBlock(model, block, isNew), m_Bytes(bytes) {}
+  std::uint64_t DbgClassSize() const override { return m_Bytes; }
+
+private:
+  std::uint64_t m_Bytes;
+};
+
+class SizedModel : public Lum_TdmModel {
+public:
+  explicit SizedModel(std::uint64_t blockBytes)
+      : Lum_TdmModel("sized", "sized", ""), m_BlockBytes(blockBytes) {}
+  void SyncEventSpecializeBlockOnCreate(Orb_Block *block) override {
+    new SizedBlock(this, block, true, m_BlockBytes);
+  }
+  void SyncEventSpecializeBlockOnLoad(Orb_Block *block) override {
+    new SizedBlock(this, block, false, m_BlockBytes);
+  }
+
+private:
+  std::uint64_t m_BlockBytes;
+};
+
+// A view whose measurement gives the counters a test sets.
+class FixedSizeView : public Lum_TdmView {
+public:
+  using Lum_TdmView::Lum_TdmView;
+  std::uint64_t DbgGetSize(std::uint64_t &blockBytes, std::uint64_t &blockCount,
+                           std::uint64_t &pinBytes, std::uint64_t &pinCount,
+                           std::uint64_t &networkBytes, std::uint64_t &networkCount,
+                           std::uint64_t &signalBytes, std::uint64_t &signalCount) const override {
+    std::uint64_t *const counters[] = {&blockBytes,   &blockCount,   &pinBytes,    &pinCount,
+                                       &networkBytes, &networkCount, &signalBytes, &signalCount};
+    for (std::size_t i = 0; i < 8; ++i)
+      *counters[i] = m_Counters[i];
+    return blockBytes + pinBytes + networkBytes + signalBytes;
+  }
+  std::array<std::uint64_t, 8> m_Counters{};
+};
+
+class FixedSizeModel : public Lum_TdmModel {
+public:
+  FixedSizeModel() : Lum_TdmModel("fixed", "fixed", "") {}
+  void SyncEventSpecializeViewOnCreate(Orb_View *view) override {
+    new FixedSizeView(this, view, true);
+  }
+};
+
+// A measurement as "total | blocks bytes/count | pins | networks | signals",
+// the counters starting from values it must reset.
+std::string Measure(Lum_TdmView const *view) {
+  std::array<std::uint64_t, 8> c;
+  c.fill(7);
+  std::uint64_t const total = view->DbgGetSize(c[0], c[1], c[2], c[3], c[4], c[5], c[6], c[7]);
+  std::string text = std::to_string(total);
+  for (std::size_t i = 0; i < 8; i += 2)
+    text += " | " + std::to_string(c[i]) + "/" + std::to_string(c[i + 1]);
+  return text;
+}
+
+std::string Report(Lum_TdmView const *view) {
+  Port::StringStream out;
+  view->DbgReportSize(&out);
+  return out.GetText();
+}
+
+std::string const kReportRule =
+    "==================================================================\n";
+
+// Three blocks of 32 bytes each and nothing else: 96 bytes, all blocks.
+TEST(TdmViewSizeTest, ThreeBlocksOfThirtyTwoBytes) {
+  TypedDesign design(std::make_unique<SizedModel>(32));
+  Lum_TdmBlock *top = design.m_pView->CreateTopBlock("top");
+  top->CreateBlock("a", 0);
+  top->CreateBlock("b", 0);
+  EXPECT_EQ(Measure(design.m_pView), "96 | 96/3 | 0/0 | 0/0 | 0/0");
+  EXPECT_EQ(Report(design.m_pView), kReportRule +
+                                        "Design <top> View <netlist> consumes 96 bytes of memory\n"
+                                        "  3 specialized objects\n"
+                                        "    3 blocks consume 96 bytes of memory (100%)\n"
+                                        "      Average block size is 32 bytes\n" +
+                                        kReportRule);
+}
+
+// A view with no blocks and no networks measures 0 and prints no section.
+TEST(TdmViewSizeTest, EmptyViewHasNoSections) {
+  TypedDesign design;
+  EXPECT_EQ(Measure(design.m_pView), "0 | 0/0 | 0/0 | 0/0 | 0/0");
+  EXPECT_EQ(Report(design.m_pView), kReportRule +
+                                        "Design <top> View <netlist> consumes 0 bytes of memory\n" +
+                                        "  0 specialized objects\n" + kReportRule);
+}
+
+// Pins are counted through their blocks and signals through their networks
+// (a signal in no network is not counted); what is reached without a client
+// gets one, and a second measurement gives the same counters.
+TEST(TdmViewSizeTest, MeasurementReachesEveryObjectOnce) {
+  TypedDesign design;
+  Lum_TdmModel &model = design.Model();
+  Lum_TdmBlock *top = design.m_pView->CreateTopBlock("top");
+  Orb_Block *child = top->CreateBlock("c1", 0)->GetOrbBlock();
+  child->CreatePin("q", Orb_Pin::PIN_INPUT);
+  Orb_Pin *pin = top->CreatePin("p1", Orb_Pin::PIN_INPUT)->GetOrbPin();
+  top->CreatePin("p2", Orb_Pin::PIN_OUTPUT);
+  Orb_Signal *inNetwork = top->CreateSignal("s1")->GetOrbSignal();
+  Orb_Signal *alone = top->CreateSignal("s2")->GetOrbSignal();
+  Orb_Network *network = design.m_pView->CreateNetwork("n1")->GetOrbNetwork();
+  network->AddSignal(inNetwork);
+  design.m_pView->CreateNetwork("n2");
+  for (Orb_Persistent *object :
+       std::vector<Orb_Persistent *>{child, pin, inNetwork, alone, network})
+    delete model.GetClient(object);
+
+  std::string const expected = std::to_string(2 * sizeof(Lum_TdmBlock) + 3 * sizeof(Lum_TdmPin) +
+                                              2 * sizeof(Lum_TdmNetwork) + sizeof(Lum_TdmSignal)) +
+                               " | " + std::to_string(2 * sizeof(Lum_TdmBlock)) + "/2 | " +
+                               std::to_string(3 * sizeof(Lum_TdmPin)) + "/3 | " +
+                               std::to_string(2 * sizeof(Lum_TdmNetwork)) + "/2 | " +
+                               std::to_string(sizeof(Lum_TdmSignal)) + "/1";
+  EXPECT_EQ(Measure(design.m_pView), expected);
+  for (Orb_Persistent *object : std::vector<Orb_Persistent *>{child, pin, inNetwork, network})
+    EXPECT_NE(model.GetClient(object), nullptr) << object->GetName() << " was not specialized";
+  EXPECT_EQ(model.GetClient(alone), nullptr) << "a signal in no network was reached";
+  EXPECT_EQ(Measure(design.m_pView), expected);
+}
+
+// The report takes the view's measurement through its virtual slot and
+// prints blocks, networks, signals and pins, each only when present, with
+// truncated shares and averages.
+TEST(TdmViewSizeTest, ReportPrintsThePresentKindsInOrder) {
+  TypedDesign design(std::make_unique<FixedSizeModel>());
+  auto *view = static_cast<FixedSizeView *>(design.m_pView);
+  view->m_Counters = {100, 3, 1044, 6, 7, 1, 40, 2};
+  EXPECT_EQ(Report(view), kReportRule +
+                              "Design <top> View <netlist> consumes 1191 bytes of memory\n"
+                              "  12 specialized objects\n"
+                              "    3 blocks consume 100 bytes of memory (8%)\n"
+                              "      Average block size is 33 bytes\n"
+                              "    1 networks consume 7 bytes of memory (0%)\n"
+                              "      Average network size is 7 bytes\n"
+                              "    2 signals consume 40 bytes of memory (3%)\n"
+                              "      Average signal size is 20 bytes\n"
+                              "    6 pins consume 1044 bytes of memory (87%)\n"
+                              "      Average pin size is 174 bytes\n" +
+                              kReportRule);
+
+  view->m_Counters = {0, 0, 30, 2, 0, 0, 10, 1};
+  EXPECT_EQ(Report(view), kReportRule +
+                              "Design <top> View <netlist> consumes 40 bytes of memory\n"
+                              "  3 specialized objects\n"
+                              "    1 signals consume 10 bytes of memory (25%)\n"
+                              "      Average signal size is 10 bytes\n"
+                              "    2 pins consume 30 bytes of memory (75%)\n"
+                              "      Average pin size is 15 bytes\n" +
+                              kReportRule);
+}
+
+// Blocks of a derived class reporting 0 bytes make a total of 0: their
+// share prints as 0 instead of dividing by it.
+TEST(TdmViewSizeTest, ZeroByteClassGivesZeroShare) {
+  TypedDesign design(std::make_unique<SizedModel>(0));
+  design.m_pView->CreateTopBlock("top")->CreateBlock("a", 0);
+  EXPECT_EQ(Report(design.m_pView), kReportRule +
+                                        "Design <top> View <netlist> consumes 0 bytes of memory\n"
+                                        "  2 specialized objects\n"
+                                        "    2 blocks consume 0 bytes of memory (0%)\n"
+                                        "      Average block size is 0 bytes\n" +
+                                        kReportRule);
 }
 
 } // namespace
