@@ -376,7 +376,8 @@ TEST_F(TdmTool, InfoShowsRecordedAndCurrentLibraryVersions) {
         "      GATES        recorded 1.2 demo         now 1.3 demo   <- differs\n",
         "    blocks: 4 (2 typed, 2 untyped)\n",
         "      GATES:INV                1\n      GATES:NAND2              1\n",
-        "    pins: 6, signals: 1, networks: 1\n"})
+        "    pins: 6, signals: 1, networks: 1\n", "Design <chip> View <netlist> consumes ",
+        "4 blocks consume "})
     EXPECT_THAT(run.out, HasSubstr(line)) << run.out;
 }
 

@@ -11,6 +11,7 @@
 #include "Orb_Model.h"
 #include "Orb_Property.h"
 #include "Port_Exception.h"
+#include "Port_Stream.h"
 #include "Port_String.h"
 
 #include <cstdint>
@@ -122,6 +123,10 @@ int RunInfo(std::string const &path, CommonOptions const &options) {
                 static_cast<unsigned long long>(counts.pins),
                 static_cast<unsigned long long>(counts.signals),
                 static_cast<unsigned long long>(hostView->GetNetworks().size()));
+    // The report goes through the same C stream as the lines above.
+    std::fflush(stdout);
+    Port::FileStream out(stdout);
+    view->DbgReportSize(&out);
   }
   return kExitOk;
 }
