@@ -298,7 +298,9 @@ TEST_F(TdmTool, CheckReportsEveryProblemGroupedWithCounts) {
                view + "k1 pin Y, " + view + "k2 pin Y\n",
        })
     EXPECT_THAT(run.out, HasSubstr(line)) << run.out;
-  EXPECT_THAT(run.out, HasSubstr("used by 1 block: work/broken/netlist:broken/b1"));
+  EXPECT_THAT(
+      run.out,
+      HasSubstr("work/broken/netlist types 1 block from it: work/broken/netlist:broken/b1"));
   EXPECT_THAT(run.out, Not(HasSubstr("k3")));
   EXPECT_FALSE(Opens(db));
 }

@@ -202,13 +202,13 @@ private:
     for (ListedLibrary const &listed : libraries) {
       if (listed.library)
         continue;
-      std::string detail =
-          "used by " + std::to_string(listed.blocks) + " block" + (listed.blocks == 1 ? "" : "s");
+      std::string detail = "; " + ViewPath(view) + " types " + std::to_string(listed.blocks) +
+                           " block" + (listed.blocks == 1 ? "" : "s") + " from it";
       for (std::size_t i = 0; i < listed.examples.size(); ++i)
         detail += (i ? ", " : ": ") + listed.examples[i];
       if (listed.blocks > listed.examples.size())
         detail += ", ...";
-      m_LibraryDetails[listed.name] += "; in " + ViewPath(view) + " " + detail;
+      m_LibraryDetails[listed.name] += detail;
     }
     for (ListedLibrary const &listed : libraries)
       if (listed.release)
