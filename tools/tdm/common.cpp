@@ -115,9 +115,14 @@ void Progress::Run() {
   do {
     auto const seconds =
         std::chrono::duration_cast<std::chrono::seconds>(Clock::now() - start).count();
-    std::fprintf(stderr, "\r\033[K%s: %llu objects, %llds", m_What.c_str(),
-                 static_cast<unsigned long long>(m_Count.load(std::memory_order_relaxed)),
-                 static_cast<long long>(seconds));
+    std::uint64_t const count = m_Count.load(std::memory_order_relaxed);
+    // Until the first block counts, the file is being read.
+    if (count == 0)
+      std::fprintf(stderr, "\r\033[K%s: reading, %llds", m_What.c_str(),
+                   static_cast<long long>(seconds));
+    else
+      std::fprintf(stderr, "\r\033[K%s: %llu blocks, %llds", m_What.c_str(),
+                   static_cast<unsigned long long>(count), static_cast<long long>(seconds));
     std::fflush(stderr);
     m_Shown = true;
   } while (!m_Wake.wait_for(lock, std::chrono::milliseconds(250), [this] { return m_Done; }));
