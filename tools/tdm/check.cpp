@@ -238,9 +238,11 @@ private:
 
   void CollectTyped(Orb_Block *block, std::vector<Orb_Block *> &typed) {
     ++m_Blocks;
-    m_Progress.Count();
+    // Typed blocks count for the progress line once they are checked.
     if (block->GetPropertyByName(kBlockTypeProperty))
       typed.push_back(block);
+    else
+      m_Progress.Count();
     for (Orb_Block *child : block->GetBlocks())
       CollectTyped(child, typed);
   }
@@ -292,6 +294,7 @@ private:
   }
 
   void CheckBlock(Orb_View *view, Orb_Block *block, std::vector<ListedLibrary> &libraries) {
+    m_Progress.Count();
     std::string const &storedType = block->GetPropertyByName(kBlockTypeProperty)->GetValue();
     std::size_t const colon = storedType.find(':');
     std::string const libraryName = storedType.substr(0, colon);
