@@ -398,6 +398,7 @@ int RunCheck(std::string const &path, CommonOptions const &options) {
     Port_MsgCapture const capture;
     checker.CheckModel();
   }
+  progress.Stop();
   Problems const &problems = checker.GetProblems();
   if (problems.Total() == 0) {
     if (!options.quiet)

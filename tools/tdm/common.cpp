@@ -92,7 +92,9 @@ Progress::Progress(std::string what, CommonOptions const &options) : m_What(std:
     m_Thread = std::thread([this] { Run(); });
 }
 
-Progress::~Progress() {
+Progress::~Progress() { Stop(); }
+
+void Progress::Stop() {
   if (!m_Thread.joinable())
     return;
   {

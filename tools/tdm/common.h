@@ -82,6 +82,8 @@ public:
   Progress &operator=(Progress const &) = delete;
 
   void Count(std::uint64_t n = 1) { m_Count.fetch_add(n, std::memory_order_relaxed); }
+  // Clears the line and shows no more; the destructor does it too.
+  void Stop();
 
 private:
   void Run();
