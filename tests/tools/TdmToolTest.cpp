@@ -305,6 +305,32 @@ TEST_F(TdmTool, CheckReportsEveryProblemGroupedWithCounts) {
   EXPECT_FALSE(Opens(db));
 }
 
+// Type blocks of the database's own local library are looked up in the
+// database, as an open does.
+TEST_F(TdmTool, CheckResolvesTheLocalLibraryFromTheDatabase) {
+  auto withLocal = [](char const *type) {
+    return [type](Orb_DesignMgr *, Design &d) {
+      Lum_TlmLibrary *local =
+          Lum_TlmLibrary::GetLocalLibrary(d.view->GetModel(), PM_PIC("demo", "d1", nullptr));
+      local->CreateTypeBlock("MACRO")->CreatePin("X", Orb_Pin::PIN_INPUT);
+      d.view->GetPropertyByName("TDS_VIEW_TYPE_LIBS")
+          ->AppendString(std::string(Lum_TlmLibrary::LOCAL_LIBRARY_NAME) + " 1.0");
+      AddTyped(d, "mac", type, {"X"})->GetPinByName("X")->Connect(d.net);
+    };
+  };
+  std::string const local = std::string(Lum_TlmLibrary::LOCAL_LIBRARY_NAME);
+  std::string const good = WriteDatabase("good.odb", withLocal((local + ":MACRO").c_str()));
+  Outcome run = Tdm("check", good);
+  EXPECT_EQ(run.code, 0) << run.out;
+  EXPECT_TRUE(Opens(good));
+
+  std::string const bad = WriteDatabase("bad.odb", withLocal((local + ":OTHER").c_str()));
+  run = Tdm("check", bad);
+  EXPECT_EQ(run.code, 1);
+  EXPECT_THAT(run.out, HasSubstr("  " + local + ":OTHER: 1 block: work/chip/netlist:chip/mac\n"));
+  EXPECT_FALSE(Opens(bad));
+}
+
 TEST_F(TdmTool, ErrorsNameTheFileAndEndWithTheirExitCode) {
   std::string const db = WriteDatabase("chip.odb");
   std::ofstream(File("corrupt.odb")) << "garbage\n";
