@@ -165,6 +165,52 @@ public:
   std::string m_Dir;
 };
 
+// The main job: what the demo writes opens with every binding, and the
+// other subcommands read it.
+TEST_F(TdmTool, DemoWritesAReopenableDesignThatEverySubcommandReads) {
+  Outcome run = Tdm(std::vector<std::string>{"demo"}, "cd " + Sh(m_Dir) + " &&");
+  ASSERT_EQ(run.code, 0) << run.out << run.err;
+  EXPECT_EQ(run.err, "");
+  std::string const first = run.out.substr(0, run.out.find('\n'));
+  std::string const prefix = "tdm demo: wrote into " + m_Dir + "/tdm_demo_";
+  ASSERT_EQ(first.substr(0, prefix.size()), prefix) << run.out;
+  std::string const dir = first.substr(first.find(m_Dir));
+  EXPECT_TRUE(std::filesystem::exists(dir + "/demo.odb"));
+
+  run = Tdm({"demo", "--dir", File("d")});
+  ASSERT_EQ(run.code, 0) << run.out << run.err;
+  for (char const *line : {"  chip/reg        GATES:DFF    typed through a pin map",
+                           "  chip/core       CORES:ALU    typed, hierarchy grafted beneath",
+                           "  chip/core_copy  -            untyped copy of CORES:ALU",
+                           "reopened in a fresh model: ", "Design <chip> View <netlist> consumes "})
+    EXPECT_THAT(run.out, HasSubstr(line));
+  EXPECT_THAT(run.out, HasSubstr("reopened in a fresh model: 40 of 40 bindings"));
+  std::string const db = File("d/demo.odb");
+  // The demo's own GATES, not the fixture's.
+  Lum_TlmCatalog::ClearSearchDirectories();
+  Lum_TlmCatalog::AddSearchDirectory(File("d").c_str());
+  EXPECT_TRUE(Opens(db));
+  std::vector<std::string> const libPath = {"--lib-path", File("d")};
+  auto tdm = [&](std::vector<std::string> args) {
+    args.insert(args.begin() + 1, libPath.begin(), libPath.end());
+    args.push_back(db);
+    return Tdm(args);
+  };
+  run = tdm({"check"});
+  EXPECT_EQ(run.code, 0) << run.out;
+  run = tdm({"tree", "--pins"});
+  EXPECT_EQ(run.code, 0) << run.err;
+  for (char const *line :
+       {"  reg  GATES:DFF\n    . pin DATA (input)  D\n    . pin CLOCK (input)  CK\n",
+        "  core  CORES:ALU\n", "    g1  GATES:NAND2\n", "  core_copy  -\n"})
+    EXPECT_THAT(run.out, HasSubstr(line)) << run.out;
+  run = tdm({"info"});
+  EXPECT_EQ(run.code, 0) << run.err;
+  EXPECT_THAT(run.out, HasSubstr("      CORES        recorded 2.0 sample       now 2.0 sample\n"));
+  EXPECT_EQ(tdm({"commit"}).code, 0);
+  EXPECT_EQ(tdm({"dot"}).code, 0);
+}
+
 TEST_F(TdmTool, CheckOnCleanDatabaseAgreesWithARealOpen) {
   std::string const db = WriteDatabase("clean.odb");
   Outcome const run = Tdm("check", db);

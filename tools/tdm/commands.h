@@ -9,7 +9,8 @@
 namespace tdm {
 
 struct DemoOptions {
-  std::string dir; // empty: a new folder in the current directory
+  std::string dir;     // empty: a new folder in the current directory
+  std::string program; // how the user ran tdm, for the commands it suggests
 };
 int RunDemo(DemoOptions const &demo, CommonOptions const &options);
 

@@ -46,6 +46,7 @@ int Main(int argc, char **argv) {
   tdm::CommonOptions common;
   std::string database;
   tdm::DemoOptions demo;
+  demo.program = argc > 0 && argv[0] ? argv[0] : "tdm";
   tdm::CommitOptions commit;
   tdm::TreeOptions tree;
 
