@@ -265,11 +265,15 @@ int RunDemo(DemoOptions const &demo, CommonOptions const &options) {
   std::map<std::string, std::string> created;
   for (auto const &[what, binding] : built.bindings) {
     auto const found = reopened.find(what);
-    if (found == reopened.end() || found->second != binding)
-      lost.push_back(what + ": " + binding + " before, " +
-                     (found == reopened.end() ? "missing" : found->second) + " after");
+    if (found != reopened.end() && found->second == binding)
+      continue;
+    std::string line = what;
+    line += ": " + binding + " before, ";
+    line += found == reopened.end() ? "missing" : found->second;
+    lost.push_back(line + " after");
   }
-  for (auto const &[what, binding] : reopened) {
+  for (auto const &entry : reopened) {
+    std::string const &what = entry.first;
     std::size_t const dot = what.rfind('.');
     if (!built.bindings.count(what) && dot != std::string::npos)
       created[what.substr(0, dot)] +=
