@@ -312,6 +312,10 @@ TEST_F(TdmTool, CheckReportsEveryProblemGroupedWithCounts) {
     Design nodevice = AddDesign(dm, "nodevice");
     nodevice.view->DeleteProperty("TDS_DEVICE_PM");
     nodevice.view->DeleteProperty("TDS_DEVICE_PART");
+    AddDesign(dm, "nopm").view->DeleteProperty("TDS_DEVICE_PM");
+    AddDesign(dm, "nowhere")
+        .view->GetPropertyByName("TDS_VIEW_TYPE_LIBS")
+        ->AppendString("NOWHERE 1.0");
     Design broken = AddDesign(dm, "broken");
     broken.view->GetPropertyByName("TDS_VIEW_TYPE_LIBS")->AppendString("BROKEN 1.0");
     AddTyped(broken, "b1", "BROKEN:ANY", {});
@@ -322,7 +326,7 @@ TEST_F(TdmTool, CheckReportsEveryProblemGroupedWithCounts) {
   EXPECT_EQ(run.code, 1) << run.err;
   std::string const view = "work/chip/netlist:chip/";
   for (std::string const &line : std::vector<std::string>{
-           ": 19 problems that make opening fail\n",
+           ": 21 problems that make opening fail\n",
            "design with a foreign design mark (TDS_DESIGN_TYPE): 2\n"
            "  \"TDS_DESIGN_TYPE_LIBRARY\": 2 designs: work/lib1, work/lib2\n",
            "view stamp too old (TDS_TDM_VERSION below 0.3: convert the design): 2\n"
@@ -331,9 +335,11 @@ TEST_F(TdmTool, CheckReportsEveryProblemGroupedWithCounts) {
            "view stamp too new (TDS_TDM_VERSION above 3.1: written by newer software): 2\n"
            "  \"3.2\": 1 view: work/new1/netlist\n"
            "  \"4.0\": 1 view: work/new2/netlist\n",
-           "view without a device personality for its type libraries: 1\n"
+           "view without a device personality for its type libraries: 2\n"
+           "  without TDS_DEVICE_PM: 1 view: work/nopm/netlist\n"
            "  without TDS_DEVICE_PM and TDS_DEVICE_PART: 1 view: work/nodevice/netlist\n",
-           "type library that cannot be loaded: 1\n  BROKEN: 1 view: work/broken/netlist\n",
+           "type library that cannot be loaded: 2\n  BROKEN: 1 view: work/broken/netlist\n",
+           "  NOWHERE: 1 view: work/nowhere/netlist\n    \"NOWHERE\": ",
            "library not in the view's TDS_VIEW_TYPE_LIBS: 2\n  CELLS:NAND2: 2 blocks: " + view +
                "c1, " + view + "c2\n",
            "type block missing from its library: 5\n  GATES:MUX: 1 block: " + view +
