@@ -209,6 +209,11 @@ TEST_F(TdmTool, DemoWritesAReopenableDesignThatEverySubcommandReads) {
   EXPECT_THAT(run.out, HasSubstr("      CORES        recorded 2.0 sample       now 2.0 sample\n"));
   EXPECT_EQ(tdm({"commit"}).code, 0);
   EXPECT_EQ(tdm({"dot"}).code, 0);
+
+  // Quiet, it prints the folder alone.
+  run = Tdm({"demo", "--quiet", "--dir", File("q")});
+  EXPECT_EQ(run.code, 0) << run.err;
+  EXPECT_EQ(run.out, File("q") + "\n");
 }
 
 TEST_F(TdmTool, CheckOnCleanDatabaseAgreesWithARealOpen) {
