@@ -575,25 +575,6 @@ TEST(TdmPinAlpaSorterTest, EqualNamesAreNotOrdered) {
 // ---------------------------------------------------------------------------
 // Dump
 
-// The own dump shows the type block's address and name, or null and an
-// empty name.
-TEST_F(TdmBlockTest, DumpShowsTheTypeBlock) {
-  auto model = Open(WriteDesign(kMappedReg));
-  Port::StringStream out;
-  Port::Stream *previous = Orb_Debug::SetOutput(&out);
-  U1(*model)->Dbg();
-  U1(*model)->GetParent()->Dbg();
-  Orb_Debug::SetOutput(previous);
-  std::ostringstream address;
-  address << std::hex << reinterpret_cast<std::uintptr_t>(m_pReg);
-  std::string const typed = "Data for class <Lum_TdmBlock>:\n(Lum_TlmBlock *) m_pTypeBlock = <0x" +
-                            address.str() + ">, (REG)\n";
-  std::string const untyped =
-      "Data for class <Lum_TdmBlock>:\n(Lum_TlmBlock *) m_pTypeBlock = <0x0>, ()\n";
-  EXPECT_LT(out.GetText().find(typed), out.GetText().find(untyped)) << out.GetText();
-  EXPECT_NE(out.GetText().find(untyped), std::string::npos) << out.GetText();
-}
-
 // ---------------------------------------------------------------------------
 // Caller operations
 
