@@ -190,37 +190,25 @@ unsigned Orb_Block::GetDepth() const {
 Orb_Block *Orb_Block::CreateBlock(char const *name, int /*flags*/) {
   CheckName(name, "block");
   CheckNotDying(this, "block", name);
-  if (m_Blocks.Find(name))
-    ThrowDuplicate(this, "block", name);
   if (GetDepth() >= Orb_MaxBlockDepth)
     throw Orb_Exception(kSource, __LINE__, name,
                         ("A child block of block <" + Port::Exception::ShownName(GetNameString()) +
                          "> would lie deeper than " + std::to_string(Orb_MaxBlockDepth) +
                          " levels.")
                             .c_str());
-  auto *block = new Orb_Block(GetModel(), this, m_pView, name);
-  m_Blocks.Add(block);
-  return GetModel()->Announce(block);
+  return GetModel()->Adopt(new Orb_Block(GetModel(), this, m_pView, name), "block");
 }
 
 Orb_Pin *Orb_Block::CreatePin(char const *name, Orb_Pin::PIN_DIRECTION direction) {
   CheckName(name, "pin");
   CheckNotDying(this, "pin", name);
-  if (m_Pins.Find(name))
-    ThrowDuplicate(this, "pin", name);
-  auto *pin = new Orb_Pin(GetModel(), this, name, direction);
-  m_Pins.Add(pin);
-  return GetModel()->Announce(pin);
+  return GetModel()->Adopt(new Orb_Pin(GetModel(), this, name, direction), "pin");
 }
 
 Orb_Signal *Orb_Block::CreateSignal(char const *name) {
   CheckName(name, "signal");
   CheckNotDying(this, "signal", name);
-  if (m_Signals.Find(name))
-    ThrowDuplicate(this, "signal", name);
-  auto *signal = new Orb_Signal(GetModel(), this, name);
-  m_Signals.Add(signal);
-  return GetModel()->Announce(signal);
+  return GetModel()->Adopt(new Orb_Signal(GetModel(), this, name), "signal");
 }
 
 void Orb_Block::DeleteBlock(Orb_Block *child) {
@@ -254,18 +242,13 @@ Orb_Block *Orb_View::CreateTopBlock(char const *name) {
   CheckNotDying(this, "block", name);
   if (m_pTopBlock)
     throw Orb_Exception(kSource, __LINE__, GetName(), "The view already has a top block.");
-  m_pTopBlock = new Orb_Block(GetModel(), this, this, name);
-  return GetModel()->Announce(m_pTopBlock);
+  return GetModel()->Adopt(new Orb_Block(GetModel(), this, this, name), "block");
 }
 
 Orb_Network *Orb_View::CreateNetwork(char const *name) {
   CheckName(name, "network");
   CheckNotDying(this, "network", name);
-  if (m_Networks.Find(name))
-    ThrowDuplicate(this, "network", name);
-  auto *network = new Orb_Network(GetModel(), this, name);
-  m_Networks.Add(network);
-  return GetModel()->Announce(network);
+  return GetModel()->Adopt(new Orb_Network(GetModel(), this, name), "network");
 }
 
 void Orb_View::DeleteTopBlock() {
@@ -288,11 +271,7 @@ Orb_DesignMgr *Orb_Design::GetParent() const {
 Orb_View *Orb_Design::CreateView(char const *name) {
   CheckName(name, "view");
   CheckNotDying(this, "view", name);
-  if (m_Views.Find(name))
-    ThrowDuplicate(this, "view", name);
-  auto *view = new Orb_View(GetModel(), this, name);
-  m_Views.Add(view);
-  return GetModel()->Announce(view);
+  return GetModel()->Adopt(new Orb_View(GetModel(), this, name), "view");
 }
 
 void Orb_Design::DeleteView(Orb_View *view) {
@@ -306,11 +285,7 @@ Orb_DesignMgr::Orb_DesignMgr(Orb_Model *model, std::string name)
 Orb_Design *Orb_DesignMgr::CreateDesign(char const *name) {
   CheckName(name, "design");
   CheckNotDying(this, "design", name);
-  if (m_Designs.Find(name))
-    ThrowDuplicate(this, "design", name);
-  auto *design = new Orb_Design(GetModel(), this, name);
-  m_Designs.Add(design);
-  return GetModel()->Announce(design);
+  return GetModel()->Adopt(new Orb_Design(GetModel(), this, name), "design");
 }
 
 void Orb_DesignMgr::DeleteDesign(Orb_Design *design) {
@@ -343,11 +318,7 @@ Orb_Model::~Orb_Model() {
 
 Orb_DesignMgr *Orb_Model::CreateDesignMgr(char const *name) {
   CheckName(name, "design manager");
-  if (m_DesignMgrs.Find(name))
-    ThrowDuplicate(nullptr, "design manager", name);
-  auto *designMgr = new Orb_DesignMgr(this, name);
-  m_DesignMgrs.Add(designMgr);
-  return Announce(designMgr);
+  return Adopt(new Orb_DesignMgr(this, name), "design manager");
 }
 
 void Orb_Model::DeleteDesignMgr(Orb_DesignMgr *designMgr) {
@@ -463,6 +434,16 @@ template <class T> T *Orb_Model::Announce(T *object) {
   return object;
 }
 
+template <class T> T *Orb_Model::Adopt(T *object, char const *kind) {
+  if (!Link(object)) {
+    std::string const name = object->GetNameString();
+    Orb_Persistent *parent = object->GetParentObject();
+    delete object;
+    ThrowDuplicate(parent, kind, name.c_str());
+  }
+  return Announce(object);
+}
+
 void Orb_Model::AnnounceLoad(Orb_Persistent *object) {
   // A handler may have deleted it before its turn came.
   if (object->m_Dying)
@@ -480,10 +461,12 @@ namespace {
 // child blocks.
 void CollectBlockTree(Orb_Block *block, std::vector<Orb_Persistent *> &out) {
   out.push_back(block);
-  out.insert(out.end(), block->GetPins().begin(), block->GetPins().end());
-  out.insert(out.end(), block->GetSignals().begin(), block->GetSignals().end());
-  for (Orb_Block *child : block->GetBlocks())
-    CollectBlockTree(child, out);
+  Orb_ForEachChild(block, [&out](Orb_Persistent *child) {
+    if (child->GetKind() == Orb_Kind::Block)
+      CollectBlockTree(static_cast<Orb_Block *>(child), out);
+    else
+      out.push_back(child);
+  });
 }
 
 } // namespace
@@ -568,6 +551,46 @@ void Orb_Model::ReleaseHold() noexcept {
   --m_HoldDepth;
 }
 
+namespace {
+
+// Adds to a named list unless a sibling has the name.
+template <class T> bool AddUnique(Orb_NamedList<T> &list, Orb_Persistent *object) {
+  if (list.Find(object->GetNameString()))
+    return false;
+  list.Add(static_cast<T *>(object));
+  return true;
+}
+
+} // namespace
+
+bool Orb_Model::Link(Orb_Persistent *object) {
+  Orb_Persistent *parent = object->GetParentObject();
+  switch (object->GetKind()) {
+  case Orb_Kind::DesignMgr:
+    return AddUnique(m_DesignMgrs, object);
+  case Orb_Kind::Design:
+    return AddUnique(static_cast<Orb_DesignMgr *>(parent)->m_Designs, object);
+  case Orb_Kind::View:
+    return AddUnique(static_cast<Orb_Design *>(parent)->m_Views, object);
+  case Orb_Kind::Block:
+    if (parent->GetKind() == Orb_Kind::View) {
+      auto *view = static_cast<Orb_View *>(parent);
+      if (view->m_pTopBlock)
+        return false;
+      view->m_pTopBlock = static_cast<Orb_Block *>(object);
+      return true;
+    }
+    return AddUnique(static_cast<Orb_Block *>(parent)->m_Blocks, object);
+  case Orb_Kind::Pin:
+    return AddUnique(static_cast<Orb_Block *>(parent)->m_Pins, object);
+  case Orb_Kind::Signal:
+    return AddUnique(static_cast<Orb_Block *>(parent)->m_Signals, object);
+  case Orb_Kind::Network:
+    return AddUnique(static_cast<Orb_View *>(parent)->m_Networks, object);
+  }
+  return false;
+}
+
 void Orb_Model::Unlink(Orb_Persistent *object) {
   Orb_Persistent *parent = object->GetParentObject();
   switch (object->GetKind()) {
@@ -599,61 +622,35 @@ void Orb_Model::Unlink(Orb_Persistent *object) {
 }
 
 void Orb_Model::Free(Orb_Persistent *object, bool keepLinks) noexcept {
-  switch (object->GetKind()) {
-  case Orb_Kind::DesignMgr:
-    for (Orb_Design *design : static_cast<Orb_DesignMgr *>(object)->GetDesigns())
-      Free(design, false);
-    break;
-  case Orb_Kind::Design:
-    for (Orb_View *view : static_cast<Orb_Design *>(object)->GetViews())
-      Free(view, false);
-    break;
-  case Orb_Kind::View: {
-    auto *view = static_cast<Orb_View *>(object);
-    for (Orb_Network *network : view->GetNetworks())
-      Free(network, false);
-    if (view->m_pTopBlock)
-      Free(view->m_pTopBlock, false);
-    break;
-  }
-  case Orb_Kind::Block: {
-    auto *block = static_cast<Orb_Block *>(object);
-    // Signals before pins: a signal lets go of all its pins at once, so the
-    // pins connected to it (its block's and its children's) have nothing to
-    // undo.
-    for (Orb_Signal *signal : block->GetSignals())
-      Free(signal, keepLinks);
-    for (Orb_Pin *pin : block->GetPins())
-      Free(pin, keepLinks);
-    for (Orb_Block *child : block->GetBlocks())
-      Free(child, keepLinks);
-    break;
-  }
-  case Orb_Kind::Pin:
-    if (keepLinks) {
+  // Connections and network memberships never leave a view: inside a view
+  // that goes whole, nothing needs unhooking.
+  bool const inner = keepLinks && object->GetKind() != Orb_Kind::View;
+  Orb_ForEachChild(object, [this, inner](Orb_Persistent *child) { Free(child, inner); });
+  if (keepLinks) {
+    switch (object->GetKind()) {
+    case Orb_Kind::Pin: {
       auto *pin = static_cast<Orb_Pin *>(object);
       pin->Unlink(pin->m_pSignal);
       pin->Unlink(pin->m_pInnerSignal);
+      break;
     }
-    break;
-  case Orb_Kind::Signal: {
-    auto *signal = static_cast<Orb_Signal *>(object);
-    if (!keepLinks)
+    case Orb_Kind::Signal: {
+      auto *signal = static_cast<Orb_Signal *>(object);
+      for (Orb_Pin *pin : signal->m_Pins)
+        (pin->GetParent() == signal->GetParent() ? pin->m_pInnerSignal : pin->m_pSignal) = nullptr;
+      if (signal->m_pNetwork)
+        signal->m_pNetwork->RemoveSignal(signal);
       break;
-    for (Orb_Pin *pin : signal->m_Pins)
-      (pin->GetParent() == signal->GetParent() ? pin->m_pInnerSignal : pin->m_pSignal) = nullptr;
-    if (signal->m_pNetwork)
-      signal->m_pNetwork->RemoveSignal(signal);
-    break;
-  }
-  case Orb_Kind::Network: {
-    auto *network = static_cast<Orb_Network *>(object);
-    if (!keepLinks)
+    }
+    case Orb_Kind::Network: {
+      auto *network = static_cast<Orb_Network *>(object);
+      for (Orb_Signal *signal : network->m_Signals)
+        signal->m_pNetwork = nullptr;
       break;
-    for (Orb_Signal *signal : network->m_Signals)
-      signal->m_pNetwork = nullptr;
-    break;
-  }
+    }
+    default:
+      break;
+    }
   }
   // A client made for the object after its delete event (a handler that
   // specialized a dying sibling) goes with it.

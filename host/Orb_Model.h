@@ -281,16 +281,17 @@ private:
   Orb_NamedList<Orb_Design> m_Designs;
 };
 
-// Visits the object and everything it owns, children before parents: a
+// Calls `visit` on each object that `object` owns directly, in host order: a
 // design manager's designs, a design's views, a view's networks and then its
-// block tree, a block's pins, signals and child blocks; each object after
-// what it owns. Containers are read by index with their size read afresh, so
-// a visit that removes objects (under an Orb_Model::FreeHold, which keeps
-// them in memory) may make the walk miss some, but never read freed memory.
-template <class F> void Orb_VisitPostOrder(Orb_Persistent *object, F const &visit) {
+// top block, a block's pins, then its signals, then its child blocks. The one
+// place that knows the shape of the tree. Containers are read by index with
+// their size read afresh, so a visit that removes objects (under an
+// Orb_Model::FreeHold, which keeps them in memory) may make the walk miss
+// some, but never read freed memory.
+template <class F> void Orb_ForEachChild(Orb_Persistent *object, F const &visit) {
   auto each = [&visit](auto const &items) {
     for (std::size_t i = 0; i < items.size(); ++i)
-      Orb_VisitPostOrder(items[i], visit);
+      visit(items[i]);
   };
   switch (object->GetKind()) {
   case Orb_Kind::DesignMgr:
@@ -303,7 +304,7 @@ template <class F> void Orb_VisitPostOrder(Orb_Persistent *object, F const &visi
     auto *view = static_cast<Orb_View *>(object);
     each(view->GetNetworks());
     if (view->GetBlock())
-      Orb_VisitPostOrder(view->GetBlock(), visit);
+      visit(view->GetBlock());
     break;
   }
   case Orb_Kind::Block: {
@@ -318,6 +319,13 @@ template <class F> void Orb_VisitPostOrder(Orb_Persistent *object, F const &visi
   case Orb_Kind::Network:
     break;
   }
+}
+
+// Visits the object and everything it owns, children before parents, each
+// object after what it owns, in the order of Orb_ForEachChild. Recursion
+// goes only as deep as blocks nest (Orb_MaxBlockDepth).
+template <class F> void Orb_VisitPostOrder(Orb_Persistent *object, F const &visit) {
+  Orb_ForEachChild(object, [&visit](Orb_Persistent *child) { Orb_VisitPostOrder(child, visit); });
   visit(object);
 }
 
@@ -447,12 +455,19 @@ private:
 
   // Fires OnCreate for a new object; on a throw deletes it and rethrows.
   template <class T> T *Announce(T *object);
+  // Links a new object (of `kind`, for the message) and announces it. A
+  // sibling of the same name frees the object and throws Orb_Exception.
+  template <class T> T *Adopt(T *object, char const *kind);
   // Fires OnLoad for the object in every subscribed context that has no
   // client for it yet.
   void AnnounceLoad(Orb_Persistent *object);
   void AnnounceLoadTree(Orb_DesignMgr *designMgr);
   void FireDelete(Orb_Persistent *object);
-  // Removes the object from its parent's containers.
+  // The one place that puts a new object into its parent's container (a
+  // view's top block into the view) and takes it out again. Link returns
+  // false and adds nothing when a sibling of the same kind has the object's
+  // name (or the view has a top block).
+  bool Link(Orb_Persistent *object);
   void Unlink(Orb_Persistent *object);
   // Frees the object and its subtree without events, with any client that
   // some context still holds for them. Connections and network memberships
