@@ -191,10 +191,10 @@ void EnsureFile(Workload &w) {
   if (!w.path.empty())
     return;
   EnsureCreated(w);
-  std::string const path = (std::filesystem::temp_directory_path() /
-                            ("Orb_HostBench." + std::to_string(::getpid()) + "." +
-                             std::to_string(w.blocks) + ".db"))
-                               .string();
+  std::string const path =
+      (std::filesystem::temp_directory_path() /
+       ("Orb_HostBench." + std::to_string(::getpid()) + "." + std::to_string(w.blocks) + ".db"))
+          .string();
   w.created->Save(path.c_str());
   w.path = path;
 }
@@ -221,8 +221,8 @@ void EnsureOpenedTdm(Workload &w) {
 
 // Runs one phase per iteration: `setup` untimed, then `phase` measured.
 template <class Setup, class Phase>
-void RunPhase(benchmark::State &state, Setup const &setup, Phase const &phase,
-              std::int64_t divisor, bool memory) {
+void RunPhase(benchmark::State &state, Setup const &setup, Phase const &phase, std::int64_t divisor,
+              bool memory) {
   Workload &w = WorkloadOf(state.range(0));
   for (auto _ : state) {
     setup(w);
@@ -286,8 +286,7 @@ void BM_HostDelete(benchmark::State &state) {
 
 void BM_HostTeardown(benchmark::State &state) {
   RunPhase(
-      state, [](Workload &w) { EnsureOpened(w); }, [](Workload &w) { w.opened.reset(); }, 1,
-      false);
+      state, [](Workload &w) { EnsureOpened(w); }, [](Workload &w) { w.opened.reset(); }, 1, false);
 }
 
 void BM_HostOpenTdm(benchmark::State &state) {
@@ -305,8 +304,8 @@ void BM_HostOpenTdm(benchmark::State &state) {
 
 void BM_HostTeardownTdm(benchmark::State &state) {
   RunPhase(
-      state, [](Workload &w) { EnsureOpenedTdm(w); }, [](Workload &w) { w.openedTdm.reset(); },
-      1, false);
+      state, [](Workload &w) { EnsureOpenedTdm(w); }, [](Workload &w) { w.openedTdm.reset(); }, 1,
+      false);
 }
 
 // Small sizes run more often: their times are short and noisy.

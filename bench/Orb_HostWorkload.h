@@ -31,8 +31,7 @@ inline constexpr char const *kTop = "top";
 // The view, made with its design manager and design in `model`.
 inline Orb_View *MakeView(Orb_Model &model) {
   Lum_TdmModel stamps(&model);
-  Lum_TdmView *view =
-      stamps.CreateDesignMgr(kDesignMgr)->CreateDesign(kDesign)->CreateView(kView);
+  Lum_TdmView *view = stamps.CreateDesignMgr(kDesignMgr)->CreateDesign(kDesign)->CreateView(kView);
   return view->GetOrbView();
 }
 

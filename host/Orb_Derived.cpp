@@ -353,7 +353,7 @@ Orb_ModelDerived::~Orb_ModelDerived() {
     // host objects in memory while the walk goes on, and the walk looks each
     // client up when it gets there.
     Orb_Model::FreeHold hold(*model);
-    std::vector<Orb_DesignMgr *> const &designMgrs = model->GetDesignMgrs();
+    auto const designMgrs = model->GetDesignMgrs();
     for (std::size_t i = 0; i < designMgrs.size(); ++i)
       Orb_VisitPostOrder(designMgrs[i],
                          [this](Orb_Persistent *object) { delete GetClient(object); });

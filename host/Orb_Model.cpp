@@ -127,18 +127,17 @@ void Orb_Pin::Link(Orb_Signal *&side, Orb_Signal *signal) {
     return;
   // Room first, so that running out of memory changes nothing.
   if (signal)
-    signal->m_Pins.reserve(signal->m_Pins.size() + 1);
+    signal->m_Pins.Reserve(1);
   Unlink(side);
   side = signal;
   if (signal)
-    signal->m_Pins.push_back(this);
+    signal->m_Pins.Add(this);
 }
 
 void Orb_Pin::Unlink(Orb_Signal *&side) noexcept {
   if (!side)
     return;
-  auto &pins = side->m_Pins;
-  pins.erase(std::find(pins.begin(), pins.end(), this));
+  side->m_Pins.Remove(this);
   side = nullptr;
 }
 
@@ -160,14 +159,14 @@ void Orb_Network::AddSignal(Orb_Signal *signal) {
                         "A network can only hold signals of its own view.");
   if (signal->m_pNetwork)
     signal->m_pNetwork->RemoveSignal(signal);
-  m_Signals.push_back(signal);
+  m_Signals.Add(signal);
   signal->m_pNetwork = this;
 }
 
 void Orb_Network::RemoveSignal(Orb_Signal *signal) {
   if (!signal || signal->m_pNetwork != this)
     return;
-  m_Signals.erase(std::find(m_Signals.begin(), m_Signals.end(), signal));
+  m_Signals.Remove(signal);
   signal->m_pNetwork = nullptr;
 }
 
@@ -227,9 +226,7 @@ void Orb_Block::DeleteSignal(Orb_Signal *signal) {
 }
 
 void Orb_Block::SortPins(Orb_SortFtor<Orb_Pin> const &ftor) {
-  auto &pins = m_Pins.MutableItems();
-  std::stable_sort(pins.begin(), pins.end(),
-                   [&ftor](Orb_Pin const *a, Orb_Pin const *b) { return ftor(a, b); });
+  m_Pins.StableSort([&ftor](Orb_Pin const *a, Orb_Pin const *b) { return ftor(a, b); });
 }
 
 Orb_View::Orb_View(Orb_Model *model, Orb_Design *parent, std::string name)
@@ -477,11 +474,11 @@ void Orb_Model::AnnounceLoadTree(Orb_DesignMgr *designMgr) {
   // one view at a time.
   assert(m_HoldDepth > 0 && "AnnounceLoadTree needs a FreeHold");
   AnnounceLoad(designMgr);
-  std::vector<Orb_Design *> const designs = designMgr->GetDesigns();
+  std::vector<Orb_Design *> const designs = designMgr->GetDesigns().ToVector();
   std::vector<Orb_Persistent *> objects;
   for (Orb_Design *design : designs) {
     AnnounceLoad(design);
-    std::vector<Orb_View *> const views = design->GetViews();
+    std::vector<Orb_View *> const views = design->GetViews().ToVector();
     for (Orb_View *view : views) {
       AnnounceLoad(view);
       if (view->m_Dying)
@@ -489,7 +486,8 @@ void Orb_Model::AnnounceLoadTree(Orb_DesignMgr *designMgr) {
       objects.clear();
       if (view->GetBlock())
         CollectBlockTree(view->GetBlock(), objects);
-      objects.insert(objects.end(), view->GetNetworks().begin(), view->GetNetworks().end());
+      auto const networks = view->GetNetworks();
+      objects.insert(objects.end(), networks.begin(), networks.end());
       for (Orb_Persistent *object : objects)
         AnnounceLoad(object);
     }
@@ -551,27 +549,16 @@ void Orb_Model::ReleaseHold() noexcept {
   --m_HoldDepth;
 }
 
-namespace {
-
-// Adds to a named list unless a sibling has the name.
-template <class T> bool AddUnique(Orb_NamedList<T> &list, Orb_Persistent *object) {
-  if (list.Find(object->GetNameString()))
-    return false;
-  list.Add(static_cast<T *>(object));
-  return true;
-}
-
-} // namespace
-
 bool Orb_Model::Link(Orb_Persistent *object) {
   Orb_Persistent *parent = object->GetParentObject();
   switch (object->GetKind()) {
   case Orb_Kind::DesignMgr:
-    return AddUnique(m_DesignMgrs, object);
+    return m_DesignMgrs.AddUnique(static_cast<Orb_DesignMgr *>(object));
   case Orb_Kind::Design:
-    return AddUnique(static_cast<Orb_DesignMgr *>(parent)->m_Designs, object);
+    return static_cast<Orb_DesignMgr *>(parent)->m_Designs.AddUnique(
+        static_cast<Orb_Design *>(object));
   case Orb_Kind::View:
-    return AddUnique(static_cast<Orb_Design *>(parent)->m_Views, object);
+    return static_cast<Orb_Design *>(parent)->m_Views.AddUnique(static_cast<Orb_View *>(object));
   case Orb_Kind::Block:
     if (parent->GetKind() == Orb_Kind::View) {
       auto *view = static_cast<Orb_View *>(parent);
@@ -580,13 +567,14 @@ bool Orb_Model::Link(Orb_Persistent *object) {
       view->m_pTopBlock = static_cast<Orb_Block *>(object);
       return true;
     }
-    return AddUnique(static_cast<Orb_Block *>(parent)->m_Blocks, object);
+    return static_cast<Orb_Block *>(parent)->m_Blocks.AddUnique(static_cast<Orb_Block *>(object));
   case Orb_Kind::Pin:
-    return AddUnique(static_cast<Orb_Block *>(parent)->m_Pins, object);
+    return static_cast<Orb_Block *>(parent)->m_Pins.AddUnique(static_cast<Orb_Pin *>(object));
   case Orb_Kind::Signal:
-    return AddUnique(static_cast<Orb_Block *>(parent)->m_Signals, object);
+    return static_cast<Orb_Block *>(parent)->m_Signals.AddUnique(static_cast<Orb_Signal *>(object));
   case Orb_Kind::Network:
-    return AddUnique(static_cast<Orb_View *>(parent)->m_Networks, object);
+    return static_cast<Orb_View *>(parent)->m_Networks.AddUnique(
+        static_cast<Orb_Network *>(object));
   }
   return false;
 }
@@ -636,7 +624,7 @@ void Orb_Model::Free(Orb_Persistent *object, bool keepLinks) noexcept {
     }
     case Orb_Kind::Signal: {
       auto *signal = static_cast<Orb_Signal *>(object);
-      for (Orb_Pin *pin : signal->m_Pins)
+      for (Orb_Pin *pin : signal->m_Pins.Range())
         (pin->GetParent() == signal->GetParent() ? pin->m_pInnerSignal : pin->m_pSignal) = nullptr;
       if (signal->m_pNetwork)
         signal->m_pNetwork->RemoveSignal(signal);
@@ -644,7 +632,7 @@ void Orb_Model::Free(Orb_Persistent *object, bool keepLinks) noexcept {
     }
     case Orb_Kind::Network: {
       auto *network = static_cast<Orb_Network *>(object);
-      for (Orb_Signal *signal : network->m_Signals)
+      for (Orb_Signal *signal : network->m_Signals.Range())
         signal->m_pNetwork = nullptr;
       break;
     }

@@ -89,7 +89,7 @@ private:
   explicit Orb_ModelIO(ByteWriter *out) : m_pOut(out) {}
   explicit Orb_ModelIO(ByteReader *in) : m_pIn(in) {}
 
-  static void FreeDesignMgrs(Orb_Model &model, std::vector<Orb_DesignMgr *> const &designMgrs);
+  static void FreeDesignMgrs(Orb_Model &model, Orb_Range<Orb_DesignMgr> designMgrs);
   // Moves the section's design managers into its model, without events.
   static std::vector<Orb_DesignMgr *> Commit(Section &section);
   static void Rollback(Orb_Model &model, std::vector<Orb_DesignMgr *> const &loaded,
@@ -231,7 +231,7 @@ void Orb_ModelIO::WriteView(Orb_View const *view) {
   if (view->GetBlock())
     WriteBlock(view->GetBlock());
   for (std::size_t s = 0; s < m_ViewSignals.size(); ++s) {
-    std::vector<Orb_Pin *> const &pins = m_ViewSignals[s]->GetPins();
+    auto const pins = m_ViewSignals[s]->GetPins();
     if (pins.empty())
       continue;
     m_pOut->Tag('C');
@@ -364,16 +364,17 @@ void Orb_ModelIO::Open(Orb_Model &model, std::string const &path) {
   model.m_pOpenJournal = nullptr;
 }
 
-void Orb_ModelIO::FreeDesignMgrs(Orb_Model &model, std::vector<Orb_DesignMgr *> const &designMgrs) {
+void Orb_ModelIO::FreeDesignMgrs(Orb_Model &model, Orb_Range<Orb_DesignMgr> designMgrs) {
   for (Orb_DesignMgr *designMgr : designMgrs)
     model.Free(designMgr);
 }
 
 std::vector<Orb_DesignMgr *> Orb_ModelIO::Commit(Section &section) {
-  std::vector<Orb_DesignMgr *> loaded = section.designMgrs.Items();
-  section.designMgrs = Orb_NamedList<Orb_DesignMgr>();
+  std::vector<Orb_DesignMgr *> loaded = section.designMgrs.Items().ToVector();
+  section.designMgrs.Clear();
+  // Names were checked against the model's when read.
   for (Orb_DesignMgr *designMgr : loaded)
-    section.model.m_DesignMgrs.Add(designMgr);
+    section.model.m_DesignMgrs.AddUnique(designMgr);
   return loaded;
 }
 
@@ -431,7 +432,7 @@ void Orb_ModelIO::ReadModel(Section &section, bool companion) {
       if (section.designMgrs.Find(name))
         Duplicate("design manager", name, nullptr);
       auto *designMgr = new Orb_DesignMgr(&section.model, std::move(name));
-      section.designMgrs.Add(designMgr);
+      section.designMgrs.AddUnique(designMgr);
       ReadDesignMgr(designMgr);
     } else if (tag == 'K') {
       if (companion)
