@@ -89,11 +89,20 @@ public:
   }
   Orb_Range<T, SlotOf> Range() const { return Orb_Range<T, SlotOf>(*this); }
 
-  // Room for `more` elements beyond what the list holds (a reader that knows
-  // how many follow reserves exactly).
-  void Reserve(std::size_t more) { m_Raw.reserve(m_Raw.size() + more); }
+  // Room for `more` elements beyond what the list holds, growing
+  // geometrically so that adding one at a time stays linear.
+  void Reserve(std::size_t more) {
+    if (m_Raw.size() + more > m_Raw.capacity())
+      m_Raw.reserve(std::max(m_Raw.size() + more, 2 * m_Raw.capacity()));
+  }
+  // Room for exactly `more` elements beyond what the list holds, for a
+  // reader that knows how many follow.
+  void ReserveExact(std::size_t more) { m_Raw.reserve(m_Raw.size() + more); }
   // Appends. Throws std::bad_alloc and changes nothing when out of memory.
   void Add(T *item) {
+    // A first room of four saves the steps through one and two.
+    if (m_Raw.size() == m_Raw.capacity())
+      m_Raw.reserve(m_Raw.empty() ? 4 : 2 * m_Raw.capacity());
     m_Raw.push_back(item);
     auto const slot = static_cast<std::uint32_t>(m_Raw.size() - 1);
     SlotOf()(item, this) = slot;

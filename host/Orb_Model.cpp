@@ -89,10 +89,10 @@ char const *Orb_PinDirectionName(Orb_Pin::PIN_DIRECTION direction) {
 
 Orb_Persistent::Orb_Persistent(Orb_Model *model, Orb_Kind kind, Orb_Persistent *parent,
                                std::string name)
-    : m_Name(std::move(name)), m_pModel(model), m_pParent(parent),
-      m_BridgeId(model->AllocateBridgeId(kind)), m_Kind(static_cast<std::uint8_t>(kind)) {}
+    : m_Name(std::move(name)), m_pModel(model), m_pParent(parent), m_BridgeId(0),
+      m_Kind(static_cast<std::uint8_t>(kind)) {}
 
-Orb_Persistent::~Orb_Persistent() { m_pModel->ReleaseBridgeId(GetKind(), m_BridgeId); }
+Orb_Persistent::~Orb_Persistent() = default;
 
 Orb_Pin::Orb_Pin(Orb_Model *model, Orb_Block *parent, std::string name, PIN_DIRECTION direction)
     : Orb_Persistent(model, Orb_Kind::Pin, parent, std::move(name)), m_Direction(direction) {}
@@ -195,19 +195,19 @@ Orb_Block *Orb_Block::CreateBlock(char const *name, int /*flags*/) {
                          "> would lie deeper than " + std::to_string(Orb_MaxBlockDepth) +
                          " levels.")
                             .c_str());
-  return GetModel()->Adopt(new Orb_Block(GetModel(), this, m_pView, name), "block");
+  return GetModel()->Adopt(GetModel()->Make<Orb_Block>(GetModel(), this, m_pView, name), "block");
 }
 
 Orb_Pin *Orb_Block::CreatePin(char const *name, Orb_Pin::PIN_DIRECTION direction) {
   CheckName(name, "pin");
   CheckNotDying(this, "pin", name);
-  return GetModel()->Adopt(new Orb_Pin(GetModel(), this, name, direction), "pin");
+  return GetModel()->Adopt(GetModel()->Make<Orb_Pin>(GetModel(), this, name, direction), "pin");
 }
 
 Orb_Signal *Orb_Block::CreateSignal(char const *name) {
   CheckName(name, "signal");
   CheckNotDying(this, "signal", name);
-  return GetModel()->Adopt(new Orb_Signal(GetModel(), this, name), "signal");
+  return GetModel()->Adopt(GetModel()->Make<Orb_Signal>(GetModel(), this, name), "signal");
 }
 
 void Orb_Block::DeleteBlock(Orb_Block *child) {
@@ -239,13 +239,13 @@ Orb_Block *Orb_View::CreateTopBlock(char const *name) {
   CheckNotDying(this, "block", name);
   if (m_pTopBlock)
     throw Orb_Exception(kSource, __LINE__, GetName(), "The view already has a top block.");
-  return GetModel()->Adopt(new Orb_Block(GetModel(), this, this, name), "block");
+  return GetModel()->Adopt(GetModel()->Make<Orb_Block>(GetModel(), this, this, name), "block");
 }
 
 Orb_Network *Orb_View::CreateNetwork(char const *name) {
   CheckName(name, "network");
   CheckNotDying(this, "network", name);
-  return GetModel()->Adopt(new Orb_Network(GetModel(), this, name), "network");
+  return GetModel()->Adopt(GetModel()->Make<Orb_Network>(GetModel(), this, name), "network");
 }
 
 void Orb_View::DeleteTopBlock() {
@@ -268,7 +268,7 @@ Orb_DesignMgr *Orb_Design::GetParent() const {
 Orb_View *Orb_Design::CreateView(char const *name) {
   CheckName(name, "view");
   CheckNotDying(this, "view", name);
-  return GetModel()->Adopt(new Orb_View(GetModel(), this, name), "view");
+  return GetModel()->Adopt(GetModel()->Make<Orb_View>(GetModel(), this, name), "view");
 }
 
 void Orb_Design::DeleteView(Orb_View *view) {
@@ -282,7 +282,7 @@ Orb_DesignMgr::Orb_DesignMgr(Orb_Model *model, std::string name)
 Orb_Design *Orb_DesignMgr::CreateDesign(char const *name) {
   CheckName(name, "design");
   CheckNotDying(this, "design", name);
-  return GetModel()->Adopt(new Orb_Design(GetModel(), this, name), "design");
+  return GetModel()->Adopt(GetModel()->Make<Orb_Design>(GetModel(), this, name), "design");
 }
 
 void Orb_DesignMgr::DeleteDesign(Orb_Design *design) {
@@ -299,7 +299,13 @@ std::unique_ptr<Orb_Model> Orb_ModelCompanion::ReleaseTakenModel() { return null
 
 Orb_Model::Orb_Model(char const *name, char const *dbName, char const *path, bool readOnly)
     : m_Name(name ? name : ""), m_DbName(dbName ? dbName : ""), m_Path(path ? path : ""),
-      m_ReadOnly(readOnly) {}
+      m_ReadOnly(readOnly) {
+  std::size_t const sizes[Orb_KindCount] = {
+      sizeof(Orb_DesignMgr), sizeof(Orb_Design), sizeof(Orb_View),   sizeof(Orb_Block),
+      sizeof(Orb_Pin),       sizeof(Orb_Signal), sizeof(Orb_Network)};
+  for (unsigned k = 0; k < Orb_KindCount; ++k)
+    m_Pools[k].SetSlotSize(sizes[k]);
+}
 
 Orb_Model::~Orb_Model() {
   assert(m_Contexts.empty() && "Orb_Model destroyed while client models are attached");
@@ -308,14 +314,17 @@ Orb_Model::~Orb_Model() {
   // before this model's objects.
   m_Companions.clear();
   m_LoadedCompanions.clear();
-  // Free leaves the containers alone, so the list can be walked as it is.
+  // The pools go whole: objects are destroyed without giving back their
+  // slots. Free leaves the containers alone, so the list can be walked as
+  // it is.
+  m_TearingDown = true;
   for (Orb_DesignMgr *designMgr : m_DesignMgrs.Items())
     Free(designMgr, false);
 }
 
 Orb_DesignMgr *Orb_Model::CreateDesignMgr(char const *name) {
   CheckName(name, "design manager");
-  return Adopt(new Orb_DesignMgr(this, name), "design manager");
+  return Adopt(Make<Orb_DesignMgr>(this, name), "design manager");
 }
 
 void Orb_Model::DeleteDesignMgr(Orb_DesignMgr *designMgr) {
@@ -398,25 +407,13 @@ std::size_t Orb_Model::GetObjectCount(Orb_Kind kind) const {
   return m_ObjectCount[static_cast<unsigned>(kind)];
 }
 
-unsigned Orb_Model::AllocateBridgeId(Orb_Kind kind) {
-  auto const k = static_cast<unsigned>(kind);
-  ++m_ObjectCount[k];
-  if (!m_FreeBridgeIds[k].empty()) {
-    unsigned const id = m_FreeBridgeIds[k].back();
-    m_FreeBridgeIds[k].pop_back();
-    return id;
-  }
-  return m_NextBridgeId[k]++;
-}
-
-void Orb_Model::ReleaseBridgeId(Orb_Kind kind, unsigned id) noexcept {
-  auto const k = static_cast<unsigned>(kind);
+void Orb_Model::Destroy(Orb_Persistent *object) noexcept {
+  auto const k = static_cast<unsigned>(object->GetKind());
+  unsigned const id = object->m_BridgeId;
+  object->~Orb_Persistent();
   --m_ObjectCount[k];
-  // Runs in destructors. Without memory the id is just never reused.
-  try {
-    m_FreeBridgeIds[k].push_back(id);
-  } catch (std::bad_alloc const &) {
-  }
+  if (!m_TearingDown)
+    m_Pools[k].Release(object, id);
 }
 
 template <class T> T *Orb_Model::Announce(T *object) {
@@ -435,7 +432,7 @@ template <class T> T *Orb_Model::Adopt(T *object, char const *kind) {
   if (!Link(object)) {
     std::string const name = object->GetNameString();
     Orb_Persistent *parent = object->GetParentObject();
-    delete object;
+    Destroy(object);
     ThrowDuplicate(parent, kind, name.c_str());
   }
   return Announce(object);
@@ -644,7 +641,7 @@ void Orb_Model::Free(Orb_Persistent *object, bool keepLinks) noexcept {
   // specialized a dying sibling) goes with it.
   for (std::size_t i = 0; i < m_Contexts.size(); ++i)
     delete m_Contexts[i]->GetClient(object);
-  delete object;
+  Destroy(object);
 }
 
 // ---------------------------------------------------------------------------
@@ -656,4 +653,48 @@ void Orb_Persistent::DebugDump(Port::Stream *stream, int indent) const {
   for (Orb_ModelDerived *context : m_pModel->GetContexts())
     if (Orb_ClientObject *client = context->GetClient(this))
       client->DebugDumpCallback(stream, indent + 1);
+}
+
+// ---------------------------------------------------------------------------
+// Pools
+
+Orb_ObjectPool::~Orb_ObjectPool() {
+  for (void *chunk : m_Chunks)
+    ::operator delete(chunk);
+}
+
+void Orb_ObjectPool::SetSlotSize(std::size_t size) {
+  assert(m_Chunks.empty() && "Orb_ObjectPool::SetSlotSize after the first allocation");
+  // Host objects hold pointers and integers: pointer alignment is enough.
+  std::size_t const align = alignof(void *);
+  m_SlotSize = (std::max(size, sizeof(FreeSlot)) + align - 1) / align * align;
+}
+
+void *Orb_ObjectPool::Allocate(unsigned &id) {
+  if (m_pFree) {
+    FreeSlot *slot = m_pFree;
+    m_pFree = slot->next;
+    id = slot->id;
+    return slot;
+  }
+  if (m_pNext == m_pEnd) {
+    std::size_t const bytes = m_NextChunkSlots * m_SlotSize;
+    m_Chunks.reserve(m_Chunks.size() + 1);
+    auto *chunk = static_cast<unsigned char *>(::operator new(bytes));
+    m_Chunks.push_back(chunk);
+    m_pNext = chunk;
+    m_pEnd = chunk + bytes;
+    m_Bytes += bytes;
+    // Chunks double up to about a megabyte: small models stay small.
+    if (bytes < (std::size_t(1) << 20))
+      m_NextChunkSlots *= 2;
+  }
+  void *slot = m_pNext;
+  m_pNext += m_SlotSize;
+  id = m_NextId++;
+  return slot;
+}
+
+void Orb_ObjectPool::Release(void *slot, unsigned id) noexcept {
+  m_pFree = new (slot) FreeSlot{m_pFree, id};
 }

@@ -5,6 +5,7 @@
 // Orb_Model. Clients attach through Orb_ModelDerived (Orb_Derived.h).
 
 #include "Orb_List.h"
+#include "Orb_Pool.h"
 #include "Orb_Property.h"
 
 #include <algorithm>
@@ -16,6 +17,7 @@
 #include <string>
 #include <string_view>
 #include <unordered_map>
+#include <utility>
 #include <vector>
 
 class Orb_Block;
@@ -182,6 +184,8 @@ struct Orb_NetworkSlot {
 
 class LUM_PLATFORM_API Orb_Pin : public Orb_Persistent {
 public:
+  static constexpr Orb_Kind kKind = Orb_Kind::Pin;
+
   enum PIN_DIRECTION { PIN_INPUT, PIN_OUTPUT, PIN_BIDIRECTIONAL };
 
   PIN_DIRECTION GetDirection() const { return m_Direction; }
@@ -220,6 +224,8 @@ LUM_PLATFORM_API char const *Orb_PinDirectionName(Orb_Pin::PIN_DIRECTION directi
 
 class LUM_PLATFORM_API Orb_Signal : public Orb_Persistent {
 public:
+  static constexpr Orb_Kind kKind = Orb_Kind::Signal;
+
   Orb_Block *GetParent() const;
   // The network the signal belongs to, or null.
   Orb_Network *GetNetwork() const { return m_pNetwork; }
@@ -254,6 +260,8 @@ inline std::uint32_t &Orb_NetworkSlot::operator()(Orb_Signal *signal, void const
 
 class LUM_PLATFORM_API Orb_Network : public Orb_Persistent {
 public:
+  static constexpr Orb_Kind kKind = Orb_Kind::Network;
+
   Orb_View *GetParent() const;
   // The network's signals in host order.
   Orb_Range<Orb_Signal, Orb_NetworkSlot> GetSignals() const { return m_Signals.Range(); }
@@ -273,6 +281,8 @@ private:
 
 class LUM_PLATFORM_API Orb_Block : public Orb_Persistent {
 public:
+  static constexpr Orb_Kind kKind = Orb_Kind::Block;
+
   // The parent block, or null for a view's top block.
   Orb_Block *GetParent() const;
   Orb_View *GetView() const { return m_pView; }
@@ -322,6 +332,8 @@ private:
 
 class LUM_PLATFORM_API Orb_View : public Orb_Persistent {
 public:
+  static constexpr Orb_Kind kKind = Orb_Kind::View;
+
   Orb_Design *GetParent() const;
   // The top block, or null.
   Orb_Block *GetBlock() const { return m_pTopBlock; }
@@ -345,6 +357,8 @@ private:
 
 class LUM_PLATFORM_API Orb_Design : public Orb_Persistent {
 public:
+  static constexpr Orb_Kind kKind = Orb_Kind::Design;
+
   Orb_DesignMgr *GetParent() const;
   Orb_Range<Orb_View> GetViews() const { return m_Views.Items(); }
   Orb_View *GetViewByName(char const *name) const { return m_Views.Find(name); }
@@ -361,6 +375,8 @@ private:
 
 class LUM_PLATFORM_API Orb_DesignMgr : public Orb_Persistent {
 public:
+  static constexpr Orb_Kind kKind = Orb_Kind::DesignMgr;
+
   Orb_Range<Orb_Design> GetDesigns() const { return m_Designs.Items(); }
   Orb_Design *GetDesignByName(char const *name) const { return m_Designs.Find(name); }
   Orb_Design *CreateDesign(char const *name);
@@ -542,8 +558,11 @@ private:
   };
   void RestoreCompanions(OpenJournal &journal) noexcept;
 
-  unsigned AllocateBridgeId(Orb_Kind kind);
-  void ReleaseBridgeId(Orb_Kind kind, unsigned id) noexcept;
+  // Builds a host object of class T in its kind's pool and gives it the
+  // slot's bridge id; Destroy destroys it and gives the slot back (except
+  // while the model itself goes, when the pools go whole).
+  template <class T, class... Args> T *Make(Args &&...args);
+  void Destroy(Orb_Persistent *object) noexcept;
 
   // Fires OnCreate for a new object; on a throw deletes it and rethrows.
   template <class T> T *Announce(T *object);
@@ -574,8 +593,8 @@ private:
   Orb_NamedList<Orb_DesignMgr> m_DesignMgrs;
   std::vector<Orb_ModelDerived *> m_Contexts;
   std::vector<Orb_ModelDerived *> m_Subscribers;
-  unsigned m_NextBridgeId[Orb_KindCount] = {};
-  std::vector<unsigned> m_FreeBridgeIds[Orb_KindCount];
+  Orb_ObjectPool m_Pools[Orb_KindCount];
+  bool m_TearingDown = false;
   std::size_t m_ObjectCount[Orb_KindCount] = {};
   std::map<std::string, std::unique_ptr<Orb_ModelCompanion>> m_Companions;
   std::map<std::string, std::unique_ptr<Orb_Model>> m_LoadedCompanions;
@@ -586,3 +605,19 @@ private:
   // Set while an Open fires its events.
   OpenJournal *m_pOpenJournal = nullptr;
 };
+
+template <class T, class... Args> T *Orb_Model::Make(Args &&...args) {
+  auto const k = static_cast<unsigned>(T::kKind);
+  unsigned id = 0;
+  void *memory = m_Pools[k].Allocate(id);
+  T *object = nullptr;
+  try {
+    object = new (memory) T(std::forward<Args>(args)...);
+  } catch (...) {
+    m_Pools[k].Release(memory, id);
+    throw;
+  }
+  object->m_BridgeId = id;
+  ++m_ObjectCount[k];
+  return object;
+}

@@ -38,6 +38,7 @@
 #include "Orb_Derived.h"
 #include "Orb_Exception.h"
 
+#include <algorithm>
 #include <cstdint>
 #include <map>
 #include <memory>
@@ -177,10 +178,10 @@ void Orb_ModelIO::Save(Orb_Model const &model, std::string const &path) {
 void Orb_ModelIO::WriteModel(Orb_Model const &model, std::string_view const *companionKey) {
   auto const pins = static_cast<unsigned>(Orb_Kind::Pin);
   auto const signals = static_cast<unsigned>(Orb_Kind::Signal);
-  if (m_PinNumber.size() < model.m_NextBridgeId[pins])
-    m_PinNumber.resize(model.m_NextBridgeId[pins]);
-  if (m_SignalNumber.size() < model.m_NextBridgeId[signals])
-    m_SignalNumber.resize(model.m_NextBridgeId[signals]);
+  if (m_PinNumber.size() < model.m_Pools[pins].IdLimit())
+    m_PinNumber.resize(model.m_Pools[pins].IdLimit());
+  if (m_SignalNumber.size() < model.m_Pools[signals].IdLimit())
+    m_SignalNumber.resize(model.m_Pools[signals].IdLimit());
 
   m_pOut->Tag('M');
   m_pOut->Str(model.m_Name);
@@ -431,7 +432,7 @@ void Orb_ModelIO::ReadModel(Section &section, bool companion) {
         m_pIn->Refuse("holds design manager " + Quote(name) + ", which the model already has");
       if (section.designMgrs.Find(name))
         Duplicate("design manager", name, nullptr);
-      auto *designMgr = new Orb_DesignMgr(&section.model, std::move(name));
+      auto *designMgr = section.model.Make<Orb_DesignMgr>(&section.model, std::move(name));
       section.designMgrs.AddUnique(designMgr);
       ReadDesignMgr(designMgr);
     } else if (tag == 'K') {
@@ -480,7 +481,8 @@ void Orb_ModelIO::ReadContainer(Parent *parent, char childTag, char const *paren
     if (tag == childTag) {
       std::string name = ReadName(childKind);
       m_pIn->End();
-      auto *child = new Child(parent->GetModel(), parent, std::move(name));
+      auto *child =
+          parent->GetModel()->template Make<Child>(parent->GetModel(), parent, std::move(name));
       Place(child, childKind);
       (this->*readChild)(child);
       holder = nullptr;
@@ -515,7 +517,8 @@ void Orb_ModelIO::ReadView(Orb_View *view) {
       m_pIn->End();
       if (view->m_pTopBlock)
         m_pIn->Corrupt("second top block in view " + Quote(view->GetNameString()));
-      view->m_pTopBlock = new Orb_Block(view->GetModel(), view, view, std::move(name));
+      view->m_pTopBlock =
+          view->GetModel()->Make<Orb_Block>(view->GetModel(), view, view, std::move(name));
       ReadBlock(view->m_pTopBlock);
       holder = nullptr;
     } else if (tag == 'C') {
@@ -551,14 +554,14 @@ void Orb_ModelIO::ReadBlock(Orb_Block *top) {
       if (code > Orb_Pin::PIN_BIDIRECTIONAL)
         m_pIn->Corrupt("unknown direction of pin " + Quote(name));
       auto const direction = static_cast<Orb_Pin::PIN_DIRECTION>(code);
-      auto *pin = new Orb_Pin(model, block, std::move(name), direction);
+      auto *pin = model->Make<Orb_Pin>(model, block, std::move(name), direction);
       Place(pin, "pin");
       m_Pins.push_back(pin);
       holder = pin;
     } else if (tag == 'S') {
       std::string name = ReadName("signal");
       m_pIn->End();
-      auto *signal = new Orb_Signal(model, block, std::move(name));
+      auto *signal = model->Make<Orb_Signal>(model, block, std::move(name));
       Place(signal, "signal");
       m_Signals.push_back(signal);
       holder = signal;
@@ -568,7 +571,7 @@ void Orb_ModelIO::ReadBlock(Orb_Block *top) {
       if (open.size() >= Orb_MaxBlockDepth)
         m_pIn->Corrupt("block " + Quote(name) + " nested deeper than " +
                        std::to_string(Orb_MaxBlockDepth) + " levels");
-      auto *child = new Orb_Block(model, block, block->m_pView, std::move(name));
+      auto *child = model->Make<Orb_Block>(model, block, block->m_pView, std::move(name));
       Place(child, "block");
       open.push_back(child);
       holder = child;
@@ -586,7 +589,11 @@ void Orb_ModelIO::ReadBlock(Orb_Block *top) {
 
 void Orb_ModelIO::ReadConnections() {
   Orb_Signal *signal = SignalAt(m_pIn->Num());
-  for (std::uint64_t n = m_pIn->Num(); n > 0; --n) {
+  std::uint64_t const count = m_pIn->Num();
+  // The count is the file's word: no more than the view has pins.
+  signal->m_Pins.ReserveExact(
+      static_cast<std::size_t>(std::min<std::uint64_t>(count, m_Pins.size())));
+  for (std::uint64_t n = count; n > 0; --n) {
     Orb_Pin *pin = PinAt(m_pIn->Num());
     Orb_Block *block = pin->GetParent();
     bool const inner = block == signal->GetParent();
@@ -605,9 +612,12 @@ void Orb_ModelIO::ReadConnections() {
 
 Orb_Network *Orb_ModelIO::ReadNetwork(Orb_View *view) {
   std::string name = ReadName("network");
-  auto *network = new Orb_Network(view->GetModel(), view, std::move(name));
+  auto *network = view->GetModel()->Make<Orb_Network>(view->GetModel(), view, std::move(name));
   Place(network, "network");
-  for (std::uint64_t n = m_pIn->Num(); n > 0; --n) {
+  std::uint64_t const count = m_pIn->Num();
+  network->m_Signals.ReserveExact(
+      static_cast<std::size_t>(std::min<std::uint64_t>(count, m_Signals.size())));
+  for (std::uint64_t n = count; n > 0; --n) {
     Orb_Signal *signal = SignalAt(m_pIn->Num());
     if (signal->GetNetwork())
       m_pIn->Corrupt("signal " + Quote(signal->GetNameString()) + " is in two networks");

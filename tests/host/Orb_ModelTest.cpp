@@ -457,3 +457,32 @@ TEST_F(HostModelTest, ConnectionsLeaveInOrder) {
 }
 
 } // namespace
+
+namespace {
+
+// Creating and deleting blocks over and over reuses the freed slots of each
+// kind: bridge ids (slot numbers) stay as few as the objects alive at once.
+TEST_F(HostModelTest, ChurnReusesSlots) {
+  unsigned highestBlock = 0;
+  unsigned highestPin = 0;
+  for (int round = 0; round < 40; ++round) {
+    std::vector<Orb_Block *> blocks;
+    for (int i = 0; i < 25; ++i) {
+      Orb_Block *block = top->CreateBlock(("r" + std::to_string(i)).c_str());
+      Orb_Pin *pin = block->CreatePin("x", Orb_Pin::PIN_INPUT);
+      pin->Connect(s);
+      highestBlock = std::max(highestBlock, block->GetBridgeId());
+      highestPin = std::max(highestPin, pin->GetBridgeId());
+      blocks.push_back(block);
+    }
+    for (std::size_t i = blocks.size(); i-- > 0;)
+      top->DeleteBlock(blocks[i]);
+  }
+  // Top, c and the 25 of a round; the fixture's pins p, cp and the 25.
+  EXPECT_LT(highestBlock, 27u);
+  EXPECT_LT(highestPin, 27u);
+  EXPECT_EQ(Names(s->GetPins()), "p cp");
+  EXPECT_EQ(model->GetClientCount(), ObjectCount(*host));
+}
+
+} // namespace
