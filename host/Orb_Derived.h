@@ -9,6 +9,7 @@
 #include "Orb_Model.h"
 #include "Orb_Sync.h"
 
+#include <cstddef>
 #include <memory>
 #include <vector>
 
@@ -24,6 +25,12 @@ public:
 
   // Lets the client add its lines to the host's dump of its object.
   virtual void DebugDumpCallback(Port::Stream *stream, int indent) const;
+
+  // Client objects are many and small: they come from size-class free lists
+  // shared by the process (thread-safe), not from one heap block each.
+  // Sizes beyond the largest class go to the global operator new.
+  static void *operator new(std::size_t size);
+  static void operator delete(void *pointer, std::size_t size) noexcept;
 
   Orb_Context *GetContext() const { return m_pContext; }
   Orb_ModelDerived *GetClientOrbModel() const;

@@ -74,7 +74,9 @@ public:
   void DeleteProperty(char const *name);
   void DeleteProperty(Orb_Property *property);
 
-  std::vector<std::unique_ptr<Orb_Property>> const &GetProperties() const { return m_Properties; }
+  std::vector<std::unique_ptr<Orb_Property>> const &GetProperties() const {
+    return m_pProperties ? *m_pProperties : NoProperties();
+  }
 
   // Prints every property through the debug printer, one per line (list
   // entries and members indented one level deeper).
@@ -85,7 +87,11 @@ public:
   void CopyPropertiesFrom(Orb_PropertyHolder const &other);
 
 private:
+  using Properties = std::vector<std::unique_ptr<Orb_Property>>;
+  static Properties const &NoProperties();
   Orb_Property *Insert(std::unique_ptr<Orb_Property> property);
 
-  std::vector<std::unique_ptr<Orb_Property>> m_Properties;
+  // Null while the object has no property: most objects have none, and a
+  // pointer costs a third of an empty vector.
+  std::unique_ptr<Properties> m_pProperties;
 };
