@@ -5,11 +5,8 @@
 #include "Orb_Debug.h"
 #include "Orb_Exception.h"
 
-#include <algorithm>
 #include <cassert>
 #include <cstdint>
-#include <mutex>
-#include <new>
 #include <string>
 
 namespace {
@@ -214,86 +211,10 @@ void Orb_Sync::FireDelete(Orb_Persistent *object) {
 // ---------------------------------------------------------------------------
 // Client bases
 
-namespace {
-
-// Free lists of client objects by size class (multiples of 8 bytes up to
-// kLargest), carved from 64 KiB chunks. Freed blocks are kept for reuse.
-class ClientPool {
-public:
-  static constexpr std::size_t kGrain = 8;
-  static constexpr std::size_t kLargest = 256;
-
-  void *Allocate(std::size_t size) {
-    std::size_t const cls = (size + kGrain - 1) / kGrain;
-    std::lock_guard<std::mutex> const lock(m_Mutex);
-    if (Free *block = m_Free[cls]) {
-      m_Free[cls] = block->next;
-      return block;
-    }
-    std::size_t const bytes = cls * kGrain;
-    if (static_cast<std::size_t>(m_pEnd - m_pNext) < bytes) {
-      // The rest of a chunk that cannot hold this size serves smaller ones
-      // later through their free lists.
-      for (std::size_t left = static_cast<std::size_t>(m_pEnd - m_pNext) / kGrain; left > 0;) {
-        std::size_t const piece = std::min(left, kLargest / kGrain);
-        m_Free[piece] = new (m_pNext) Free{m_Free[piece]};
-        m_pNext += piece * kGrain;
-        left -= piece;
-      }
-      m_pNext = static_cast<unsigned char *>(::operator new(kChunk));
-      m_pEnd = m_pNext + kChunk;
-    }
-    void *block = m_pNext;
-    m_pNext += bytes;
-    return block;
-  }
-  void Release(void *pointer, std::size_t size) noexcept {
-    std::size_t const cls = (size + kGrain - 1) / kGrain;
-    std::lock_guard<std::mutex> const lock(m_Mutex);
-    m_Free[cls] = new (pointer) Free{m_Free[cls]};
-  }
-
-private:
-  struct Free {
-    Free *next;
-  };
-  static constexpr std::size_t kChunk = std::size_t(1) << 16;
-  std::mutex m_Mutex;
-  Free *m_Free[kLargest / kGrain + 1] = {};
-  unsigned char *m_pNext = nullptr;
-  unsigned char *m_pEnd = nullptr;
-};
-
-// Never destroyed: client objects of static models may outlive any static
-// here. Its chunks stay reachable through it.
-ClientPool &TheClientPool() {
-  static auto *pool = new ClientPool;
-  return *pool;
-}
-
-} // namespace
-
-// Under AddressSanitizer every client object is its own heap block, so
-// that leaked or freed-then-used clients are still caught.
-#if defined(__SANITIZE_ADDRESS__)
-constexpr bool kPoolClients = false;
-#else
-constexpr bool kPoolClients = true;
-#endif
-
-void *Orb_ClientObject::operator new(std::size_t size) {
-  if (!kPoolClients || size > ClientPool::kLargest)
-    return ::operator new(size);
-  return TheClientPool().Allocate(size);
-}
+void *Orb_ClientObject::operator new(std::size_t size) { return Orb_SmallAllocate(size); }
 
 void Orb_ClientObject::operator delete(void *pointer, std::size_t size) noexcept {
-  if (!pointer)
-    return;
-  if (!kPoolClients || size > ClientPool::kLargest)
-    ::operator delete(pointer);
-  else
-    TheClientPool().Release(pointer, size);
+  Orb_SmallRelease(pointer, size);
 }
 
 Orb_ClientObject::Orb_ClientObject(Orb_Context *context, Orb_Persistent *object)

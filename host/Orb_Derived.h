@@ -26,9 +26,8 @@ public:
   // Lets the client add its lines to the host's dump of its object.
   virtual void DebugDumpCallback(Port::Stream *stream, int indent) const;
 
-  // Client objects are many and small: they come from size-class free lists
-  // shared by the process (thread-safe), not from one heap block each.
-  // Sizes beyond the largest class go to the global operator new.
+  // Client objects are many and small: they come from the size-class free
+  // lists of Orb_SmallAllocate, not from one heap block each.
   static void *operator new(std::size_t size);
   static void operator delete(void *pointer, std::size_t size) noexcept;
 

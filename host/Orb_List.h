@@ -16,6 +16,7 @@
 // deletions costs, like a vector's erase, the distance between them.
 
 #include "Lum_PlatformApi.h"
+#include "Orb_Pool.h"
 
 #include <algorithm>
 #include <cassert>
@@ -136,7 +137,7 @@ private:
 
   // m_Raw[m_Start, m_Clean): elements, no holes. [m_Clean, m_Scan): holes.
   // [m_Scan, end): elements and holes not yet squeezed.
-  mutable std::vector<T *> m_Raw;
+  mutable std::vector<T *, Orb_SmallAllocator<T *>> m_Raw;
   mutable std::uint32_t m_Start = 0;
   mutable std::uint32_t m_Clean = 0;
   mutable std::uint32_t m_Scan = 0;

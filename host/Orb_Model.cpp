@@ -10,6 +10,7 @@
 #include <algorithm>
 #include <cassert>
 #include <exception>
+#include <mutex>
 #include <new>
 #include <string>
 
@@ -697,4 +698,82 @@ void *Orb_ObjectPool::Allocate(unsigned &id) {
 
 void Orb_ObjectPool::Release(void *slot, unsigned id) noexcept {
   m_pFree = new (slot) FreeSlot{m_pFree, id};
+}
+
+namespace {
+
+// Free lists by size class (multiples of 8 bytes up to Orb_SmallLimit),
+// carved from 64 KiB chunks.
+class SmallPool {
+public:
+  static constexpr std::size_t kGrain = 8;
+
+  void *Allocate(std::size_t size) {
+    std::size_t const cls = (size + kGrain - 1) / kGrain;
+    std::lock_guard<std::mutex> const lock(m_Mutex);
+    if (Free *block = m_Free[cls]) {
+      m_Free[cls] = block->next;
+      return block;
+    }
+    std::size_t const bytes = cls * kGrain;
+    if (static_cast<std::size_t>(m_pEnd - m_pNext) < bytes) {
+      // What is left of the chunk goes to the free lists of smaller classes.
+      for (std::size_t left = static_cast<std::size_t>(m_pEnd - m_pNext) / kGrain; left > 0;) {
+        std::size_t const piece = std::min(left, Orb_SmallLimit / kGrain);
+        m_Free[piece] = new (m_pNext) Free{m_Free[piece]};
+        m_pNext += piece * kGrain;
+        left -= piece;
+      }
+      m_pNext = static_cast<unsigned char *>(::operator new(kChunk));
+      m_pEnd = m_pNext + kChunk;
+    }
+    void *block = m_pNext;
+    m_pNext += bytes;
+    return block;
+  }
+  void Release(void *pointer, std::size_t size) noexcept {
+    std::size_t const cls = (size + kGrain - 1) / kGrain;
+    std::lock_guard<std::mutex> const lock(m_Mutex);
+    m_Free[cls] = new (pointer) Free{m_Free[cls]};
+  }
+
+private:
+  struct Free {
+    Free *next;
+  };
+  static constexpr std::size_t kChunk = std::size_t(1) << 16;
+  std::mutex m_Mutex;
+  Free *m_Free[Orb_SmallLimit / kGrain + 1] = {};
+  unsigned char *m_pNext = nullptr;
+  unsigned char *m_pEnd = nullptr;
+};
+
+// Never destroyed: small blocks of static models may outlive any static
+// here. Its chunks stay reachable through it.
+SmallPool &TheSmallPool() {
+  static auto *pool = new SmallPool;
+  return *pool;
+}
+
+#if defined(__SANITIZE_ADDRESS__)
+constexpr bool kPooled = false;
+#else
+constexpr bool kPooled = true;
+#endif
+
+} // namespace
+
+void *Orb_SmallAllocate(std::size_t size) {
+  if (!kPooled || size == 0 || size > Orb_SmallLimit)
+    return ::operator new(size);
+  return TheSmallPool().Allocate(size);
+}
+
+void Orb_SmallRelease(void *pointer, std::size_t size) noexcept {
+  if (!pointer)
+    return;
+  if (!kPooled || size == 0 || size > Orb_SmallLimit)
+    ::operator delete(pointer);
+  else
+    TheSmallPool().Release(pointer, size);
 }

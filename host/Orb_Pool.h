@@ -46,3 +46,30 @@ private:
   std::size_t m_NextChunkSlots = 8;
   std::size_t m_Bytes = 0;
 };
+
+// Small blocks (up to Orb_SmallLimit bytes) from process-wide free lists by
+// size class, carved from 64 KiB chunks: no heap block and no heap header of
+// their own. Freed blocks are kept for reuse by any later small allocation
+// of their class; the chunks are never returned. Thread-safe. Larger sizes
+// go to the global operator new. Under AddressSanitizer everything goes to
+// the global operator new, so that leaks and use after free are caught.
+// Throws std::bad_alloc.
+constexpr std::size_t Orb_SmallLimit = 256;
+LUM_PLATFORM_API void *Orb_SmallAllocate(std::size_t size);
+// `size` must be the size given to Orb_SmallAllocate. Null does nothing.
+LUM_PLATFORM_API void Orb_SmallRelease(void *pointer, std::size_t size) noexcept;
+
+// A standard allocator over Orb_SmallAllocate, for the host's small arrays.
+template <class T> struct Orb_SmallAllocator {
+  using value_type = T;
+  Orb_SmallAllocator() = default;
+  template <class U> explicit Orb_SmallAllocator(Orb_SmallAllocator<U> const & /*other*/) {}
+  T *allocate(std::size_t n) { return static_cast<T *>(Orb_SmallAllocate(n * sizeof(T))); }
+  void deallocate(T *pointer, std::size_t n) noexcept { Orb_SmallRelease(pointer, n * sizeof(T)); }
+  friend bool operator==(Orb_SmallAllocator const & /*a*/, Orb_SmallAllocator const & /*b*/) {
+    return true;
+  }
+  friend bool operator!=(Orb_SmallAllocator const & /*a*/, Orb_SmallAllocator const & /*b*/) {
+    return false;
+  }
+};

@@ -1,6 +1,7 @@
 #include "Orb_Property.h"
 
 #include "Orb_Debug.h"
+#include "Orb_Pool.h"
 
 #include <algorithm>
 #include <string_view>
@@ -9,6 +10,12 @@ Orb_Property::Orb_Property(Kind kind, std::string name, std::string value)
     : m_Kind(kind), m_Name(std::move(name)), m_Value(std::move(value)) {}
 
 Orb_Property::~Orb_Property() = default;
+
+void *Orb_Property::operator new(std::size_t size) { return Orb_SmallAllocate(size); }
+
+void Orb_Property::operator delete(void *pointer, std::size_t size) noexcept {
+  Orb_SmallRelease(pointer, size);
+}
 
 Orb_Property *Orb_Property::CreatePropertyString(char const *name, char const *value) {
   m_Members.push_back(std::make_unique<Orb_Property>(STRING, name ? name : "", value ? value : ""));

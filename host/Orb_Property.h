@@ -2,6 +2,7 @@
 
 #include "Lum_PlatformApi.h"
 
+#include <cstddef>
 #include <memory>
 #include <string>
 #include <vector>
@@ -27,6 +28,10 @@ public:
   Orb_Property(Orb_Property const &) = delete;
   Orb_Property &operator=(Orb_Property const &) = delete;
   ~Orb_Property();
+
+  // Properties are many and small: they come from Orb_SmallAllocate.
+  static void *operator new(std::size_t size);
+  static void operator delete(void *pointer, std::size_t size) noexcept;
 
   Kind GetKind() const { return m_Kind; }
   char const *GetName() const { return m_Name.c_str(); }
