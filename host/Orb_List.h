@@ -210,8 +210,10 @@ void Orb_List<T, SlotOf>::Squeeze(std::size_t upTo) const noexcept {
 
 // A name index over a named list: none while the list is small (a scan is
 // cheaper), built on the first lookup or insertion that finds the list
-// large, kept up to date from then on. Open addressing over element
-// pointers, compared by name.
+// large, kept up to date from then on. Open addressing with linear probing
+// over element pointers; each slot keeps 32 bits of its name's hash beside
+// it, so that a probe reads the element (a likely cache miss in a large
+// index) only when the hashes match.
 template <class T> class Orb_NameIndex {
 public:
   static constexpr std::size_t kScanLimit = 16;
@@ -219,51 +221,65 @@ public:
   T *Find(std::string_view name) const {
     if (m_Slots.empty())
       return nullptr;
+    std::size_t const hash = Hash(name);
+    auto const tag = static_cast<std::uint32_t>(hash);
     std::size_t const mask = m_Slots.size() - 1;
-    for (std::size_t i = Hash(name) & mask;; i = (i + 1) & mask) {
+    for (std::size_t i = hash & mask;; i = (i + 1) & mask) {
       T *item = m_Slots[i];
-      if (!item || item->GetNameString() == name)
+      if (!item || (m_Tags[i] == tag && item->GetNameString() == name))
         return item;
     }
   }
   // Inserts unless an element of that name is there; returns that element,
   // or null when inserted.
   T *Insert(T *item) {
-    if ((m_Count + 1) * 8 > m_Slots.size() * 7)
+    if ((m_Count + 1) * 5 > m_Slots.size() * 4)
       Grow();
     std::string_view const name = item->GetNameString();
+    std::size_t const hash = Hash(name);
+    auto const tag = static_cast<std::uint32_t>(hash);
     std::size_t const mask = m_Slots.size() - 1;
-    for (std::size_t i = Hash(name) & mask;; i = (i + 1) & mask) {
+    for (std::size_t i = hash & mask;; i = (i + 1) & mask) {
       T *&slot = m_Slots[i];
       if (!slot) {
         slot = item;
+        m_Tags[i] = tag;
         ++m_Count;
         return nullptr;
       }
-      if (slot->GetNameString() == name)
+      if (m_Tags[i] == tag && slot->GetNameString() == name)
         return slot;
     }
   }
   void Erase(T *item) noexcept;
-  std::size_t Bytes() const { return m_Slots.capacity() * sizeof(T *); }
+  std::size_t Bytes() const {
+    return m_Slots.capacity() * sizeof(T *) + m_Tags.capacity() * sizeof(std::uint32_t);
+  }
 
 private:
   static std::size_t Hash(std::string_view name) { return std::hash<std::string_view>()(name); }
   void Grow() {
-    std::vector<T *> old(m_Slots.empty() ? 32 : m_Slots.size() * 2, nullptr);
-    old.swap(m_Slots);
-    std::size_t const mask = m_Slots.size() - 1;
-    for (T *item : old) {
-      if (!item)
+    std::size_t const size = m_Slots.empty() ? 32 : m_Slots.size() * 2;
+    std::vector<T *> slots(size, nullptr);
+    std::vector<std::uint32_t> tags(size, 0);
+    std::size_t const mask = size - 1;
+    for (std::size_t j = 0; j < m_Slots.size(); ++j) {
+      if (!m_Slots[j])
         continue;
-      std::size_t i = Hash(item->GetNameString()) & mask;
-      while (m_Slots[i])
+      // The tag holds the low 32 bits of the hash, all a mask of a table
+      // below 2^32 slots needs.
+      std::size_t i = m_Tags[j] & mask;
+      while (slots[i])
         i = (i + 1) & mask;
-      m_Slots[i] = item;
+      slots[i] = m_Slots[j];
+      tags[i] = m_Tags[j];
     }
+    m_Slots.swap(slots);
+    m_Tags.swap(tags);
   }
 
   std::vector<T *> m_Slots;
+  std::vector<std::uint32_t> m_Tags;
   std::size_t m_Count = 0;
 };
 
@@ -276,9 +292,10 @@ template <class T> void Orb_NameIndex<T>::Erase(T *item) noexcept {
   }
   // Backward shift: entries after the hole whose probe passes it move in.
   for (std::size_t j = (i + 1) & mask; m_Slots[j]; j = (j + 1) & mask) {
-    std::size_t const home = Hash(m_Slots[j]->GetNameString()) & mask;
+    std::size_t const home = m_Tags[j] & mask;
     if (((j - home) & mask) >= ((j - i) & mask)) {
       m_Slots[i] = m_Slots[j];
+      m_Tags[i] = m_Tags[j];
       i = j;
     }
   }
