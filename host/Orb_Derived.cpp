@@ -211,6 +211,7 @@ void Orb_Sync::FireDelete(Orb_Persistent *object) {
 // ---------------------------------------------------------------------------
 // Client bases
 
+// NOLINTNEXTLINE(misc-new-delete-overloads): matched by the sized delete
 void *Orb_ClientObject::operator new(std::size_t size) { return Orb_SmallAllocate(size); }
 
 void Orb_ClientObject::operator delete(void *pointer, std::size_t size) noexcept {

@@ -28,7 +28,8 @@ public:
 
   // Client objects are many and small: they come from the size-class free
   // lists of Orb_SmallAllocate, not from one heap block each.
-  static void *operator new(std::size_t size);
+  // The matching delete is the sized one below, so that the size class is known.
+  static void *operator new(std::size_t size); // NOLINT(misc-new-delete-overloads)
   static void operator delete(void *pointer, std::size_t size) noexcept;
 
   Orb_Context *GetContext() const { return m_pContext; }

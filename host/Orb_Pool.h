@@ -64,8 +64,10 @@ template <class T> struct Orb_SmallAllocator {
   using value_type = T;
   Orb_SmallAllocator() = default;
   template <class U> explicit Orb_SmallAllocator(Orb_SmallAllocator<U> const & /*other*/) {}
-  T *allocate(std::size_t n) { return static_cast<T *>(Orb_SmallAllocate(n * sizeof(T))); }
-  void deallocate(T *pointer, std::size_t n) noexcept { Orb_SmallRelease(pointer, n * sizeof(T)); }
+  // T is a pointer type for the host's arrays: its size is what is meant.
+  static constexpr std::size_t kSize = sizeof(T); // NOLINT(bugprone-sizeof-expression)
+  T *allocate(std::size_t n) { return static_cast<T *>(Orb_SmallAllocate(n * kSize)); }
+  void deallocate(T *pointer, std::size_t n) noexcept { Orb_SmallRelease(pointer, n * kSize); }
   friend bool operator==(Orb_SmallAllocator const & /*a*/, Orb_SmallAllocator const & /*b*/) {
     return true;
   }

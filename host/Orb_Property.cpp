@@ -11,6 +11,7 @@ Orb_Property::Orb_Property(Kind kind, std::string name, std::string value)
 
 Orb_Property::~Orb_Property() = default;
 
+// NOLINTNEXTLINE(misc-new-delete-overloads): matched by the sized delete
 void *Orb_Property::operator new(std::size_t size) { return Orb_SmallAllocate(size); }
 
 void Orb_Property::operator delete(void *pointer, std::size_t size) noexcept {

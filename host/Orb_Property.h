@@ -30,7 +30,8 @@ public:
   ~Orb_Property();
 
   // Properties are many and small: they come from Orb_SmallAllocate.
-  static void *operator new(std::size_t size);
+  // The matching delete is the sized one below, so that the size class is known.
+  static void *operator new(std::size_t size); // NOLINT(misc-new-delete-overloads)
   static void operator delete(void *pointer, std::size_t size) noexcept;
 
   Kind GetKind() const { return m_Kind; }
