@@ -471,6 +471,9 @@ void Orb_Model::AnnounceLoadTree(Orb_DesignMgr *designMgr) {
   // is walked from a snapshot, which the caller's FreeHold keeps in memory,
   // one view at a time.
   assert(m_HoldDepth > 0 && "AnnounceLoadTree needs a FreeHold");
+  // Without subscribers no event fires and no handler runs.
+  if (m_Subscribers.empty())
+    return;
   AnnounceLoad(designMgr);
   std::vector<Orb_Design *> const designs = designMgr->GetDesigns().ToVector();
   std::vector<Orb_Persistent *> objects;
@@ -509,6 +512,8 @@ void Orb_Model::Delete(Orb_Persistent *object) {
   // The snapshot stays readable under the hold whatever the handlers change.
   // Memory is taken first: a failure here must leave nothing marked.
   std::vector<Orb_Persistent *> doomed;
+  // A block with its pins and signals fits without regrowing.
+  doomed.reserve(32);
   Orb_VisitPostOrder(object, [&doomed](Orb_Persistent *owned) { doomed.push_back(owned); });
   if (m_PendingFrees.size() == m_PendingFrees.capacity())
     m_PendingFrees.reserve(2 * m_PendingFrees.size() + 1);

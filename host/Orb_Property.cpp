@@ -18,9 +18,21 @@ void Orb_Property::operator delete(void *pointer, std::size_t size) noexcept {
   Orb_SmallRelease(pointer, size);
 }
 
+Orb_Property::ListData const &Orb_Property::NoLists() {
+  static ListData const none;
+  return none;
+}
+
+Orb_Property::ListData &Orb_Property::Lists() {
+  if (!m_pLists)
+    m_pLists = std::make_unique<ListData>();
+  return *m_pLists;
+}
+
 Orb_Property *Orb_Property::CreatePropertyString(char const *name, char const *value) {
-  m_Members.push_back(std::make_unique<Orb_Property>(STRING, name ? name : "", value ? value : ""));
-  return m_Members.back().get();
+  auto &members = Lists().members;
+  members.push_back(std::make_unique<Orb_Property>(STRING, name ? name : "", value ? value : ""));
+  return members.back().get();
 }
 
 Orb_PropertyHolder::~Orb_PropertyHolder() = default;

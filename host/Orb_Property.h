@@ -43,20 +43,34 @@ public:
   void SetStringValue(std::string value) { m_Value = std::move(value); }
 
   // String list: read, cleared and appended to in order.
-  std::vector<std::string> const &GetStrings() const { return m_Strings; }
-  void ClearStrings() { m_Strings.clear(); }
-  void AppendString(std::string value) { m_Strings.push_back(std::move(value)); }
+  std::vector<std::string> const &GetStrings() const {
+    return m_pLists ? m_pLists->strings : NoLists().strings;
+  }
+  void ClearStrings() {
+    if (m_pLists)
+      m_pLists->strings.clear();
+  }
+  void AppendString(std::string value) { Lists().strings.push_back(std::move(value)); }
 
   // List: appends a string member (names may repeat) and returns it.
   Orb_Property *CreatePropertyString(char const *name, char const *value);
-  std::vector<std::unique_ptr<Orb_Property>> const &GetMembers() const { return m_Members; }
+  std::vector<std::unique_ptr<Orb_Property>> const &GetMembers() const {
+    return m_pLists ? m_pLists->members : NoLists().members;
+  }
 
 private:
   Kind m_Kind;
   std::string m_Name;
   std::string m_Value;
-  std::vector<std::string> m_Strings;
-  std::vector<std::unique_ptr<Orb_Property>> m_Members;
+  // The entries of a string list or the members of a list; null for a
+  // string property, the common kind, which so costs one pointer for them.
+  struct ListData {
+    std::vector<std::string> strings;
+    std::vector<std::unique_ptr<Orb_Property>> members;
+  };
+  static ListData const &NoLists();
+  ListData &Lists();
+  std::unique_ptr<ListData> m_pLists;
 };
 
 // The properties of one host object, in creation order. Names are unique:
