@@ -40,7 +40,9 @@
 #include <map>
 #include <memory>
 #include <new>
+#include <stdexcept>
 #include <string>
+#include <sys/wait.h>
 #include <unistd.h>
 #include <vector>
 
@@ -169,6 +171,8 @@ private:
 struct Workload {
   std::int64_t blocks = 0;
   std::string path;
+  // The file is this process's own (removed at exit), not a shared one.
+  bool ownFile = false;
   std::unique_ptr<Orb_Model> created;
   std::unique_ptr<Orb_Model> opened;
   std::unique_ptr<Lum_TdmModel> openedTdm;
@@ -176,7 +180,7 @@ struct Workload {
   bool openedPartly = false;
 
   ~Workload() {
-    if (!path.empty())
+    if (ownFile)
       std::filesystem::remove(path);
   }
 };
@@ -202,16 +206,47 @@ void EnsureCreated(Workload &w) {
   Orb_HostWorkload::Build(*w.created, w.blocks);
 }
 
+// The database file of the workload: in $ORB_HOST_BENCH_DIR when set, where
+// it is kept for later processes (bench/run-host), else a temporary file of
+// this process.
+std::string const &PathOf(Workload &w) {
+  if (w.path.empty()) {
+    std::string const name = "Orb_HostBench." + std::to_string(w.blocks) + ".db";
+    if (char const *dir = std::getenv("ORB_HOST_BENCH_DIR")) {
+      w.path = (std::filesystem::path(dir) / name).string();
+    } else {
+      w.path = (std::filesystem::temp_directory_path() / (std::to_string(::getpid()) + "." + name))
+                   .string();
+      w.ownFile = true;
+    }
+  }
+  return w.path;
+}
+
+// Makes the file in a child process, so that this process's heap holds
+// nothing freed by the building (pooled small blocks stay for reuse): the
+// phases that build then show what they really take.
 void EnsureFile(Workload &w) {
-  if (!w.path.empty())
+  std::string const &path = PathOf(w);
+  if (std::filesystem::exists(path))
     return;
-  EnsureCreated(w);
-  std::string const path =
-      (std::filesystem::temp_directory_path() /
-       ("Orb_HostBench." + std::to_string(::getpid()) + "." + std::to_string(w.blocks) + ".db"))
-          .string();
-  w.created->Save(path.c_str());
-  w.path = path;
+  pid_t const child = ::fork();
+  if (child == 0) {
+    int status = 1;
+    try {
+      Orb_Model model("bench", "bench", "", false);
+      Orb_HostWorkload::Build(model, w.blocks);
+      model.Save(path.c_str());
+      status = 0;
+    } catch (std::exception const &e) {
+      std::fprintf(stderr, "building %s: %s\n", path.c_str(), e.what());
+    }
+    std::_Exit(status);
+  }
+  int status = 0;
+  if (child < 0 || ::waitpid(child, &status, 0) != child || !WIFEXITED(status) ||
+      WEXITSTATUS(status) != 0)
+    throw std::runtime_error("cannot build the workload file " + path);
 }
 
 void EnsureOpened(Workload &w) {
@@ -272,8 +307,8 @@ void BM_HostCreate(benchmark::State &state) {
 
 void BM_HostSave(benchmark::State &state) {
   RunPhase(
-      state, [](Workload &w) { EnsureFile(w); },
-      [](Workload &w) { w.created->Save(w.path.c_str()); }, 1, false);
+      state, [](Workload &w) { EnsureCreated(w); },
+      [](Workload &w) { w.created->Save(PathOf(w).c_str()); }, 1, false);
 }
 
 void BM_HostOpen(benchmark::State &state) {
