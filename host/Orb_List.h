@@ -211,7 +211,7 @@ void Orb_List<T, SlotOf>::Squeeze(std::size_t upTo) const noexcept {
 // A name index over a named list: none while the list is small (a scan is
 // cheaper), built on the first lookup or insertion that finds the list
 // large, kept up to date from then on. Open addressing with linear probing
-// over element pointers; each slot keeps 32 bits of its name's hash beside
+// over element pointers, up to 7/8 full; each slot keeps 32 bits of its name's hash beside
 // it, so that a probe reads the element (a likely cache miss in a large
 // index) only when the hashes match.
 template <class T> class Orb_NameIndex {
@@ -233,7 +233,7 @@ public:
   // Inserts unless an element of that name is there; returns that element,
   // or null when inserted.
   T *Insert(T *item) {
-    if ((m_Count + 1) * 5 > m_Slots.size() * 4)
+    if ((m_Count + 1) * 8 > m_Slots.size() * 7)
       Grow();
     std::string_view const name = item->GetNameString();
     std::size_t const hash = Hash(name);
