@@ -36,6 +36,7 @@
 
 #include "Orb_Derived.h"
 #include "Orb_Exception.h"
+#include "Orb_FileOps.h"
 
 #include <algorithm>
 #include <cerrno>
@@ -240,7 +241,7 @@ void ByteWriter::Flush() {
   char const *data = m_Buffer.data();
   std::size_t left = m_Buffer.size();
   while (left > 0) {
-    ssize_t const written = ::write(m_Fd, data, left);
+    ssize_t const written = Orb_FileOps::Get().write(m_Fd, data, left);
     if (written < 0) {
       if (errno == EINTR)
         continue;
@@ -256,13 +257,13 @@ void ByteWriter::Commit() {
   Flush();
   if (m_Mode >= 0 && ::fchmod(m_Fd, static_cast<mode_t>(m_Mode)) != 0)
     Fail("cannot set the permissions of", errno);
-  if (::fsync(m_Fd) != 0)
+  if (Orb_FileOps::Get().fsync(m_Fd) != 0)
     Fail("cannot flush", errno);
   int const fd = m_Fd;
   m_Fd = -1;
-  if (::close(fd) != 0)
+  if (Orb_FileOps::Get().close(fd) != 0)
     Fail("cannot close", errno);
-  if (::rename(m_TempPath.c_str(), m_Target.c_str()) != 0)
+  if (Orb_FileOps::Get().rename(m_TempPath.c_str(), m_Target.c_str()) != 0)
     Fail("cannot rename", errno);
   m_Committed = true;
 }
