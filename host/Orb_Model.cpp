@@ -198,8 +198,7 @@ Orb_Block *Orb_Block::CreateBlock(char const *name, int /*flags*/) {
                          "> would lie deeper than " + std::to_string(Orb_MaxBlockDepth) +
                          " levels.")
                             .c_str());
-  auto *block = new Orb_Block(GetModel(), this, m_pView, name);
-  m_Blocks.Add(block);
+  auto *block = GetModel()->Adopt(m_Blocks, new Orb_Block(GetModel(), this, m_pView, name));
   return GetModel()->Announce(block);
 }
 
@@ -208,8 +207,7 @@ Orb_Pin *Orb_Block::CreatePin(char const *name, Orb_Pin::PIN_DIRECTION direction
   CheckNotDying(this, "pin", name);
   if (m_Pins.Find(name))
     ThrowDuplicate(this, "pin", name);
-  auto *pin = new Orb_Pin(GetModel(), this, name, direction);
-  m_Pins.Add(pin);
+  auto *pin = GetModel()->Adopt(m_Pins, new Orb_Pin(GetModel(), this, name, direction));
   return GetModel()->Announce(pin);
 }
 
@@ -218,8 +216,7 @@ Orb_Signal *Orb_Block::CreateSignal(char const *name) {
   CheckNotDying(this, "signal", name);
   if (m_Signals.Find(name))
     ThrowDuplicate(this, "signal", name);
-  auto *signal = new Orb_Signal(GetModel(), this, name);
-  m_Signals.Add(signal);
+  auto *signal = GetModel()->Adopt(m_Signals, new Orb_Signal(GetModel(), this, name));
   return GetModel()->Announce(signal);
 }
 
@@ -263,8 +260,7 @@ Orb_Network *Orb_View::CreateNetwork(char const *name) {
   CheckNotDying(this, "network", name);
   if (m_Networks.Find(name))
     ThrowDuplicate(this, "network", name);
-  auto *network = new Orb_Network(GetModel(), this, name);
-  m_Networks.Add(network);
+  auto *network = GetModel()->Adopt(m_Networks, new Orb_Network(GetModel(), this, name));
   return GetModel()->Announce(network);
 }
 
@@ -290,8 +286,7 @@ Orb_View *Orb_Design::CreateView(char const *name) {
   CheckNotDying(this, "view", name);
   if (m_Views.Find(name))
     ThrowDuplicate(this, "view", name);
-  auto *view = new Orb_View(GetModel(), this, name);
-  m_Views.Add(view);
+  auto *view = GetModel()->Adopt(m_Views, new Orb_View(GetModel(), this, name));
   return GetModel()->Announce(view);
 }
 
@@ -308,8 +303,7 @@ Orb_Design *Orb_DesignMgr::CreateDesign(char const *name) {
   CheckNotDying(this, "design", name);
   if (m_Designs.Find(name))
     ThrowDuplicate(this, "design", name);
-  auto *design = new Orb_Design(GetModel(), this, name);
-  m_Designs.Add(design);
+  auto *design = GetModel()->Adopt(m_Designs, new Orb_Design(GetModel(), this, name));
   return GetModel()->Announce(design);
 }
 
@@ -345,8 +339,7 @@ Orb_DesignMgr *Orb_Model::CreateDesignMgr(char const *name) {
   CheckName(name, "design manager");
   if (m_DesignMgrs.Find(name))
     ThrowDuplicate(nullptr, "design manager", name);
-  auto *designMgr = new Orb_DesignMgr(this, name);
-  m_DesignMgrs.Add(designMgr);
+  auto *designMgr = Adopt(m_DesignMgrs, new Orb_DesignMgr(this, name));
   return Announce(designMgr);
 }
 

@@ -88,9 +88,15 @@ public:
     auto it = m_ByName.find(name);
     return it == m_ByName.end() ? nullptr : it->second;
   }
+  // All or nothing: when the item cannot be added, the list stays as it was.
   void Add(T *item) {
     m_Items.push_back(item);
-    m_ByName.emplace(std::string_view(item->GetNameString()), item);
+    try {
+      m_ByName.emplace(std::string_view(item->GetNameString()), item);
+    } catch (...) {
+      m_Items.pop_back();
+      throw;
+    }
   }
   void Remove(T *item);
   std::vector<T *> &MutableItems() { return m_Items; }
@@ -445,6 +451,17 @@ private:
   unsigned AllocateBridgeId(Orb_Kind kind);
   void ReleaseBridgeId(Orb_Kind kind, unsigned id) noexcept;
 
+  // Adds a new object, which has no children yet, to its parent's list; when
+  // the list cannot take it, frees it and rethrows.
+  template <class T> T *Adopt(Orb_NamedList<T> &list, T *object) {
+    try {
+      list.Add(object);
+    } catch (...) {
+      Free(object);
+      throw;
+    }
+    return object;
+  }
   // Fires OnCreate for a new object; on a throw deletes it and rethrows.
   template <class T> T *Announce(T *object);
   // Fires OnLoad for the object in every subscribed context that has no

@@ -719,9 +719,17 @@ void Orb_ModelIO::FreeDesignMgrs(Orb_Model &model, std::vector<Orb_DesignMgr *> 
 
 std::vector<Orb_DesignMgr *> Orb_ModelIO::Commit(Section &section) {
   std::vector<Orb_DesignMgr *> loaded = section.designMgrs.Items();
+  std::size_t added = 0;
+  try {
+    for (; added < loaded.size(); ++added)
+      section.model.m_DesignMgrs.Add(loaded[added]);
+  } catch (...) {
+    // The section still owns them all and frees them.
+    for (std::size_t i = 0; i < added; ++i)
+      section.model.m_DesignMgrs.Remove(loaded[i]);
+    throw;
+  }
   section.designMgrs = Orb_NamedList<Orb_DesignMgr>();
-  for (Orb_DesignMgr *designMgr : loaded)
-    section.model.m_DesignMgrs.Add(designMgr);
   return loaded;
 }
 
@@ -778,8 +786,8 @@ void Orb_ModelIO::ReadModel(Section &section, bool companion) {
         m_pIn->Refuse("holds design manager " + Quote(name) + ", which the model already has");
       if (section.designMgrs.Find(name))
         Duplicate("design manager", name, nullptr);
-      auto *designMgr = new Orb_DesignMgr(&section.model, std::move(name));
-      section.designMgrs.Add(designMgr);
+      auto *designMgr = section.model.Adopt(section.designMgrs,
+                                            new Orb_DesignMgr(&section.model, std::move(name)));
       ReadDesignMgr(designMgr);
     } else if (tag == 'K') {
       if (companion)
@@ -830,8 +838,8 @@ void Orb_ModelIO::ReadContainer(Parent *parent, Orb_NamedList<Child> &children, 
       m_pIn->End();
       if (children.Find(name))
         Duplicate(childKind, name, parent);
-      auto *child = new Child(parent->GetModel(), parent, std::move(name));
-      children.Add(child);
+      auto *child = parent->GetModel()->Adopt(
+          children, new Child(parent->GetModel(), parent, std::move(name)));
       (this->*readChild)(child);
       holder = nullptr;
     } else if (tag == 'E') {
@@ -903,8 +911,8 @@ void Orb_ModelIO::ReadBlock(Orb_Block *top) {
       auto const direction = static_cast<Orb_Pin::PIN_DIRECTION>(code);
       if (block->m_Pins.Find(name))
         Duplicate("pin", name, block);
-      auto *pin = new Orb_Pin(model, block, std::move(name), direction);
-      block->m_Pins.Add(pin);
+      auto *pin =
+          model->Adopt(block->m_Pins, new Orb_Pin(model, block, std::move(name), direction));
       m_Pins.push_back(pin);
       holder = pin;
     } else if (tag == 'S') {
@@ -912,8 +920,7 @@ void Orb_ModelIO::ReadBlock(Orb_Block *top) {
       m_pIn->End();
       if (block->m_Signals.Find(name))
         Duplicate("signal", name, block);
-      auto *signal = new Orb_Signal(model, block, std::move(name));
-      block->m_Signals.Add(signal);
+      auto *signal = model->Adopt(block->m_Signals, new Orb_Signal(model, block, std::move(name)));
       m_Signals.push_back(signal);
       holder = signal;
     } else if (tag == 'B') {
@@ -924,8 +931,8 @@ void Orb_ModelIO::ReadBlock(Orb_Block *top) {
       if (open.size() >= Orb_MaxBlockDepth)
         m_pIn->Corrupt("block " + Quote(name) + " nested deeper than " +
                        std::to_string(Orb_MaxBlockDepth) + " levels");
-      auto *child = new Orb_Block(model, block, block->m_pView, std::move(name));
-      block->m_Blocks.Add(child);
+      auto *child = model->Adopt(block->m_Blocks,
+                                 new Orb_Block(model, block, block->m_pView, std::move(name)));
       open.push_back(child);
       holder = child;
     } else if (tag == 'E') {
@@ -963,8 +970,8 @@ Orb_Network *Orb_ModelIO::ReadNetwork(Orb_View *view) {
   std::string name = ReadName("network");
   if (view->m_Networks.Find(name))
     Duplicate("network", name, view);
-  auto *network = new Orb_Network(view->GetModel(), view, std::move(name));
-  view->m_Networks.Add(network);
+  auto *network = view->GetModel()->Adopt(view->m_Networks,
+                                          new Orb_Network(view->GetModel(), view, std::move(name)));
   for (std::uint64_t n = m_pIn->Num(); n > 0; --n) {
     Orb_Signal *signal = SignalAt(m_pIn->Num());
     if (signal->GetNetwork())

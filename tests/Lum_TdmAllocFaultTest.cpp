@@ -1,0 +1,177 @@
+// Allocation failure: an open in which the k-th allocation fails, for every
+// k, throws std::bad_alloc or one of the library's exceptions and leaves the
+// model as it was. A program of its own, since it replaces the global
+// operator new.
+
+#include "Lum_TdmFaultSupport.h"
+
+#include "Port_Exception.h"
+
+#include <gtest/gtest.h>
+
+#include <cstdlib>
+#include <new>
+#include <string>
+
+namespace {
+
+// Counts allocations while armed; the allocation numbered g_FailAt (from 1)
+// throws std::bad_alloc, once.
+unsigned long g_Allocations = 0;
+unsigned long g_FailAt = 0;
+bool g_Armed = false;
+
+void *Allocate(std::size_t size) {
+  if (g_Armed && ++g_Allocations == g_FailAt)
+    throw std::bad_alloc();
+  if (void *memory = std::malloc(size ? size : 1))
+    return memory;
+  throw std::bad_alloc();
+}
+
+// Arms the counter for one scope.
+class FailingAllocation {
+public:
+  explicit FailingAllocation(unsigned long failAt) {
+    g_Allocations = 0;
+    g_FailAt = failAt;
+    g_Armed = true;
+  }
+  ~FailingAllocation() { g_Armed = false; }
+  FailingAllocation(FailingAllocation const &) = delete;
+  FailingAllocation &operator=(FailingAllocation const &) = delete;
+};
+
+} // namespace
+
+// The replacements must be visible to the shared libraries, which the
+// project builds with hidden visibility by default.
+#define LUM_REPLACE __attribute__((visibility("default")))
+LUM_REPLACE void *operator new(std::size_t size) { return Allocate(size); }
+LUM_REPLACE void *operator new[](std::size_t size) { return Allocate(size); }
+LUM_REPLACE void *operator new(std::size_t size, std::nothrow_t const &) noexcept {
+  try {
+    return Allocate(size);
+  } catch (std::bad_alloc const &) {
+    return nullptr;
+  }
+}
+LUM_REPLACE void *operator new[](std::size_t size, std::nothrow_t const &) noexcept {
+  try {
+    return Allocate(size);
+  } catch (std::bad_alloc const &) {
+    return nullptr;
+  }
+}
+LUM_REPLACE void operator delete(void *memory) noexcept { std::free(memory); }
+LUM_REPLACE void operator delete[](void *memory) noexcept { std::free(memory); }
+LUM_REPLACE void operator delete(void *memory, std::size_t) noexcept { std::free(memory); }
+LUM_REPLACE void operator delete[](void *memory, std::size_t) noexcept { std::free(memory); }
+LUM_REPLACE void operator delete(void *memory, std::nothrow_t const &) noexcept {
+  std::free(memory);
+}
+LUM_REPLACE void operator delete[](void *memory, std::nothrow_t const &) noexcept {
+  std::free(memory);
+}
+
+using namespace lumtest;
+
+namespace {
+
+// Every allocation of an open, in turn, fails: the open throws std::bad_alloc
+// or a Port::Exception with a message, and the model keeps exactly its own
+// objects, clients, companions and saved bytes, and then opens the design in
+// full. The last k is the first that the open survives.
+TEST(TdmAllocFaultTest, FailedAllocationAtEveryStepOfAnOpenLeavesTheModelAsItWas) {
+  FaultDesign design;
+  std::string expected;
+  {
+    Lum_TdmModel model("alloc", "allocdb", "");
+    model.Open(design.Path().c_str());
+    expected = FaultDesign::Typing(model);
+  }
+
+  unsigned long k = 1;
+  for (;; ++k) {
+    SCOPED_TRACE("allocation " + std::to_string(k));
+    Lum_TdmModel model("alloc", "allocdb", "");
+    FaultDesign::AddOwnContent(model);
+    ModelState const before = StateOf(model, design.Scratch("before.odb"));
+    bool opened = false;
+    std::string failure;
+    {
+      FailingAllocation failing(k);
+      try {
+        model.Open(design.Path().c_str());
+        opened = true;
+      } catch (std::bad_alloc const &) {
+      } catch (Port::Exception const &e) {
+        failure = e.GetMessage().empty() ? "a Port::Exception without a message" : "";
+      } catch (...) {
+        failure = "an exception of another kind";
+      }
+    }
+    ASSERT_EQ(failure, "");
+    if (opened) {
+      EXPECT_EQ(FaultDesign::Typing(model), expected);
+      break;
+    }
+    ASSERT_EQ(StateOf(model, design.Scratch("after.odb")), before);
+    EXPECT_FALSE(Lum_TlmCatalog::IsLoaded("CELLS")) << "the library file stays loaded";
+    model.Open(design.Path().c_str());
+    ASSERT_EQ(FaultDesign::Typing(model), expected);
+  }
+  EXPECT_GT(k, 100u) << "the open made fewer allocations than expected";
+}
+
+// Host objects reachable from the model's design managers.
+std::size_t Reachable(Orb_Block const *block) {
+  std::size_t count = 1 + block->GetPins().size() + block->GetSignals().size();
+  for (Orb_Block const *child : block->GetBlocks())
+    count += Reachable(child);
+  return count;
+}
+
+std::size_t Reachable(Orb_Model const &model) {
+  std::size_t count = 0;
+  for (Orb_DesignMgr const *designMgr : model.GetDesignMgrs()) {
+    ++count;
+    for (Orb_Design const *design : designMgr->GetDesigns()) {
+      ++count;
+      for (Orb_View const *view : design->GetViews())
+        count += 1 + view->GetNetworks().size() + (view->GetBlock() ? Reachable(view->GetBlock()) : 0);
+    }
+  }
+  return count;
+}
+
+// Building a design through the API with the k-th allocation failing throws
+// std::bad_alloc and leaves no object that the model counts but cannot
+// reach: an object the host made but could not file away is freed.
+TEST(TdmAllocFaultTest, FailedAllocationWhileCreatingLeavesNoStrayObject) {
+  for (unsigned long k = 1;; ++k) {
+    SCOPED_TRACE("allocation " + std::to_string(k));
+    Lum_TdmModel model("alloc", "allocdb", "");
+    bool built = false;
+    {
+      FailingAllocation failing(k);
+      try {
+        Lum_TdmView *view = model.CreateDesignMgr("dm")->CreateDesign("d")->CreateView("v");
+        Lum_TdmBlock *top = view->CreateTopBlock("top");
+        Lum_TdmSignal *signal = top->CreateSignal("s");
+        view->CreateNetwork("n")->GetOrbNetwork()->AddSignal(signal->GetOrbSignal());
+        top->CreateBlock("u1", 0)->CreatePin("a", Orb_Pin::PIN_INPUT);
+        built = true;
+      } catch (std::bad_alloc const &) {
+      }
+    }
+    std::size_t objects = 0;
+    for (unsigned kind = 0; kind < Orb_KindCount; ++kind)
+      objects += model.GetOrbModel()->GetObjectCount(static_cast<Orb_Kind>(kind));
+    ASSERT_EQ(objects, Reachable(*model.GetOrbModel()));
+    if (built)
+      break;
+  }
+}
+
+} // namespace
