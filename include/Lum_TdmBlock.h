@@ -5,8 +5,13 @@
 #include "Orb_Templates.h"
 
 #include <cstdint>
+#include <vector>
 
+class Lum_TdmTypePinMap;
 class Lum_TlmBlock;
+class Lum_TlmBlockTypeID;
+class Lum_TlmPin;
+class Lum_TlmPinTypeID;
 
 // Client of a host block. It may be bound to a type block of one of its
 // view's type libraries, whose instance it then is; each of its pins then
@@ -40,8 +45,111 @@ public:
   Lum_TdmBlock(Lum_TdmModel *model, Orb_Block *block, bool isNew);
   ~Lum_TdmBlock() override;
 
+  // ---- Creating children from type blocks
+
+  // Creates a child bound to the type block. With `pins`, the child gets one
+  // pin per type pin (its name and direction, bound to it), in the type
+  // block's pin order; InitTypeBlock runs on the child. With `graft`, when
+  // the type block has a hierarchy for this block's view name, the hierarchy
+  // is copied under the child between the model's RegisterGraftEventHandlers
+  // and its CleanupGraftProps and UnregisterGraftEventHandlers; the copied
+  // objects then lose their clients, so that each is bound afresh from its
+  // copied properties when next reached. Throws, creating nothing:
+  // - a null type block: Lum_ExceptionInvalidTypeBlock, this block's name;
+  // - a type block of no library of this block's view:
+  //   Lum_ExceptionCorruptDatabase, the type block's name.
+  // A host failure after the child exists (a name taken, a bad graft) passes
+  // unchanged; the child and what was made under it stay, and a registered
+  // graft hook is unregistered.
+  Lum_TdmBlock *CreateTypedBlock(char const *name, Lum_TlmBlock const *typeBlock, bool graft,
+                                 bool pins);
+  // Creates an untyped copy of the type block: its pins (names, directions,
+  // properties, no type pins), TDS_LIBRARY_ASSOC ("<library database>:<type
+  // block> <time stamp>") and, whenever the type block has a hierarchy for
+  // this block's view name, that hierarchy, between the model's
+  // RegisterGraftEventHandlers and UnregisterGraftEventHandlers. The copy is
+  // not checked against the view's libraries. A null type block throws
+  // Lum_ExceptionInvalidTypeBlock with this block's name and creates nothing;
+  // host failures pass as for CreateTypedBlock.
+  Lum_TdmBlock *CreateUntypedBlock(char const *name, Lum_TlmBlock const *typeBlock);
+
+  // ---- Rebinding
+
+  // Binds the block to the type block (null unbinds it), matching its pins
+  // through the block's stored TDS_BLOCK_PIN_MAP as a load does: pins may be
+  // created and all pins sorted. The same type block as now does nothing.
+  // Nothing is written until the next commit. Failures leave the block as it
+  // was (type block, every pin's type pin, no pin created by the call):
+  // - the type block's library is not among the view's, or a connected pin
+  //   has no type pin of its name: Lum_ExceptionInvalidTypeBlock, the type
+  //   block's name;
+  // - the pin matching fails: the exception of a load, unchanged.
+  void SetTypeBlock(Lum_TlmBlock const *typeBlock);
+  // Binds the block to the type block through `pinMap`, which must map every
+  // pin of the block to a pin of that type block; null unbinds the block.
+  // Creates, sorts and reads nothing else. The same type block as now does
+  // nothing. Every failure is Lum_ExceptionCorruptDatabase and changes
+  // nothing:
+  // - the check of SetTypeBlock above fails (type block's name);
+  // - the map has more entries than the block has pins (type block's name);
+  // - a pin has no mapping or one to another type block's pin (the first such
+  //   pin's name, in host order).
+  // The block keeps no reference to the map.
+  void SetTypeBlock(Lum_TlmBlock const *typeBlock, Lum_TdmTypePinMap const &pinMap);
+
+  // ---- Typed queries. None changes the design; walking children or pins
+  // may bring their clients into being.
+
   // The type block, or null for an untyped block.
   Lum_TlmBlock const *GetTypeBlock() const { return m_pTypeBlock; }
+  // The type block as specialized in `context` (the client there of its host
+  // block), or null for an untyped block. Throws
+  // Lum_ExceptionInvalidTypeBlock with this block's name when the host block
+  // has no client in that context, or one that is no type block (a null
+  // context resolves nothing).
+  Lum_TlmBlock const *GetTypeBlock(Orb_Context const *context) const;
+  // The type block's host block, or null for an untyped block.
+  Orb_Block const *GetNativeTypeBlock() const;
+  // What the identifier answers for the type block (null when untyped).
+  bool IsTypeOf(Lum_TlmBlockTypeID const &typeId) const;
+  // The first child, in host order, whose type block the identifier
+  // represents, or null. The two names are the same query.
+  Lum_TdmBlock *GetFirstChildBlockOfType(Lum_TlmBlockTypeID const &typeId);
+  Lum_TdmBlock const *GetFirstChildBlockOfType(Lum_TlmBlockTypeID const &typeId) const;
+  Lum_TdmBlock *GetChildBlockOfType(Lum_TlmBlockTypeID const &typeId);
+  Lum_TdmBlock const *GetChildBlockOfType(Lum_TlmBlockTypeID const &typeId) const;
+  // Appends, after what `blocks` holds, the children in host order whose
+  // type block is this very object (null: the untyped children).
+  void GetChildBlocksOfType(Lum_TlmBlock const *typeBlock, std::vector<Lum_TdmBlock *> &blocks);
+  void GetChildBlocksOfType(Lum_TlmBlock const *typeBlock,
+                            std::vector<Lum_TdmBlock const *> &blocks) const;
+  // Appends the children whose type block the identifier represents.
+  void GetChildBlocksOfType(Lum_TlmBlockTypeID const &typeId, std::vector<Lum_TdmBlock *> &blocks);
+  void GetChildBlocksOfType(Lum_TlmBlockTypeID const &typeId,
+                            std::vector<Lum_TdmBlock const *> &blocks) const;
+  // The children whose type block has the same host block as `typeBlock`,
+  // whichever client model either belongs to (null: the untyped children).
+  std::vector<Lum_TdmBlock *> GetChildBlocksOfType(Lum_TlmBlock const *typeBlock);
+  std::vector<Lum_TdmBlock const *> GetChildBlocksOfType(Lum_TlmBlock const *typeBlock) const;
+  // The first pin, in host order, whose type pin the identifier represents,
+  // or null.
+  Lum_TdmPin *GetPinOfType(Lum_TlmPinTypeID const &typeId);
+  Lum_TdmPin const *GetPinOfType(Lum_TlmPinTypeID const &typeId) const;
+  // The first pin whose type pin is this very object (null: the first pin
+  // without one), or null.
+  Lum_TdmPin *GetPinOfType(Lum_TlmPin const *typePin);
+  Lum_TdmPin const *GetPinOfType(Lum_TlmPin const *typePin) const;
+
+  // ---- Pin order
+
+  // For a typed block with fewer pins than its type block: creates a bound
+  // pin for every type pin whose name the block lacks, sorts all pins by name
+  // and returns true. Otherwise (untyped, or at least as many pins, whatever
+  // their names) changes nothing and returns false. Existing pins are left
+  // as they are.
+  bool ManifestAllTypedPins();
+  // Puts the pins in name order.
+  void NormalizePins();
 
   void Dbg() const { DbgImpl(); }
 
@@ -60,9 +168,11 @@ protected:
   // pin's name differs from its type pin's. A pin without a type pin gets no
   // member.
   virtual void CommitToOrb();
-  // Runs once the type block is set (after a load that bound the block);
-  // does nothing here. A derived block may override it, but on load the
-  // call comes from this class's constructor, so this one runs.
+  // Runs once the type block is set: after a load that bound the block,
+  // after CreateTypedBlock on the new child and after every SetTypeBlock that
+  // changed the binding (to null too); does nothing here. A derived block may
+  // override it, but on load the call comes from this class's constructor,
+  // so this one runs.
   virtual void InitTypeBlock();
   virtual void DbgImpl() const;
 
@@ -74,6 +184,13 @@ private:
   void ReconcilePins(Lum_TlmBlock const *typeBlock);
   // Puts the pins in name order.
   void SortPinsByName();
+  // Whether the type block belongs to one of the view's libraries (which
+  // builds the view's list if needed).
+  bool IsOfViewLibrary(Lum_TlmBlock const *typeBlock) const;
+  // Throws Lum_ExceptionCorruptDatabase (type block's name) when the type
+  // block belongs to no library of the view, or a connected pin has no type
+  // pin of its name. Changes nothing.
+  void VerifyTypeBlock(Lum_TlmBlock const *typeBlock) const;
 
   Lum_TlmBlock const *m_pTypeBlock;
 };

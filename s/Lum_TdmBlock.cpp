@@ -3,14 +3,19 @@
 #include "Lum_TdmCommit.h"
 #include "Lum_TdmDbg.h"
 #include "Lum_TdmModel.h"
+#include "Lum_TdmNetwork.h"
 #include "Lum_TdmPin.h"
 #include "Lum_TdmPinAlpaSorter.h"
 #include "Lum_TdmSignal.h"
+#include "Lum_TdmTypePinMap.h"
 #include "Lum_TdmView.h"
 
 #include "Lum_Exception.h"
 #include "Lum_Tlm.h"
+#include "Lum_TlmTypeID.h"
+#include "Ora_GraftMgr.h"
 #include "Port_String.h"
+#include "UT_TIMESTAMP.h"
 
 #include <algorithm>
 #include <cassert>
@@ -19,6 +24,8 @@
 #include <string>
 #include <string_view>
 #include <unordered_map>
+#include <unordered_set>
+#include <utility>
 #include <vector>
 
 namespace {
@@ -36,6 +43,107 @@ bool IsMappedPin(Lum_TdmPin const *pin) {
   Lum_TlmPin const *typePin = pin->GetTypePin();
   return typePin && std::strcmp(pin->GetName(), typePin->GetName()) != 0;
 }
+
+// The client of a host object in `context`, specialized when it has none.
+template <class Client, class Host>
+Client *ClientOf(Orb_Context *context, Orb_BridgeHandle const &bridge, Host *object) {
+  Orb_ClientObject *client = bridge[object->GetBridgeId()];
+  if (!client)
+    client = context->Specialize(object);
+  assert(client && "the client model made no client for a host object");
+  return static_cast<Client *>(client);
+}
+
+// Calls `visit` with each child of `block`, in host order, as its client,
+// until it returns true; returns that child or null. The bridge table is
+// fetched once for the walk.
+template <class Visit> Lum_TdmBlock *FindChild(Lum_TdmBlock const *block, Visit const &visit) {
+  std::vector<Orb_Block *> const &children = block->GetBlocks();
+  if (children.empty())
+    return nullptr;
+  Orb_Context *context = block->GetContext();
+  Orb_BridgeHandle const bridge = context->GetBridgeHandle(Orb_Kind::Block);
+  for (std::size_t i = 0; i < children.size(); ++i) {
+    Lum_TdmBlock *child = ClientOf<Lum_TdmBlock>(context, bridge, children[i]);
+    if (visit(child))
+      return child;
+  }
+  return nullptr;
+}
+
+// The same over the pins of `block`.
+template <class Visit> Lum_TdmPin *FindPin(Lum_TdmBlock const *block, Visit const &visit) {
+  std::vector<Orb_Pin *> const &pins = block->GetPins();
+  if (pins.empty())
+    return nullptr;
+  Orb_Context *context = block->GetContext();
+  Orb_BridgeHandle const bridge = context->GetBridgeHandle(Orb_Kind::Pin);
+  for (std::size_t i = 0; i < pins.size(); ++i) {
+    Lum_TdmPin *pin = ClientOf<Lum_TdmPin>(context, bridge, pins[i]);
+    if (visit(pin))
+      return pin;
+  }
+  return nullptr;
+}
+
+// Destroys the clients that `context` holds for what a graft put under
+// `block`, so that each is specialized afresh, and bound from its copied
+// properties, when next reached: the block's signals with their networks,
+// then each child block's pins and the child itself, followed at once by the
+// child's own contents, in host order. The block and its own pins keep
+// theirs. Walks with a stack of its own, as a hierarchy may be deep.
+void DiscardGraftedClients(Orb_Block const *block, Orb_Context *context) {
+  struct Frame {
+    Orb_Block const *block;
+    std::size_t nextChild;
+  };
+  std::vector<Frame> stack;
+  auto enter = [&stack, context](Orb_Block const *entered) {
+    for (Orb_Signal const *signal : entered->GetSignals()) {
+      delete context->GetClient(signal);
+      if (Orb_Network const *network = signal->GetNetwork())
+        delete context->GetClient(network);
+    }
+    stack.push_back(Frame{entered, 0});
+  };
+  enter(block);
+  while (!stack.empty()) {
+    Frame &frame = stack.back();
+    std::vector<Orb_Block *> const &children = frame.block->GetBlocks();
+    if (frame.nextChild == children.size()) {
+      stack.pop_back();
+      continue;
+    }
+    Orb_Block const *child = children[frame.nextChild++];
+    for (Orb_Pin const *pin : child->GetPins())
+      delete context->GetClient(pin);
+    delete context->GetClient(child);
+    enter(child);
+  }
+}
+
+// Calls UnregisterGraftEventHandlers when it goes out of scope, so that a
+// graft that throws does not leave the model's handlers registered.
+class GraftHooks {
+public:
+  explicit GraftHooks(Lum_TdmModel *model) : m_pModel(model) {
+    m_pModel->RegisterGraftEventHandlers();
+  }
+  ~GraftHooks() {
+    if (m_pModel)
+      m_pModel->UnregisterGraftEventHandlers();
+  }
+  GraftHooks(GraftHooks const &) = delete;
+  GraftHooks &operator=(GraftHooks const &) = delete;
+  void Unregister() {
+    Lum_TdmModel *model = m_pModel;
+    m_pModel = nullptr;
+    model->UnregisterGraftEventHandlers();
+  }
+
+private:
+  Lum_TdmModel *m_pModel;
+};
 
 } // namespace
 
@@ -180,6 +288,333 @@ void Lum_TdmBlock::SortPinsByName() {
   Orb_SortFtor<Orb_Pin> const byName(&sorter);
   SortPins(byName);
 }
+
+// ---------------------------------------------------------------------------
+// Creating children from type blocks
+
+bool Lum_TdmBlock::IsOfViewLibrary(Lum_TlmBlock const *typeBlock) const {
+  // A type block belongs to the library that shares its client model.
+  Orb_ModelDerived const *typeModel = typeBlock->GetClientOrbModel();
+  std::vector<Lum_TlmLibrary const *> const &libraries = GetView()->GetLibraryList();
+  return std::any_of(libraries.begin(), libraries.end(),
+                     [typeModel](Lum_TlmLibrary const *library) {
+                       return library && library->GetClientOrbModel() == typeModel;
+                     });
+}
+
+Lum_TdmBlock *Lum_TdmBlock::CreateTypedBlock(char const *name, Lum_TlmBlock const *typeBlock,
+                                             bool graft, bool pins) {
+  if (!typeBlock)
+    throw Lum_ExceptionInvalidTypeBlock("Lum", kSourcePath, kRevision, __LINE__, GetName(),
+                                        "Null type block specified in CreateTypedBlock.", false);
+  if (!IsOfViewLibrary(typeBlock))
+    throw Lum_ExceptionCorruptDatabase("Lum", kSourcePath, kRevision, __LINE__,
+                                       typeBlock->GetName(),
+                                       "Could not locate the specified library.", false);
+
+  Lum_TdmBlock *child = CreateBlock(name, 0);
+  if (pins) {
+    std::size_t const typePinCount = typeBlock->GetPins().size();
+    for (std::size_t i = 0; i < typePinCount; ++i) {
+      Lum_TlmPin const *typePin = typeBlock->GetPin(i);
+      child->CreatePin(typePin->GetName(), typePin->GetDirection())->SetTypePin(typePin);
+    }
+  }
+  child->m_pTypeBlock = typeBlock;
+  child->InitTypeBlock();
+
+  if (!graft)
+    return child;
+  Port::StringBase<char> const viewName(GetView()->GetName());
+  if (!typeBlock->HasHier(viewName))
+    return child;
+  Lum_TdmModel *model = GetClientOrbModel();
+  GraftHooks hooks(model);
+  Ora_GraftMgr grafter(false, false);
+  grafter.SetBlockBackReferences(true);
+  grafter.SetNetworkBackReferences(true);
+  grafter.Graft(typeBlock->GetHier(viewName), child->GetOrbBlock());
+  model->CleanupGraftProps();
+  hooks.Unregister();
+  DiscardGraftedClients(child->GetOrbBlock(), GetContext());
+  return child;
+}
+
+Lum_TdmBlock *Lum_TdmBlock::CreateUntypedBlock(char const *name, Lum_TlmBlock const *typeBlock) {
+  if (!typeBlock)
+    throw Lum_ExceptionInvalidTypeBlock("Lum", kSourcePath, kRevision, __LINE__, GetName(),
+                                        "Null type block specified in CreateUntypedBlock.", false);
+  Lum_TdmBlock *child = CreateBlock(name, 0);
+  Ora_GraftMgr pinCopier(false, false);
+  std::size_t const typePinCount = typeBlock->GetPins().size();
+  for (std::size_t i = 0; i < typePinCount; ++i) {
+    Lum_TlmPin const *typePin = typeBlock->GetPin(i);
+    Lum_TdmPin *pin = child->CreatePin(typePin->GetName(), typePin->GetDirection());
+    pinCopier.CopyPinProperties(typePin->GetOrbPin(), pin->GetOrbPin());
+  }
+  std::string association = typeBlock->GetClientOrbModel()->GetDbName();
+  association += ':';
+  association += typeBlock->GetName();
+  association += ' ';
+  association += UT_TIMESTAMP().getTimeStampString();
+  child->CreatePropertyString("TDS_LIBRARY_ASSOC", association.c_str());
+
+  Port::StringBase<char> const viewName(GetView()->GetName());
+  if (typeBlock->HasHier(viewName)) {
+    GraftHooks hooks(GetClientOrbModel());
+    Ora_GraftMgr grafter(false, false);
+    grafter.Graft(typeBlock->GetHier(viewName), child->GetOrbBlock());
+    hooks.Unregister();
+  }
+  return child;
+}
+
+// ---------------------------------------------------------------------------
+// Rebinding
+
+void Lum_TdmBlock::VerifyTypeBlock(Lum_TlmBlock const *typeBlock) const {
+  assert(typeBlock && "VerifyTypeBlock needs a type block");
+  if (!IsOfViewLibrary(typeBlock))
+    throw Lum_ExceptionCorruptDatabase("Lum", kSourcePath, kRevision, __LINE__,
+                                       typeBlock->GetName(),
+                                       "Could not locate the specified library.", false);
+  Orb_Block const *typeHost = typeBlock->GetOrbBlock();
+  for (Orb_Pin const *pin : GetOrbBlock()->GetPins())
+    if (pin->GetSignal() && !typeHost->GetPinByName(pin->GetName()))
+      throw Lum_ExceptionCorruptDatabase("Lum", kSourcePath, kRevision, __LINE__,
+                                         typeBlock->GetName(),
+                                         "Mismatch between design block pins and type block "
+                                         "pins.\n",
+                                         false);
+}
+
+void Lum_TdmBlock::SetTypeBlock(Lum_TlmBlock const *typeBlock) {
+  if (typeBlock == m_pTypeBlock)
+    return;
+  if (typeBlock) {
+    try {
+      VerifyTypeBlock(typeBlock);
+    } catch (Port::Exception const &) {
+      throw Lum_ExceptionInvalidTypeBlock("Lum", kSourcePath, kRevision, __LINE__,
+                                          typeBlock->GetName(), "Could not resolve the Type Block.",
+                                          false);
+    }
+  }
+
+  // What the pins carry now, so that a failed reconciliation can be undone:
+  // it may have rebound some pins and created others before it threw.
+  Orb_Context *context = GetContext();
+  Orb_BridgeHandle const bridge = context->GetBridgeHandle(Orb_Kind::Pin);
+  std::vector<Orb_Pin *> const &pins = GetOrbBlock()->GetPins();
+  std::vector<std::pair<Orb_Pin *, Lum_TlmPin const *>> before;
+  before.reserve(pins.size());
+  for (Orb_Pin *pin : pins)
+    before.emplace_back(pin, ClientOf<Lum_TdmPin>(context, bridge, pin)->GetTypePin());
+  try {
+    ReconcilePins(typeBlock);
+  } catch (...) {
+    std::unordered_set<Orb_Pin const *> kept;
+    kept.reserve(before.size());
+    for (auto const &[pin, typePin] : before) {
+      ClientOf<Lum_TdmPin>(context, bridge, pin)->SetTypePin(typePin);
+      kept.insert(pin);
+    }
+    std::vector<Orb_Pin *> created;
+    for (Orb_Pin *pin : GetOrbBlock()->GetPins())
+      if (!kept.count(pin))
+        created.push_back(pin);
+    for (Orb_Pin *pin : created)
+      DeletePin(pin);
+    throw;
+  }
+  m_pTypeBlock = typeBlock;
+  InitTypeBlock();
+}
+
+void Lum_TdmBlock::SetTypeBlock(Lum_TlmBlock const *typeBlock, Lum_TdmTypePinMap const &pinMap) {
+  if (typeBlock == m_pTypeBlock)
+    return;
+  Orb_Context *context = GetContext();
+  Orb_BridgeHandle const bridge = context->GetBridgeHandle(Orb_Kind::Pin);
+  std::vector<Orb_Pin *> const &pins = GetOrbBlock()->GetPins();
+  if (!typeBlock) {
+    m_pTypeBlock = nullptr;
+    for (Orb_Pin *pin : pins)
+      ClientOf<Lum_TdmPin>(context, bridge, pin)->SetTypePin(nullptr);
+    InitTypeBlock();
+    return;
+  }
+  try {
+    VerifyTypeBlock(typeBlock);
+  } catch (Port::Exception const &) {
+    throw Lum_ExceptionCorruptDatabase("Lum", kSourcePath, kRevision, __LINE__,
+                                       typeBlock->GetName(),
+                                       "Could not locate the specified library.", false);
+  }
+  if (pinMap.GetNumPins() > GetNumPins())
+    throw Lum_ExceptionCorruptDatabase("Lum", kSourcePath, kRevision, __LINE__,
+                                       typeBlock->GetName(),
+                                       "The specified pin map has more pins then the library "
+                                       "block.",
+                                       false);
+
+  // Every pin's mapping is checked before any pin changes.
+  std::vector<std::pair<Lum_TdmPin *, Lum_TlmPin const *>> mapped;
+  mapped.reserve(pins.size());
+  for (Orb_Pin *hostPin : pins) {
+    Lum_TdmPin *pin = ClientOf<Lum_TdmPin>(context, bridge, hostPin);
+    Lum_TlmPin const *typePin = pinMap.GetPinMapping(pin);
+    if (!typePin || typePin->GetParent() != typeBlock)
+      throw Lum_ExceptionCorruptDatabase("Lum", kSourcePath, kRevision, __LINE__, pin->GetName(),
+                                         "Invalid type pin specified in type pin map.", false);
+    mapped.emplace_back(pin, typePin);
+  }
+  for (auto const &[pin, typePin] : mapped)
+    pin->SetTypePin(typePin);
+  m_pTypeBlock = typeBlock;
+  InitTypeBlock();
+}
+
+// ---------------------------------------------------------------------------
+// Typed queries
+
+Lum_TlmBlock const *Lum_TdmBlock::GetTypeBlock(Orb_Context const *context) const {
+  if (!m_pTypeBlock)
+    return nullptr;
+  Orb_Block const *typeHost = m_pTypeBlock->GetOrbBlock();
+  if (!typeHost)
+    return nullptr;
+  // A context whose client of that block is no type block (another kind of
+  // client model over the library) cannot resolve it either.
+  auto const *resolved =
+      dynamic_cast<Lum_TlmBlock const *>(Orb_BlockDerived::OrbResolve(context, typeHost));
+  if (!resolved)
+    throw Lum_ExceptionInvalidTypeBlock("Lum", kSourcePath, kRevision, __LINE__, GetName(),
+                                        "Could not resolve the Type Block.", false);
+  return resolved;
+}
+
+Orb_Block const *Lum_TdmBlock::GetNativeTypeBlock() const {
+  return m_pTypeBlock ? m_pTypeBlock->GetOrbBlock() : nullptr;
+}
+
+bool Lum_TdmBlock::IsTypeOf(Lum_TlmBlockTypeID const &typeId) const {
+  return typeId.RepresentsTypeBlock(m_pTypeBlock);
+}
+
+Lum_TdmBlock const *Lum_TdmBlock::GetFirstChildBlockOfType(Lum_TlmBlockTypeID const &typeId) const {
+  return FindChild(this, [&typeId](Lum_TdmBlock const *child) {
+    return typeId.RepresentsTypeBlock(child->m_pTypeBlock);
+  });
+}
+
+Lum_TdmBlock *Lum_TdmBlock::GetFirstChildBlockOfType(Lum_TlmBlockTypeID const &typeId) {
+  return const_cast<Lum_TdmBlock *>(std::as_const(*this).GetFirstChildBlockOfType(typeId));
+}
+
+Lum_TdmBlock const *Lum_TdmBlock::GetChildBlockOfType(Lum_TlmBlockTypeID const &typeId) const {
+  return GetFirstChildBlockOfType(typeId);
+}
+
+Lum_TdmBlock *Lum_TdmBlock::GetChildBlockOfType(Lum_TlmBlockTypeID const &typeId) {
+  return GetFirstChildBlockOfType(typeId);
+}
+
+void Lum_TdmBlock::GetChildBlocksOfType(Lum_TlmBlock const *typeBlock,
+                                        std::vector<Lum_TdmBlock const *> &blocks) const {
+  FindChild(this, [typeBlock, &blocks](Lum_TdmBlock const *child) {
+    if (child->m_pTypeBlock == typeBlock)
+      blocks.push_back(child);
+    return false;
+  });
+}
+
+void Lum_TdmBlock::GetChildBlocksOfType(Lum_TlmBlock const *typeBlock,
+                                        std::vector<Lum_TdmBlock *> &blocks) {
+  FindChild(this, [typeBlock, &blocks](Lum_TdmBlock *child) {
+    if (child->m_pTypeBlock == typeBlock)
+      blocks.push_back(child);
+    return false;
+  });
+}
+
+void Lum_TdmBlock::GetChildBlocksOfType(Lum_TlmBlockTypeID const &typeId,
+                                        std::vector<Lum_TdmBlock const *> &blocks) const {
+  FindChild(this, [&typeId, &blocks](Lum_TdmBlock const *child) {
+    if (typeId.RepresentsTypeBlock(child->m_pTypeBlock))
+      blocks.push_back(child);
+    return false;
+  });
+}
+
+void Lum_TdmBlock::GetChildBlocksOfType(Lum_TlmBlockTypeID const &typeId,
+                                        std::vector<Lum_TdmBlock *> &blocks) {
+  FindChild(this, [&typeId, &blocks](Lum_TdmBlock *child) {
+    if (typeId.RepresentsTypeBlock(child->m_pTypeBlock))
+      blocks.push_back(child);
+    return false;
+  });
+}
+
+std::vector<Lum_TdmBlock *> Lum_TdmBlock::GetChildBlocksOfType(Lum_TlmBlock const *typeBlock) {
+  // Type blocks are compared by their host block, so that one of another
+  // client model over the same library matches too.
+  Orb_Block const *typeHost = typeBlock ? typeBlock->GetOrbBlock() : nullptr;
+  std::vector<Lum_TdmBlock *> blocks;
+  FindChild(this, [typeHost, &blocks](Lum_TdmBlock *child) {
+    if (child->GetNativeTypeBlock() == typeHost)
+      blocks.push_back(child);
+    return false;
+  });
+  return blocks;
+}
+
+std::vector<Lum_TdmBlock const *>
+Lum_TdmBlock::GetChildBlocksOfType(Lum_TlmBlock const *typeBlock) const {
+  Orb_Block const *typeHost = typeBlock ? typeBlock->GetOrbBlock() : nullptr;
+  std::vector<Lum_TdmBlock const *> blocks;
+  FindChild(this, [typeHost, &blocks](Lum_TdmBlock const *child) {
+    if (child->GetNativeTypeBlock() == typeHost)
+      blocks.push_back(child);
+    return false;
+  });
+  return blocks;
+}
+
+Lum_TdmPin const *Lum_TdmBlock::GetPinOfType(Lum_TlmPinTypeID const &typeId) const {
+  return FindPin(this, [&typeId](Lum_TdmPin const *pin) { return pin->IsTypeOf(typeId); });
+}
+
+Lum_TdmPin *Lum_TdmBlock::GetPinOfType(Lum_TlmPinTypeID const &typeId) {
+  return const_cast<Lum_TdmPin *>(std::as_const(*this).GetPinOfType(typeId));
+}
+
+Lum_TdmPin const *Lum_TdmBlock::GetPinOfType(Lum_TlmPin const *typePin) const {
+  return FindPin(this, [typePin](Lum_TdmPin const *pin) { return pin->GetTypePin() == typePin; });
+}
+
+Lum_TdmPin *Lum_TdmBlock::GetPinOfType(Lum_TlmPin const *typePin) {
+  return const_cast<Lum_TdmPin *>(std::as_const(*this).GetPinOfType(typePin));
+}
+
+// ---------------------------------------------------------------------------
+// Pin order
+
+bool Lum_TdmBlock::ManifestAllTypedPins() {
+  if (!m_pTypeBlock || m_pTypeBlock->GetNumPins() <= GetNumPins())
+    return false;
+  Orb_Block const *host = GetOrbBlock();
+  std::size_t const typePinCount = m_pTypeBlock->GetPins().size();
+  for (std::size_t i = 0; i < typePinCount; ++i) {
+    Lum_TlmPin const *typePin = m_pTypeBlock->GetPin(i);
+    if (!host->GetPinByName(typePin->GetName()))
+      CreatePin(typePin->GetName(), typePin->GetDirection())->SetTypePin(typePin);
+  }
+  SortPinsByName();
+  return true;
+}
+
+void Lum_TdmBlock::NormalizePins() { SortPinsByName(); }
 
 // ---------------------------------------------------------------------------
 // Commit

@@ -1,12 +1,18 @@
 // Typed blocks: binding from the stored type on load, pin reconciliation, the
-// pin name order, the block's commit and the commit walk.
+// pin name order, the block's commit and the commit walk; the caller's
+// operations: creating children from type blocks, rebinding, typed queries
+// and pin manifestation.
 
 #include "Lum_TdmTestSupport.h"
 
 #include "Lum_TdmPinAlpaSorter.h"
 
 #include "Lum_Exception.h"
+#include "Lum_TdmTypePinMap.h"
+#include "Lum_TlmTypeID.h"
+#include "Ora_GraftMgr.h"
 #include "Orb_Debug.h"
+#include "Orb_Exception.h"
 #include "Port_Stream.h"
 
 #include <gtest/gtest.h>
@@ -14,8 +20,10 @@
 #include <algorithm>
 #include <cstring>
 #include <fstream>
+#include <functional>
 #include <iterator>
 #include <map>
+#include <regex>
 #include <sstream>
 #include <utility>
 
@@ -567,23 +575,567 @@ TEST(TdmPinAlpaSorterTest, EqualNamesAreNotOrdered) {
 // ---------------------------------------------------------------------------
 // Dump
 
-// The own dump shows the type block's address and name, or null and an
-// empty name.
-TEST_F(TdmBlockTest, DumpShowsTheTypeBlock) {
-  auto model = Open(WriteDesign(kMappedReg));
-  Port::StringStream out;
-  Port::Stream *previous = Orb_Debug::SetOutput(&out);
-  U1(*model)->Dbg();
-  U1(*model)->GetParent()->Dbg();
-  Orb_Debug::SetOutput(previous);
-  std::ostringstream address;
-  address << std::hex << reinterpret_cast<std::uintptr_t>(m_pReg);
-  std::string const typed = "Data for class <Lum_TdmBlock>:\n(Lum_TlmBlock *) m_pTypeBlock = <0x" +
-                            address.str() + ">, (REG)\n";
-  std::string const untyped =
-      "Data for class <Lum_TdmBlock>:\n(Lum_TlmBlock *) m_pTypeBlock = <0x0>, ()\n";
-  EXPECT_LT(out.GetText().find(typed), out.GetText().find(untyped)) << out.GetText();
-  EXPECT_NE(out.GetText().find(untyped), std::string::npos) << out.GetText();
+// ---------------------------------------------------------------------------
+// Caller operations
+
+class CallerModel;
+
+// A block that counts its InitTypeBlock calls in its model.
+class CallerBlock : public Lum_TdmBlock {
+public:
+  using Lum_TdmBlock::Lum_TdmBlock;
+
+protected:
+  void InitTypeBlock() override;
+};
+
+// A model that logs its graft hooks and makes CallerBlocks.
+class CallerModel : public Lum_TdmModel {
+public:
+  CallerModel() : Lum_TdmModel("caller", "callerdb", "") {}
+  void RegisterGraftEventHandlers() override { m_Hooks += "register,"; }
+  void CleanupGraftProps() override { m_Hooks += "cleanup,"; }
+  void UnregisterGraftEventHandlers() override { m_Hooks += "unregister,"; }
+  void SyncEventSpecializeBlockOnCreate(Orb_Block *block) override {
+    new CallerBlock(this, block, true);
+  }
+  void SyncEventSpecializeBlockOnLoad(Orb_Block *block) override {
+    new CallerBlock(this, block, false);
+  }
+
+  std::string m_Hooks;
+  int m_Inits = 0;
+  std::string m_SignalOnInit; // a signal InitTypeBlock makes, when not empty
+};
+
+void CallerBlock::InitTypeBlock() {
+  CallerModel *model = static_cast<CallerModel *>(GetClientOrbModel());
+  ++model->m_Inits;
+  if (!model->m_SignalOnInit.empty())
+    CreateSignal(model->m_SignalOnInit.c_str());
+}
+
+// What a failure said: "class|object|message".
+template <class Action> std::string Failure(Action const &action) {
+  try {
+    action();
+  } catch (Lum_ExceptionInvalidTypeBlock const &e) {
+    return "InvalidTypeBlock|" + e.GetObjectName() + "|" + e.GetMessage();
+  } catch (Lum_ExceptionCorruptDatabase const &e) {
+    return "CorruptDatabase|" + e.GetObjectName() + "|" + e.GetMessage();
+  }
+  return "no failure";
+}
+
+// Library LIBC, listed by the design's view: REG (D0, D1, CLK in, Q out; D0
+// carries LOC=P1) with a hierarchy for "netlist" (a child a1 of type AND on
+// signal n1 of network VCC, n1 also inside D0), AND (A, B in, Y out), EMPTY
+// (no pins). Library LIBO, not listed, with AND.
+class TdmCallerTest : public ::testing::Test {
+protected:
+  TdmCallerTest() : m_Library("LIBC", 1, 0), m_Unlisted("LIBO", 1, 0) {
+    m_pReg = m_Library.AddTypeBlock("REG", {"D0", "D1", "CLK"});
+    m_pReg->CreatePin("Q", Orb_Pin::PIN_OUTPUT);
+    m_pReg->GetPinByName("D0")->CreatePropertyString("LOC", "P1");
+    m_pAnd = m_Library.AddTypeBlock("AND", {"A", "B"});
+    m_pAnd->CreatePin("Y", Orb_Pin::PIN_OUTPUT);
+    m_pEmpty = m_Library.AddTypeBlock("EMPTY");
+    m_pForeign = m_Unlisted.AddTypeBlock("AND", {"A", "B"});
+
+    Lum_TlmBlock *hier = m_pReg->CreateHier("netlist");
+    Lum_TlmSignal *n1 = hier->CreateSignal("n1");
+    hier->GetView()->CreateNetwork("VCC")->GetOrbNetwork()->AddSignal(n1->GetOrbSignal());
+    hier->CreatePin("D0", Orb_Pin::PIN_INPUT)->GetOrbPin()->ConnectInner(n1->GetOrbSignal());
+    Lum_TlmBlock *a1 = hier->CreateBlock("a1", 0);
+    a1->CreatePin("A", Orb_Pin::PIN_INPUT)->GetOrbPin()->Connect(n1->GetOrbSignal());
+    a1->CreatePropertyString("TDS_BLOCK_TYPE", "LIBC:AND");
+
+    m_Design.m_pView->CreatePropertyStringList("TDS_VIEW_TYPE_LIBS")->AppendString("LIBC 1.0");
+    m_pTop = m_Design.m_pView->CreateTopBlock("top");
+  }
+
+  CallerModel &Model() { return static_cast<CallerModel &>(m_Design.Model()); }
+
+  TempDir m_Dir;
+  TestLibrary m_Library;
+  TestLibrary m_Unlisted;
+  Lum_TlmBlock *m_pReg = nullptr;
+  Lum_TlmBlock *m_pAnd = nullptr;
+  Lum_TlmBlock *m_pEmpty = nullptr;
+  Lum_TlmBlock *m_pForeign = nullptr;
+  TypedDesign m_Design{std::make_unique<CallerModel>()};
+  Lum_TdmBlock *m_pTop = nullptr;
+};
+
+// Refused creations name the right object and create no child.
+TEST_F(TdmCallerTest, RefusedCreationsCreateNothing) {
+  EXPECT_EQ(Failure([&] { m_pTop->CreateTypedBlock("u", nullptr, true, true); }),
+            "InvalidTypeBlock|top|Null type block specified in CreateTypedBlock.");
+  EXPECT_EQ(Failure([&] { m_pTop->CreateUntypedBlock("u", nullptr); }),
+            "InvalidTypeBlock|top|Null type block specified in CreateUntypedBlock.");
+  EXPECT_EQ(Failure([&] { m_pTop->CreateTypedBlock("u", m_pForeign, true, true); }),
+            "CorruptDatabase|AND|Could not locate the specified library.");
+  EXPECT_TRUE(m_pTop->GetBlocks().empty());
+  EXPECT_EQ(Model().m_Hooks, "");
+}
+
+// The pins flag gives one bound pin per type pin in type order, or none; the
+// child is typed either way and InitTypeBlock ran once per child.
+TEST_F(TdmCallerTest, TypedChildPins) {
+  Lum_TdmBlock *with = m_pTop->CreateTypedBlock("with", m_pReg, false, true);
+  Lum_TdmBlock *without = m_pTop->CreateTypedBlock("without", m_pReg, false, false);
+  Lum_TdmBlock *empty = m_pTop->CreateTypedBlock("empty", m_pEmpty, true, true);
+  Lum_TdmBlock *untypedEmpty = m_pTop->CreateUntypedBlock("uempty", m_pEmpty);
+  EXPECT_EQ(PinText(with), "D0,D1,CLK,Q");
+  EXPECT_EQ(with->GetPinByName("Q")->GetDirection(), Orb_Pin::PIN_OUTPUT);
+  EXPECT_EQ(with->GetPin(0)->GetTypePin(), m_pReg->GetPin(0));
+  EXPECT_EQ(PinText(without), "");
+  EXPECT_EQ(PinText(empty), "");
+  EXPECT_EQ(PinText(untypedEmpty), "");
+  EXPECT_EQ(without->GetTypeBlock(), m_pReg);
+  EXPECT_EQ(empty->GetTypeBlock(), m_pEmpty);
+  EXPECT_EQ(untypedEmpty->GetTypeBlock(), nullptr);
+  EXPECT_EQ(Model().m_Inits, 3);
+  EXPECT_EQ(Model().m_Hooks, "") << "no hierarchy grafted";
+}
+
+// The hooks run around a graft only: typed register, cleanup, unregister;
+// untyped (always grafting) register, unregister.
+TEST_F(TdmCallerTest, GraftHooksInOrder) {
+  struct Case {
+    char const *what;
+    std::function<void(Lum_TdmBlock *)> create;
+    char const *hooks;
+  };
+  std::vector<Case> const cases{
+      {"typed, graft", [&](Lum_TdmBlock *top) { top->CreateTypedBlock("u", m_pReg, true, false); },
+       "register,cleanup,unregister,"},
+      {"typed, no graft",
+       [&](Lum_TdmBlock *top) { top->CreateTypedBlock("u", m_pReg, false, true); }, ""},
+      {"typed, no hierarchy",
+       [&](Lum_TdmBlock *top) { top->CreateTypedBlock("u", m_pAnd, true, true); }, ""},
+      {"untyped", [&](Lum_TdmBlock *top) { top->CreateUntypedBlock("u", m_pReg); },
+       "register,unregister,"},
+      {"untyped, no hierarchy", [&](Lum_TdmBlock *top) { top->CreateUntypedBlock("u", m_pAnd); },
+       ""},
+  };
+  for (Case const &c : cases) {
+    Model().m_Hooks.clear();
+    Lum_TdmBlock *top = m_Design.m_pView->GetBlock();
+    c.create(top);
+    EXPECT_EQ(Model().m_Hooks, c.hooks) << c.what;
+    top->DeleteBlock(top->GetBlocks().front());
+  }
+}
+
+// A graft that fails part way (a name already taken under the child) lets
+// the host's exception out, unregistered, and the child stays.
+TEST_F(TdmCallerTest, FailedGraftUnregisters) {
+  Model().m_SignalOnInit = "n1";
+  EXPECT_THROW(m_pTop->CreateTypedBlock("u", m_pReg, true, true), Orb_Exception);
+  EXPECT_EQ(Model().m_Hooks, "register,unregister,");
+  ASSERT_EQ(m_pTop->GetBlocks().size(), 1u);
+  EXPECT_EQ(PinText(m_pTop->GetBlock(0)), "D0,D1,CLK,Q");
+}
+
+// After a typed graft nothing under the child has a client until it is
+// reached again; the grafted a1 then binds from its copied type.
+TEST_F(TdmCallerTest, GraftedObjectsAreBoundAfresh) {
+  Lum_TdmBlock *u = m_pTop->CreateTypedBlock("u", m_pReg, true, true);
+  Lum_TdmModel &model = Model();
+  EXPECT_EQ(model.GetClient(u->GetOrbBlock()), u);
+  for (Orb_Pin const *pin : u->GetPins())
+    EXPECT_NE(model.GetClient(pin), nullptr) << "the child's own pin " << pin->GetName();
+  ASSERT_EQ(u->GetSignals().size(), 1u);
+  Orb_Signal const *n1 = u->GetSignals().front();
+  ASSERT_NE(n1->GetNetwork(), nullptr);
+  EXPECT_EQ(model.GetClient(n1), nullptr);
+  EXPECT_EQ(model.GetClient(n1->GetNetwork()), nullptr);
+  Orb_Block const *a1 = u->GetOrbBlock()->GetBlocks().front();
+  EXPECT_EQ(model.GetClient(a1), nullptr);
+  EXPECT_EQ(model.GetClient(a1->GetPins().front()), nullptr);
+
+  Lum_TdmBlock *reached = u->GetBlockByName("a1");
+  EXPECT_EQ(reached->GetTypeBlock(), m_pAnd);
+  EXPECT_EQ(PinText(reached), "A,B,Y") << "the missing pins come with the binding";
+  EXPECT_NE(u->GetSignal(0)->GetNetwork(), nullptr);
+}
+
+// The caller wires the new child outside; its grafted inside stays, and both
+// sides and the binding survive commit, save and reopen. Two children of one
+// type block get separate inner networks.
+TEST_F(TdmCallerTest, WiredTypedChildrenSurviveReopen) {
+  Lum_TdmBlock *u1 = m_pTop->CreateTypedBlock("u1", m_pReg, true, true);
+  Lum_TdmBlock *u2 = m_pTop->CreateTypedBlock("u2", m_pReg, true, true);
+  Orb_Signal *wire = m_pTop->CreateSignal("w")->GetOrbSignal();
+  u1->GetPinByName("D0")->GetOrbPin()->Connect(wire);
+  u2->GetPinByName("D0")->GetOrbPin()->Connect(wire);
+  m_Design.m_pView->CommitAll();
+
+  auto reopened = SaveAndReopen(Model(), m_Dir.File("wired.odb"));
+  Lum_TdmBlock *top = FirstView(*reopened)->GetBlock();
+  std::vector<Orb_Network const *> inner;
+  for (char const *name : {"u1", "u2"}) {
+    Lum_TdmBlock *child = top->GetBlockByName(name);
+    ASSERT_NE(child, nullptr) << name;
+    EXPECT_EQ(child->GetTypeBlock(), m_pReg) << name;
+    EXPECT_EQ(PinText(child), "D0,D1,CLK,Q") << name;
+    Orb_Pin const *d0 = child->GetPinByName("D0")->GetOrbPin();
+    ASSERT_NE(d0->GetSignal(), nullptr) << name;
+    EXPECT_STREQ(d0->GetSignal()->GetName(), "w") << name;
+    ASSERT_NE(d0->GetInnerSignal(), nullptr) << name;
+    EXPECT_STREQ(d0->GetInnerSignal()->GetName(), "n1") << name;
+    inner.push_back(d0->GetInnerSignal()->GetNetwork());
+    EXPECT_EQ(child->GetBlockByName("a1")->GetTypeBlock(), m_pAnd) << name;
+  }
+  ASSERT_NE(inner[0], nullptr);
+  EXPECT_NE(inner[0], inner[1]);
+}
+
+// An untyped copy: the type's pins with their properties but no type pins,
+// the hierarchy, and where it came from.
+TEST_F(TdmCallerTest, UntypedCopy) {
+  Lum_TdmBlock *u = m_pTop->CreateUntypedBlock("u", m_pReg);
+  EXPECT_EQ(u->GetTypeBlock(), nullptr);
+  EXPECT_EQ(PinText(u), "D0!,D1!,CLK!,Q!");
+  EXPECT_EQ(u->GetPinByName("Q")->GetDirection(), Orb_Pin::PIN_OUTPUT);
+  EXPECT_EQ(PropertyValue(u->GetPinByName("D0"), "LOC"), "P1");
+  EXPECT_EQ(PropertyValue(u->GetPinByName("D1"), "LOC"), "<absent>");
+  EXPECT_NE(u->GetBlockByName("a1"), nullptr);
+  std::string const association = PropertyValue(u, "TDS_LIBRARY_ASSOC");
+  EXPECT_TRUE(std::regex_match(association,
+                               std::regex("LIBC:REG \\d{4}-\\d\\d-\\d\\dT\\d\\d:\\d\\d:\\d\\dZ")))
+      << association;
+  EXPECT_EQ(Model().m_Inits, 0);
+  m_Design.m_pView->CommitAll();
+  EXPECT_EQ(PropertyValue(u, "TDS_LIBRARY_ASSOC"), association) << "a commit keeps it";
+}
+
+// Rebinding. Besides the fixture's: OLD (B, A), OLD2 (R), MAPT (P, Q, R),
+// AND2 (A, B, Y, Z) and TGT (A, BB, Y), all in LIBC.
+class TdmRebindTest : public TdmCallerTest {
+protected:
+  TdmRebindTest() {
+    m_pOld = m_Library.AddTypeBlock("OLD", {"B", "A"});
+    m_pOld2 = m_Library.AddTypeBlock("OLD2", {"R"});
+    m_pMapt = m_Library.AddTypeBlock("MAPT", {"P", "Q", "R"});
+    m_pAnd2 = m_Library.AddTypeBlock("AND2", {"A", "B", "Y", "Z"});
+    m_pTgt = m_Library.AddTypeBlock("TGT", {"A", "BB", "Y"});
+    m_pWire = m_pTop->CreateSignal("s")->GetOrbSignal();
+  }
+
+  // A child of AND with its pins, A connected.
+  Lum_TdmBlock *AndChild(char const *name = "v") {
+    Lum_TdmBlock *child = m_pTop->CreateTypedBlock(name, m_pAnd, false, true);
+    child->GetPinByName("A")->GetOrbPin()->Connect(m_pWire);
+    return child;
+  }
+
+  // The block's type block, then each pin as name=typeblock.typepin (or
+  // name=- without one), in host order.
+  static std::string State(Lum_TdmBlock const *block) {
+    Lum_TlmBlock const *type = block->GetTypeBlock();
+    std::string text = type ? type->GetName() : "-";
+    for (std::size_t i = 0; i < block->GetPins().size(); ++i) {
+      Lum_TdmPin const *pin = block->GetPin(i);
+      Lum_TlmPin const *typePin = pin->GetTypePin();
+      text +=
+          std::string(" ") + pin->GetName() + "=" +
+          (typePin ? std::string(typePin->GetParent()->GetName()) + "." + typePin->GetName() : "-");
+    }
+    return text;
+  }
+
+  static Lum_TdmTypePinMap Map(std::vector<std::pair<char const *, Lum_TlmPin const *>> const &e) {
+    Lum_TdmTypePinMap map;
+    for (auto const &[name, typePin] : e)
+      map.SetPinMap(Port::StringBase<char>(name), typePin);
+    return map;
+  }
+
+  Lum_TlmBlock *m_pOld = nullptr;
+  Lum_TlmBlock *m_pOld2 = nullptr;
+  Lum_TlmBlock *m_pMapt = nullptr;
+  Lum_TlmBlock *m_pAnd2 = nullptr;
+  Lum_TlmBlock *m_pTgt = nullptr;
+  Orb_Signal *m_pWire = nullptr;
+};
+
+// The current type block again, or null on an untyped block, does nothing in
+// either form, even when the pins would not match.
+TEST_F(TdmRebindTest, SameBindingDoesNothing) {
+  Lum_TdmBlock *v = AndChild();
+  v->CreatePin("X", Orb_Pin::PIN_INPUT)->GetOrbPin()->Connect(m_pWire);
+  Lum_TdmBlock *plain = m_pTop->CreateBlock("plain", 0);
+  plain->CreatePin("Q", Orb_Pin::PIN_INPUT);
+  std::string const before = State(v);
+  int const inits = Model().m_Inits;
+  v->SetTypeBlock(m_pAnd);
+  v->SetTypeBlock(m_pAnd, Lum_TdmTypePinMap());
+  plain->SetTypeBlock(nullptr);
+  plain->SetTypeBlock(nullptr, Lum_TdmTypePinMap());
+  EXPECT_EQ(State(v), before);
+  EXPECT_EQ(State(plain), "- Q=-");
+  EXPECT_EQ(Model().m_Inits, inits);
+}
+
+// Null on a typed block, in either form, clears the block and every pin,
+// calls InitTypeBlock once, and the next commit drops the stored typing.
+TEST_F(TdmRebindTest, NullUnbinds) {
+  for (bool withMap : {false, true}) {
+    Lum_TdmBlock *v = AndChild(withMap ? "m" : "a");
+    m_Design.m_pView->CommitAll();
+    ASSERT_EQ(PropertyValue(v, "TDS_BLOCK_TYPE"), "LIBC:AND");
+    int const inits = Model().m_Inits;
+    if (withMap)
+      v->SetTypeBlock(nullptr, Lum_TdmTypePinMap());
+    else
+      v->SetTypeBlock(nullptr);
+    EXPECT_EQ(State(v), "- A=- B=- Y=-") << withMap;
+    EXPECT_EQ(Model().m_Inits, inits + 1) << withMap;
+    m_Design.m_pView->CommitAll();
+    EXPECT_EQ(PropertyValue(v, "TDS_BLOCK_TYPE"), "<absent>") << withMap;
+  }
+}
+
+// Each refusal names its object and leaves the block exactly as it was: its
+// type block, every pin's type pin, no pin created by the call, no
+// InitTypeBlock.
+TEST_F(TdmRebindTest, FailuresChangeNothing) {
+  struct Case {
+    char const *what;
+    std::function<Lum_TdmBlock *()> setup;
+    std::function<void(Lum_TdmBlock *)> rebind;
+    std::string failure;
+  };
+  auto andChild = [this] { return AndChild(); };
+  std::vector<Case> const cases{
+      {"alone, unlisted library", andChild, [&](Lum_TdmBlock *v) { v->SetTypeBlock(m_pForeign); },
+       "InvalidTypeBlock|AND|Could not resolve the Type Block."},
+      {"alone, connected pin missing", andChild, [&](Lum_TdmBlock *v) { v->SetTypeBlock(m_pReg); },
+       "InvalidTypeBlock|REG|Could not resolve the Type Block."},
+      {"map, unlisted library", andChild,
+       [&](Lum_TdmBlock *v) { v->SetTypeBlock(m_pForeign, Lum_TdmTypePinMap()); },
+       "CorruptDatabase|AND|Could not locate the specified library."},
+      {"map, connected pin missing", andChild,
+       [&](Lum_TdmBlock *v) { v->SetTypeBlock(m_pReg, Lum_TdmTypePinMap()); },
+       "CorruptDatabase|REG|Could not locate the specified library."},
+      {"map, more entries than pins", andChild,
+       [&](Lum_TdmBlock *v) {
+         v->SetTypeBlock(m_pAnd2, Map({{"A", m_pAnd2->GetPinByName("A")},
+                                       {"B", m_pAnd2->GetPinByName("B")},
+                                       {"Y", m_pAnd2->GetPinByName("Y")},
+                                       {"Z", m_pAnd2->GetPinByName("Z")}}));
+       },
+       "CorruptDatabase|AND2|The specified pin map has more pins then the library block."},
+      {"map, pin of another type block", andChild,
+       [&](Lum_TdmBlock *v) {
+         v->SetTypeBlock(m_pAnd2, Map({{"A", m_pAnd2->GetPinByName("A")},
+                                       {"B", m_pAnd->GetPinByName("B")},
+                                       {"Y", m_pAnd2->GetPinByName("Y")}}));
+       },
+       "CorruptDatabase|B|Invalid type pin specified in type pin map."},
+      {"map, pin unmapped", andChild,
+       [&](Lum_TdmBlock *v) {
+         v->SetTypeBlock(
+             m_pAnd2, Map({{"A", m_pAnd2->GetPinByName("A")}, {"Y", m_pAnd2->GetPinByName("Y")}}));
+       },
+       "CorruptDatabase|B|Invalid type pin specified in type pin map."},
+      {"alone, matching fails after a pin was rebound",
+       [&] {
+         Lum_TdmBlock *v = m_pTop->CreateTypedBlock("v", m_pOld, false, true);
+         v->GetPinByName("A")->GetOrbPin()->Connect(m_pWire);
+         v->CreatePropertyList("TDS_BLOCK_PIN_MAP")->CreatePropertyString("A", "ZZ");
+         return v;
+       },
+       [&](Lum_TdmBlock *v) { v->SetTypeBlock(m_pAnd); },
+       "CorruptDatabase|A|Could not locate the specified pin."},
+      {"alone, matching fails after a pin was created",
+       [&] {
+         Lum_TdmBlock *v = m_pTop->CreateTypedBlock("v", m_pOld2, false, true);
+         v->CreatePropertyList("TDS_BLOCK_PIN_MAP")->CreatePropertyString("R", "P");
+         return v;
+       },
+       [&](Lum_TdmBlock *v) { v->SetTypeBlock(m_pMapt); },
+       "CorruptDatabase|top|While trying to patch up design block <v> with new type pin <R>\nof "
+       "type block <MAPT>, found that the block already had a pin by that\nname.  This could "
+       "have been due to an earlier and inappropriate\nclient call to pin->SetName().\n"},
+  };
+  for (Case const &c : cases) {
+    Lum_TdmBlock *v = c.setup();
+    std::string const before = State(v);
+    int const inits = Model().m_Inits;
+    EXPECT_EQ(Failure([&] { c.rebind(v); }), c.failure) << c.what;
+    EXPECT_EQ(State(v), before) << c.what;
+    EXPECT_EQ(Model().m_Inits, inits) << c.what;
+    m_pTop->DeleteBlock(v->GetOrbBlock());
+  }
+}
+
+// An unconnected pin that the type block lacks passes the check and ends
+// without a type pin.
+TEST_F(TdmRebindTest, UnconnectedExtraPinPasses) {
+  Lum_TdmBlock *v = AndChild();
+  v->CreatePin("X", Orb_Pin::PIN_INPUT);
+  v->SetTypeBlock(m_pAnd2);
+  EXPECT_EQ(State(v), "AND2 A=AND2.A B=AND2.B Y=AND2.Y X=-");
+}
+
+// A rebinding through a map reaches the store at the next commit and comes
+// back from a reopen; so does one through the stored map alone.
+TEST_F(TdmRebindTest, RebindingSurvivesReopen) {
+  Lum_TdmBlock *v = AndChild("v");
+  v->SetTypeBlock(m_pTgt, Map({{"A", m_pTgt->GetPinByName("A")},
+                               {"B", m_pTgt->GetPinByName("BB")},
+                               {"Y", m_pTgt->GetPinByName("Y")}}));
+  Lum_TdmBlock *w = AndChild("w");
+  w->SetTypeBlock(m_pAnd2);
+  Lum_TdmBlock *empty = m_pTop->CreateBlock("empty", 0);
+  int const inits = Model().m_Inits;
+  empty->SetTypeBlock(m_pEmpty, Lum_TdmTypePinMap());
+  EXPECT_EQ(Model().m_Inits, inits + 1);
+  m_Design.m_pView->CommitAll();
+  auto reopened = SaveAndReopen(Model(), m_Dir.File("rebound.odb"));
+  Lum_TdmBlock *top = FirstView(*reopened)->GetBlock();
+  EXPECT_EQ(State(top->GetBlockByName("v")), "TGT A=TGT.A B=TGT.BB Y=TGT.Y");
+  EXPECT_EQ(State(top->GetBlockByName("w")), "AND2 A=AND2.A B=AND2.B Y=AND2.Y Z=AND2.Z");
+  EXPECT_EQ(State(top->GetBlockByName("empty")), "EMPTY");
+}
+
+// The names of blocks, joined with ",".
+template <class Block> std::string Names(std::vector<Block *> const &blocks) {
+  std::string text;
+  for (Block *block : blocks)
+    text += (text.empty() ? "" : ",") + std::string(block->GetName());
+  return text;
+}
+
+// Queries over children u1 (REG), u2 (AND), u3 (untyped), u4 (REG), and REG
+// as a second client model of the library's host model sees it.
+class TdmQueryTest : public TdmCallerTest {
+protected:
+  TdmQueryTest() : m_Second(m_pReg->GetClientOrbModel()->GetOrbModel()) {
+    m_pU1 = m_pTop->CreateTypedBlock("u1", m_pReg, false, true);
+    m_pTop->CreateTypedBlock("u2", m_pAnd, false, true);
+    m_pTop->CreateBlock("u3", 0);
+    m_pTop->CreateTypedBlock("u4", m_pReg, false, false);
+    m_pSecondReg = m_Second.GetLibrary()->GetTypeBlock(Port::StringBase<char>("REG"));
+  }
+
+  Lum_TlmModel m_Second;
+  Lum_TlmBlock const *m_pSecondReg = nullptr;
+  Lum_TdmBlock *m_pU1 = nullptr;
+};
+
+// Children by type block, by identifier, in both forms and both twins.
+TEST_F(TdmQueryTest, ChildBlocksOfType) {
+  Lum_TdmBlock const *top = m_pTop;
+  ASSERT_NE(m_pSecondReg, nullptr);
+  ASSERT_NE(m_pSecondReg, m_pReg);
+  // The returning form matches by host block, so another model's REG too.
+  EXPECT_EQ(Names(m_pTop->GetChildBlocksOfType(m_pReg)), "u1,u4");
+  EXPECT_EQ(Names(m_pTop->GetChildBlocksOfType(m_pSecondReg)), "u1,u4");
+  EXPECT_EQ(Names(top->GetChildBlocksOfType(m_pSecondReg)), "u1,u4");
+  EXPECT_EQ(Names(m_pTop->GetChildBlocksOfType(nullptr)), "u3");
+  EXPECT_EQ(Names(top->GetChildBlocksOfType(nullptr)), "u3");
+  EXPECT_TRUE(m_pU1->GetChildBlocksOfType(m_pReg).empty());
+
+  // The filling form matches the very object and appends.
+  std::vector<Lum_TdmBlock *> blocks{m_pU1};
+  m_pTop->GetChildBlocksOfType(m_pSecondReg, blocks);
+  EXPECT_EQ(Names(blocks), "u1");
+  m_pTop->GetChildBlocksOfType(m_pReg, blocks);
+  m_pTop->GetChildBlocksOfType(nullptr, blocks);
+  m_pTop->GetChildBlocksOfType(Lum_TlmBlockTypeID("LIBC", "AND"), blocks);
+  EXPECT_EQ(Names(blocks), "u1,u1,u4,u3,u2");
+  std::vector<Lum_TdmBlock const *> constBlocks;
+  top->GetChildBlocksOfType(m_pReg, constBlocks);
+  top->GetChildBlocksOfType(Lum_TlmBlockTypeID(), constBlocks);
+  top->GetChildBlocksOfType(m_pSecondReg, constBlocks);
+  EXPECT_EQ(Names(constBlocks), "u1,u4,u3");
+
+  Lum_TlmBlockTypeID const reg("LIBC", "REG");
+  EXPECT_EQ(m_pTop->GetFirstChildBlockOfType(reg), m_pU1);
+  EXPECT_EQ(m_pTop->GetChildBlockOfType(reg), m_pU1);
+  EXPECT_EQ(top->GetFirstChildBlockOfType(reg), m_pU1);
+  EXPECT_EQ(top->GetChildBlockOfType(Lum_TlmBlockTypeID())->GetName(), std::string("u3"));
+  EXPECT_EQ(m_pTop->GetChildBlockOfType(Lum_TlmBlockTypeID("LIBC", "EMPTY")), nullptr);
+  EXPECT_EQ(m_pU1->GetFirstChildBlockOfType(reg), nullptr);
+}
+
+// Pins by type pin (null: the first untyped one) and by identifier.
+TEST_F(TdmQueryTest, PinOfType) {
+  Lum_TdmPin *extra = m_pU1->CreatePin("X", Orb_Pin::PIN_INPUT);
+  Lum_TdmBlock const *u1 = m_pU1;
+  EXPECT_EQ(m_pU1->GetPinOfType(static_cast<Lum_TlmPin const *>(nullptr)), extra);
+  EXPECT_EQ(u1->GetPinOfType(static_cast<Lum_TlmPin const *>(nullptr)), extra);
+  EXPECT_EQ(m_pU1->GetPinOfType(m_pReg->GetPinByName("CLK")), m_pU1->GetPinByName("CLK"));
+  EXPECT_EQ(u1->GetPinOfType(Lum_TlmPinTypeID("LIBC", "REG", "Q")), m_pU1->GetPinByName("Q"));
+  EXPECT_EQ(m_pU1->GetPinOfType(Lum_TlmPinTypeID("LIBC", "AND", "A")), nullptr);
+  Lum_TdmBlock *u2 = m_pTop->GetBlockByName("u2");
+  EXPECT_EQ(u2->GetPinOfType(static_cast<Lum_TlmPin const *>(nullptr)), nullptr) << "all typed";
+  EXPECT_EQ(m_pTop->GetPinOfType(Lum_TlmPinTypeID()), nullptr) << "no pins";
+}
+
+// The block's own type: as resolved in a context, as a host block, by
+// identifier.
+TEST_F(TdmQueryTest, OwnType) {
+  Lum_TdmBlock const *u3 = m_pTop->GetBlockByName("u3");
+  EXPECT_EQ(m_pU1->GetTypeBlock(m_pReg->GetContext()), m_pReg);
+  EXPECT_EQ(m_pU1->GetTypeBlock(&m_Second), m_pSecondReg);
+  EXPECT_EQ(Failure([&] { m_pU1->GetTypeBlock(&Model()); }),
+            "InvalidTypeBlock|u1|Could not resolve the Type Block.");
+  Lum_TdmModel designClients(m_pReg->GetClientOrbModel()->GetOrbModel());
+  ASSERT_NE(designClients.Specialize(m_pReg->GetOrbBlock()), nullptr);
+  EXPECT_EQ(Failure([&] { m_pU1->GetTypeBlock(&designClients); }),
+            "InvalidTypeBlock|u1|Could not resolve the Type Block.")
+      << "its client there is no type block";
+  EXPECT_EQ(Failure([&] { m_pU1->GetTypeBlock(nullptr); }),
+            "InvalidTypeBlock|u1|Could not resolve the Type Block.");
+  EXPECT_EQ(u3->GetTypeBlock(&Model()), nullptr) << "untyped: nothing to resolve";
+  EXPECT_EQ(m_pU1->GetNativeTypeBlock(), m_pReg->GetOrbBlock());
+  EXPECT_EQ(u3->GetNativeTypeBlock(), nullptr);
+  EXPECT_TRUE(m_pU1->IsTypeOf(Lum_TlmBlockTypeID("LIBC", "REG")));
+  EXPECT_FALSE(m_pU1->IsTypeOf(Lum_TlmBlockTypeID()));
+  EXPECT_TRUE(u3->IsTypeOf(Lum_TlmBlockTypeID()));
+}
+
+// Manifestation creates the missing typed pins and sorts, only for a typed
+// block with fewer pins than its type; NormalizePins only sorts.
+TEST_F(TdmCallerTest, ManifestAllTypedPins) {
+  struct Case {
+    char const *what;
+    Lum_TlmBlock const *type;
+    std::vector<char const *> pins; // a pin named like a REG pin gets that type pin
+    bool manifested;
+    char const *after;
+  };
+  std::vector<Case> const cases{
+      {"untyped", nullptr, {"Z", "A"}, false, "Z!,A!"},
+      {"as many pins, other names", m_pReg, {"Z", "Y", "X", "W"}, false, "Z!,Y!,X!,W!"},
+      {"fewer pins", m_pReg, {"X", "Q"}, true, "CLK,D0,D1,Q,X!"},
+      {"no pins", m_pReg, {}, true, "CLK,D0,D1,Q"},
+  };
+  for (Case const &c : cases) {
+    Lum_TdmBlock *u =
+        c.type ? m_pTop->CreateTypedBlock("u", c.type, false, false) : m_pTop->CreateBlock("u", 0);
+    for (char const *name : c.pins)
+      u->CreatePin(name, Orb_Pin::PIN_OUTPUT)->SetTypePin(m_pReg->GetPinByName(name));
+    EXPECT_EQ(u->ManifestAllTypedPins(), c.manifested) << c.what;
+    EXPECT_EQ(PinText(u), c.after) << c.what;
+    if (c.manifested) {
+      EXPECT_EQ(u->GetPinByName("CLK")->GetTypePin(), m_pReg->GetPinByName("CLK")) << c.what;
+      EXPECT_EQ(u->GetPinByName("D0")->GetDirection(), Orb_Pin::PIN_INPUT) << c.what;
+    }
+    m_pTop->DeleteBlock(u->GetOrbBlock());
+  }
+
+  m_pTop->NormalizePins();
+  EXPECT_EQ(PinText(m_pTop), "");
+  for (char const *name : {"b", "B", "a"})
+    m_pTop->CreatePin(name, Orb_Pin::PIN_INPUT);
+  m_pTop->NormalizePins();
+  EXPECT_EQ(PinText(m_pTop), "B!,a!,b!");
 }
 
 } // namespace
