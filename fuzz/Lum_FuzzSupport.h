@@ -99,6 +99,7 @@ public:
     m_pReg->CreatePin("Q", Orb_Pin::PIN_OUTPUT);
     m_pReg->CreatePin("EN", Orb_Pin::PIN_BIDIRECTIONAL);
     Lum_TlmBlock *hier = m_pReg->CreateHier("netlist");
+    m_pHier = hier;
     hier->CreatePin("D0", Orb_Pin::PIN_INPUT);
     Lum_TlmBlock *inner = hier->CreateBlock("ff", 0);
     inner->CreatePin("D", Orb_Pin::PIN_INPUT);
@@ -118,12 +119,16 @@ public:
   Lum_TlmLibrary *Get() const { return m_pLibrary; }
   Lum_TlmBlock *Reg() const { return m_pReg; }
   Lum_TlmBlock *Abc() const { return m_pAbc; }
+  // The top block of REG's hierarchy for "netlist": a block of the library,
+  // but no type block.
+  Lum_TlmBlock *Hier() const { return m_pHier; }
 
 private:
   Lum_TlmModel m_Model;
   Lum_TlmLibrary *m_pLibrary = nullptr;
   Lum_TlmBlock *m_pReg = nullptr;
   Lum_TlmBlock *m_pAbc = nullptr;
+  Lum_TlmBlock *m_pHier = nullptr;
 };
 
 // Runs `call`; true when it returned. A Port::Exception with a message and
@@ -239,20 +244,22 @@ inline void CheckSameTyping(Typing const &before, Typing const &after) {
 }
 
 // Commits, saves to `path`, reopens in a fresh model and checks that the
-// typing survived. Failures of the commit or the save are allowed; a save
+// typing survived; returns the reopened model, or null when the commit or
+// the save failed (allowed) or the reopen met the known limit below. A save
 // that succeeded must reopen.
-inline void CommitSaveReopen(Lum_TdmModel &model, std::string const &path) {
+inline std::unique_ptr<Lum_TdmModel> CommitSaveReopen(Lum_TdmModel &model,
+                                                      std::string const &path) {
   if (!Attempt("commit", [&] { CommitAll(model); }))
-    return;
+    return nullptr;
   Typing before;
   if (!Attempt("typing walk", [&] { before = TypingOf(model); }))
-    return;
+    return nullptr;
   if (!Attempt("save", [&] { model.Save(path.c_str()); }))
-    return;
-  Lum_TdmModel reopened("reopened", "reopened", "");
-  bool const opened = Attempt("reopen", [&] { reopened.Open(path.c_str()); });
+    return nullptr;
+  auto reopened = std::make_unique<Lum_TdmModel>("reopened", "reopened", "");
+  bool const opened = Attempt("reopen", [&] { reopened->Open(path.c_str()); });
   if (!opened) {
-    CheckEmptyAfterRefusal(reopened);
+    CheckEmptyAfterRefusal(*reopened);
     // A known limit of the stored form, not a finding here: a pin that took
     // another type pin's name keeps that type pin's own name from being
     // created again, which the reconciliation of the reopen refuses. The
@@ -260,12 +267,13 @@ inline void CommitSaveReopen(Lum_TdmModel &model, std::string const &path) {
     // (LUM_DONT_CREATE_UNUSED_PINS, which the commit drops) or because the
     // pins were bound through an explicit pin map.
     if (LastFailure().find("found that the block already had a pin by that") != std::string::npos)
-      return;
+      return nullptr;
     Fail("a saved design does not reopen: " + LastFailure());
   }
   Typing after;
-  if (Attempt("typing walk of the reopened design", [&] { after = TypingOf(reopened); }))
+  if (Attempt("typing walk of the reopened design", [&] { after = TypingOf(*reopened); }))
     CheckSameTyping(before, after);
+  return reopened;
 }
 
 } // namespace LumFuzz
