@@ -7,8 +7,8 @@
 
 #include "Lum_FuzzSupport.h"
 
-#include "Lum_TdmTypePinMap.h"
 #include "Lum_Exception.h"
+#include "Lum_TdmTypePinMap.h"
 
 #include <fuzzer/FuzzedDataProvider.h>
 
@@ -130,7 +130,8 @@ private:
       Lum_TlmBlock const *from = how == 6 ? LumFuzz::TheLibrary().Abc() : typeBlock;
       Lum_TlmPin const *typePin = nullptr;
       if (from && how != 5 && !from->GetPins().empty())
-        typePin = from->GetPin(m_In.ConsumeIntegralInRange<std::size_t>(0, from->GetPins().size() - 1));
+        typePin =
+            from->GetPin(m_In.ConsumeIntegralInRange<std::size_t>(0, from->GetPins().size() - 1));
       map.SetPinMap(block->GetPin(i), typePin);
     }
     if (m_In.ConsumeIntegralInRange(0, 7) == 0)
@@ -141,8 +142,7 @@ private:
   void Step() {
     std::vector<Lum_TdmBlock *> blocks;
     CollectBlocks(ViewOf(*m_pModel)->GetBlock(), blocks);
-    Lum_TdmBlock *block =
-        blocks[m_In.ConsumeIntegralInRange<std::size_t>(0, blocks.size() - 1)];
+    Lum_TdmBlock *block = blocks[m_In.ConsumeIntegralInRange<std::size_t>(0, blocks.size() - 1)];
     switch (m_In.ConsumeIntegralInRange(0, 9)) {
     case 0:
     case 1: {
@@ -173,8 +173,7 @@ private:
         return;
       char const *name = Pick(kNames);
       Lum_TlmBlock const *typeBlock = TypeBlock();
-      LumFuzz::Attempt("CreateUntypedBlock",
-                       [&] { block->CreateUntypedBlock(name, typeBlock); });
+      LumFuzz::Attempt("CreateUntypedBlock", [&] { block->CreateUntypedBlock(name, typeBlock); });
       return;
     }
     case 3: {
@@ -182,8 +181,7 @@ private:
       std::string const before = BlockTyping(block);
       if (!LumFuzz::Attempt("SetTypeBlock", [&] { block->SetTypeBlock(typeBlock); }))
         LumFuzz::Check(BlockTyping(block) == before, "a failed SetTypeBlock changed the block: " +
-                                                         before + " became " +
-                                                         BlockTyping(block));
+                                                         before + " became " + BlockTyping(block));
       return;
     }
     case 4: {
