@@ -153,7 +153,8 @@ std::size_t Reachable(Orb_Model const &model) {
     for (Orb_Design const *design : designMgr->GetDesigns()) {
       ++count;
       for (Orb_View const *view : design->GetViews())
-        count += 1 + view->GetNetworks().size() + (view->GetBlock() ? Reachable(view->GetBlock()) : 0);
+        count +=
+            1 + view->GetNetworks().size() + (view->GetBlock() ? Reachable(view->GetBlock()) : 0);
     }
   }
   return count;
