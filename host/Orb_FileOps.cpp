@@ -5,7 +5,8 @@
 
 namespace {
 
-Orb_FileOps g_FileOps = Orb_FileOps::System();
+// Constant-initialized: in place before any static constructor may save.
+Orb_FileOps g_FileOps{&::write, &::fsync, &::close, &::rename};
 
 } // namespace
 
