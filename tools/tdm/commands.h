@@ -1,0 +1,34 @@
+#pragma once
+
+// The subcommands of tdm. Each returns the exit code, or throws Failure.
+
+#include "common.h"
+
+#include <string>
+
+namespace tdm {
+
+struct DemoOptions {
+  std::string dir;     // empty: a new folder in the current directory
+  std::string program; // how the user ran tdm, for the commands it suggests
+};
+int RunDemo(DemoOptions const &demo, CommonOptions const &options);
+
+int RunInfo(std::string const &path, CommonOptions const &options);
+
+int RunCheck(std::string const &path, CommonOptions const &options);
+
+struct CommitOptions {
+  std::string output; // empty: in place
+};
+int RunCommit(std::string const &path, CommitOptions const &commit, CommonOptions const &options);
+
+struct TreeOptions {
+  std::string view; // empty: every view
+  int depth = -1;   // levels below the top block; negative: all
+  bool pins = false;
+};
+int RunTree(std::string const &path, TreeOptions const &tree, CommonOptions const &options);
+int RunDot(std::string const &path, TreeOptions const &tree, CommonOptions const &options);
+
+} // namespace tdm

@@ -1,0 +1,155 @@
+// tdm: the command-line tool for typed design databases. main parses the
+// command line and runs one subcommand; every failure ends here as one line
+// on standard error and an exit code, never as a crash.
+
+#include "commands.h"
+
+#include "Port_Exception.h"
+
+#include <CLI/CLI.hpp>
+
+#include <cstdio>
+#include <exception>
+#include <new>
+#include <string>
+
+namespace {
+
+char const kExitCodes[] = "Exit codes:\n"
+                          "  0  success (tdm check: no problems)\n"
+                          "  1  problems found (tdm check; tdm demo: a binding did not come back)\n"
+                          "  2  usage error\n"
+                          "  3  a database or library that cannot be read, or a file that cannot "
+                          "be written\n";
+
+void AddCommonOptions(CLI::App *command, tdm::CommonOptions &options) {
+  command
+      ->add_option("--lib-path", options.libPath,
+                   "Directory searched for type libraries (<dir>/<personality>/<name>.tlm, then "
+                   "<dir>/<name>.tlm); repeatable, searched in order before LUM_TLM_PATH")
+      ->type_name("DIR")
+      ->allow_extra_args(false)
+      ->take_all();
+  command->add_flag("-q,--quiet", options.quiet,
+                    "No progress line and no output beyond results and errors");
+}
+
+void AddDatabase(CLI::App *command, std::string &path) {
+  command->add_option("DB", path, "Design database file")->required();
+}
+
+int Main(int argc, char **argv) {
+  CLI::App app("tdm: look at, check and upgrade typed design databases.\n", "tdm");
+  app.footer(kExitCodes);
+  app.require_subcommand(1);
+
+  tdm::CommonOptions common;
+  std::string database;
+  tdm::DemoOptions demo;
+  demo.program = argc > 0 && argv[0] ? argv[0] : "tdm";
+  tdm::CommitOptions commit;
+  tdm::TreeOptions tree;
+
+  CLI::App *demoCommand = app.add_subcommand(
+      "demo", "Write two sample type libraries and a typed design database using them, commit, "
+              "save and reopen it, check every binding came back and print a summary");
+  demoCommand
+      ->add_option("--dir", demo.dir,
+                   "Folder for the files (made if missing; default: a new folder "
+                   "tdm_demo_XXXXXX in the current directory)")
+      ->type_name("DIR");
+
+  CLI::App *infoCommand = app.add_subcommand(
+      "info", "Per design and view: stamp, device, type libraries (recorded and found now), "
+              "blocks per type block, pins, signals, networks and the memory report");
+  AddDatabase(infoCommand, database);
+
+  CLI::App *checkCommand = app.add_subcommand(
+      "check", "List every problem that makes opening the database fail, grouped, without "
+               "opening it through the client model (exit 1 when there are any)");
+  AddDatabase(checkCommand, database);
+
+  CLI::App *commitCommand = app.add_subcommand(
+      "commit", "Open the database, commit every view and save it, in place (through a "
+                "temporary file) or to OUT: upgrades the stamp and rewrites library lists and "
+                "pin maps");
+  AddDatabase(commitCommand, database);
+  commitCommand->add_option("-o,--output", commit.output, "Write to OUT instead of in place")
+      ->type_name("OUT");
+
+  CLI::App *treeCommand = app.add_subcommand(
+      "tree", "Print the block hierarchy with each block's type block ('-' when untyped)");
+  CLI::App *dotCommand = app.add_subcommand(
+      "dot", "Write the block hierarchy as a Graphviz graph (render with: dot -Tsvg)");
+  for (CLI::App *command : {treeCommand, dotCommand}) {
+    AddDatabase(command, database);
+    command->add_option("--view", tree.view, "Only the views of this name")->type_name("V");
+    command
+        ->add_option("--depth", tree.depth,
+                     "Levels below the top block to show (0: the top block alone)")
+        ->type_name("N")
+        ->check(CLI::NonNegativeNumber);
+  }
+  treeCommand->add_flag("--pins", tree.pins, "Also each pin with its direction and type pin");
+
+  for (CLI::App *command :
+       {demoCommand, infoCommand, checkCommand, commitCommand, treeCommand, dotCommand}) {
+    AddCommonOptions(command, common);
+    command->footer(kExitCodes);
+  }
+
+  try {
+    app.parse(argc, argv);
+  } catch (CLI::ParseError const &e) {
+    // --help is a "parse error" that exits 0.
+    int const code = app.exit(e);
+    return code == 0 ? tdm::kExitOk : tdm::kExitUsage;
+  }
+
+  std::string name = "tdm";
+  for (CLI::App const *command : app.get_subcommands())
+    name += " " + command->get_name();
+  try {
+    if (demoCommand->parsed())
+      return tdm::RunDemo(demo, common);
+    if (infoCommand->parsed())
+      return tdm::RunInfo(database, common);
+    if (checkCommand->parsed())
+      return tdm::RunCheck(database, common);
+    if (commitCommand->parsed())
+      return tdm::RunCommit(database, commit, common);
+    if (treeCommand->parsed())
+      return tdm::RunTree(database, tree, common);
+    return tdm::RunDot(database, tree, common);
+  } catch (tdm::Failure const &e) {
+    std::fflush(stdout);
+    std::fprintf(stderr, "%s: error: %s\n", name.c_str(), e.what());
+    return e.GetCode();
+  } catch (Port::Exception const &e) {
+    std::fflush(stdout);
+    std::fprintf(stderr, "%s: error: %s: %s\n", name.c_str(),
+                 database.empty() ? demo.dir.c_str() : database.c_str(), tdm::Describe(e).c_str());
+    return tdm::kExitUnreadable;
+  } catch (std::bad_alloc const &) {
+    std::fflush(stdout);
+    std::fprintf(stderr, "%s: error: %s: out of memory\n", name.c_str(), database.c_str());
+    return tdm::kExitUnreadable;
+  } catch (std::exception const &e) {
+    std::fflush(stdout);
+    std::fprintf(stderr, "%s: error: %s: %s\n", name.c_str(), database.c_str(), e.what());
+    return tdm::kExitUnreadable;
+  }
+}
+
+} // namespace
+
+int main(int argc, char **argv) {
+  try {
+    return Main(argc, argv);
+  } catch (std::exception const &e) {
+    std::fprintf(stderr, "tdm: error: %s\n", e.what());
+  } catch (...) {
+    std::fprintf(stderr, "tdm: error: unexpected failure\n");
+  }
+  return tdm::kExitUnreadable;
+}
