@@ -13,7 +13,7 @@ namespace {
 // A design "dm/top/netlist" listing FZ and the in-memory LIBT, with a block
 // of type FZ:CELL (pins A, B connected, Y open) and one of type LIBT:ABC.
 std::string WriteDesign() {
-  std::string const path = LumFuzz::TheScratch().File("design.odb");
+  std::string path = LumFuzz::TheScratch().File("design.odb");
   Lum_TdmModel model("fuzz", "fuzzdb", "");
   Lum_TdmView *view = model.CreateDesignMgr("dm")->CreateDesign("top")->CreateView("netlist");
   view->CreatePropertyString("TDS_DEVICE_PM", "pm1");

@@ -37,8 +37,8 @@ public:
   void Disarm() { m_FailAt = 0; }
   unsigned Count() const { return m_Count; }
 
-#define LUM_FAULT_EVENT(Event, Type)                                                               \
-  void Event(Type *object) override {                                                              \
+#define LUM_FAULT_EVENT(Event, Kind)                                                               \
+  void Event(Orb_##Kind *object) override {                                                        \
     unsigned const number = m_FailAt ? ++m_Count : 0;                                              \
     bool const fail = m_FailAt && number == m_FailAt;                                              \
     if (fail && !m_AfterClient)                                                                    \
@@ -47,18 +47,18 @@ public:
     if (fail)                                                                                      \
       throw InjectedFault{number};                                                                 \
   }
-  LUM_FAULT_EVENT(SyncEventSpecializeDesignMgrOnLoad, Orb_DesignMgr)
-  LUM_FAULT_EVENT(SyncEventSpecializeDesignOnCreate, Orb_Design)
-  LUM_FAULT_EVENT(SyncEventSpecializeDesignOnLoad, Orb_Design)
-  LUM_FAULT_EVENT(SyncEventSpecializeViewOnCreate, Orb_View)
-  LUM_FAULT_EVENT(SyncEventSpecializeViewOnLoad, Orb_View)
-  LUM_FAULT_EVENT(SyncEventSpecializeBlockOnCreate, Orb_Block)
-  LUM_FAULT_EVENT(SyncEventSpecializeBlockOnLoad, Orb_Block)
-  LUM_FAULT_EVENT(SyncEventSpecializePinOnCreate, Orb_Pin)
-  LUM_FAULT_EVENT(SyncEventSpecializePinOnLoad, Orb_Pin)
-  LUM_FAULT_EVENT(SyncEventSpecializeSignalOnCreate, Orb_Signal)
-  LUM_FAULT_EVENT(SyncEventSpecializeSignalOnLoad, Orb_Signal)
-  LUM_FAULT_EVENT(SyncEventSpecializeNetworkOnLoad, Orb_Network)
+  LUM_FAULT_EVENT(SyncEventSpecializeDesignMgrOnLoad, DesignMgr)
+  LUM_FAULT_EVENT(SyncEventSpecializeDesignOnCreate, Design)
+  LUM_FAULT_EVENT(SyncEventSpecializeDesignOnLoad, Design)
+  LUM_FAULT_EVENT(SyncEventSpecializeViewOnCreate, View)
+  LUM_FAULT_EVENT(SyncEventSpecializeViewOnLoad, View)
+  LUM_FAULT_EVENT(SyncEventSpecializeBlockOnCreate, Block)
+  LUM_FAULT_EVENT(SyncEventSpecializeBlockOnLoad, Block)
+  LUM_FAULT_EVENT(SyncEventSpecializePinOnCreate, Pin)
+  LUM_FAULT_EVENT(SyncEventSpecializePinOnLoad, Pin)
+  LUM_FAULT_EVENT(SyncEventSpecializeSignalOnCreate, Signal)
+  LUM_FAULT_EVENT(SyncEventSpecializeSignalOnLoad, Signal)
+  LUM_FAULT_EVENT(SyncEventSpecializeNetworkOnLoad, Network)
 #undef LUM_FAULT_EVENT
 
 private:
