@@ -186,6 +186,9 @@ ByteWriter::ByteWriter(std::string const &path) : m_Path(path), m_Target(Resolve
   if (::stat(m_Target.c_str(), &status) == 0 && S_ISREG(status.st_mode))
     m_Mode = static_cast<int>(status.st_mode & 07777);
   RemoveStaleTemporaries(m_Target);
+  // Before the file exists: a constructor that throws after it would leave
+  // the file behind, since the destructor does not run.
+  m_Buffer.reserve(kBufferSize);
   // O_EXCL with a fresh suffix on collision: a stale file of a crashed save
   // or a concurrent save to the same target is never reused. Private until
   // Commit gives it the replaced file's bits.
@@ -196,7 +199,6 @@ ByteWriter::ByteWriter(std::string const &path) : m_Path(path), m_Target(Resolve
     if (m_Fd < 0 && (errno != EEXIST || attempt == 100))
       Fail("cannot create the temporary file", errno);
   }
-  m_Buffer.reserve(kBufferSize);
 }
 
 ByteWriter::~ByteWriter() {

@@ -5,11 +5,13 @@
 
 #include "Lum_TdmFaultSupport.h"
 
+#include "Orb_Exception.h"
 #include "Port_Exception.h"
 
 #include <gtest/gtest.h>
 
 #include <cstdlib>
+#include <filesystem>
 #include <new>
 #include <string>
 
@@ -189,6 +191,45 @@ TEST(TdmAllocFaultTest, FailedAllocationWhileCreatingLeavesNoStrayObject) {
     if (built)
       break;
   }
+}
+
+// A save whose k-th allocation fails, for every k, throws std::bad_alloc or
+// Orb_Exception and leaves the previous database byte for byte, with no
+// temporary file beside it.
+TEST(TdmAllocFaultTest, FailedAllocationWhileSavingKeepsThePreviousDatabase) {
+  if (!ReplacementInUse())
+    GTEST_SKIP() << "operator new is not this program's (a memory checker replaced it)";
+  TempDir dir;
+  std::string const path = dir.File("d.odb");
+  TypedDesign design;
+  Lum_TdmBlock *top = design.m_pView->CreateTopBlock("top");
+  design.Model().Save(path.c_str());
+  std::string const previous = FileBytes(path);
+  top->CreateBlock("u1", 0)->CreatePin("a", Orb_Pin::PIN_INPUT);
+
+  for (unsigned long k = 1;; ++k) {
+    SCOPED_TRACE("allocation " + std::to_string(k));
+    bool saved = false;
+    {
+      FailingAllocation failing(k);
+      try {
+        design.Model().Save(path.c_str());
+        saved = true;
+      } catch (std::bad_alloc const &) {
+      } catch (Orb_Exception const &) {
+      }
+    }
+    std::size_t files = 0;
+    for (auto const &entry : std::filesystem::directory_iterator(dir.Path()))
+      files += entry.is_regular_file() ? 1 : 0;
+    ASSERT_EQ(files, 1u) << "a temporary file stays";
+    if (saved)
+      break;
+    ASSERT_EQ(FileBytes(path), previous);
+  }
+  auto reopened = std::make_unique<Lum_TdmModel>("r", "r", "");
+  reopened->Open(path.c_str());
+  EXPECT_NE(FirstView(*reopened)->GetBlock()->GetBlockByName("u1"), nullptr);
 }
 
 } // namespace
