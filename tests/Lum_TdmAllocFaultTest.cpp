@@ -5,7 +5,9 @@
 
 #include "Lum_TdmFaultSupport.h"
 
+#include "Lum_TdmTypePinMap.h"
 #include "Orb_Exception.h"
+#include "Orb_FileOps.h"
 #include "Port_Exception.h"
 
 #include <gtest/gtest.h>
@@ -230,6 +232,91 @@ TEST(TdmAllocFaultTest, FailedAllocationWhileSavingKeepsThePreviousDatabase) {
   auto reopened = std::make_unique<Lum_TdmModel>("r", "r", "");
   reopened->Open(path.c_str());
   EXPECT_NE(FirstView(*reopened)->GetBlock()->GetBlockByName("u1"), nullptr);
+}
+
+// The binding of a block and its pins, in host order.
+std::string BindingOf(Lum_TdmBlock *block) {
+  std::string text = block->GetTypeBlock() ? block->GetTypeBlock()->GetUniqueTag().str() : "-";
+  for (std::size_t i = 0; i < block->GetPins().size(); ++i) {
+    Lum_TdmPin *pin = block->GetPin(i);
+    text += std::string(" ") + pin->GetName() + ">" +
+            (pin->GetTypePin() ? pin->GetTypePin()->GetName() : "-");
+  }
+  return text;
+}
+
+int NoSync(int) { return 0; }
+
+// Rebinding with and without a pin map, and a typed child with its pins and
+// its grafted hierarchy, each with the k-th allocation failing, for every k:
+// the call throws std::bad_alloc or a library exception, a failed rebinding
+// leaves the block's binding and pins as they were, no object is left that
+// the model counts but cannot reach, and the design still saves and reopens.
+TEST(TdmAllocFaultTest, FailedAllocationInCallerOperationsKeepsTheDesignWhole) {
+  if (!ReplacementInUse())
+    GTEST_SKIP() << "operator new is not this program's (a memory checker replaced it)";
+  FaultDesign design;
+  // Thousands of saves: durability is not what this test is about.
+  Orb_FileOps fast = Orb_FileOps::Get();
+  fast.fsync = &NoSync;
+  Orb_FileOps const saved = Orb_FileOps::Set(fast);
+  for (int operation = 0; operation < 3; ++operation) {
+    for (unsigned long k = 1;; ++k) {
+      ASSERT_LT(k, 20000u) << "operation " << operation << " never succeeds";
+      SCOPED_TRACE("operation " + std::to_string(operation) + ", allocation " + std::to_string(k));
+      Lum_TdmModel model("alloc", "allocdb", "");
+      model.Open(design.Path().c_str());
+      Lum_TdmView *view =
+          model.GetDesignMgrByName("dm")->GetDesignByName("top")->GetViewByName("netlist");
+      Lum_TdmBlock *top = view->GetBlock();
+      // u2 (A connected, Y) and u4 (CLK, D0, D1, Q) are unbound first, to
+      // be bound again.
+      Lum_TdmBlock *u2 = top->GetBlockByName("u2");
+      Lum_TdmBlock *u4 = top->GetBlockByName("u4");
+      Lum_TlmBlock const *nand = u2->GetTypeBlock();
+      Lum_TlmBlock const *reg = u4->GetTypeBlock();
+      u2->SetTypeBlock(nullptr);
+      u4->SetTypeBlock(nullptr);
+      Lum_TdmTypePinMap map;
+      for (std::size_t i = 0; i < u4->GetPins().size(); ++i)
+        map.SetPinMap(u4->GetPin(i), reg->GetPinByName(u4->GetPin(i)->GetName()));
+      Lum_TdmBlock *rebound = operation == 0 ? u2 : u4;
+      std::string const before = BindingOf(rebound);
+      bool done = false;
+      bool failed = false;
+      {
+        FailingAllocation failing(k);
+        try {
+          if (operation == 0)
+            u2->SetTypeBlock(nand);
+          else if (operation == 1)
+            u4->SetTypeBlock(reg, map);
+          else
+            top->CreateTypedBlock("u9", reg, true, true);
+          done = true;
+        } catch (std::bad_alloc const &) {
+          failed = true;
+        } catch (Port::Exception const &e) {
+          failed = !e.GetMessage().empty();
+        }
+      }
+      ASSERT_TRUE(done || failed) << "an exception without a message";
+      if (failed && operation < 2) {
+        EXPECT_EQ(BindingOf(rebound), before) << "a failed rebinding changed the block";
+      }
+      std::size_t objects = 0;
+      for (unsigned kind = 0; kind < Orb_KindCount; ++kind)
+        objects += model.GetOrbModel()->GetObjectCount(static_cast<Orb_Kind>(kind));
+      ASSERT_EQ(objects, Reachable(*model.GetOrbModel()));
+      view->CommitAll();
+      model.Save(design.Scratch("caller.odb").c_str());
+      Lum_TdmModel reopened("r", "r", "");
+      reopened.Open(design.Scratch("caller.odb").c_str());
+      if (done)
+        break;
+    }
+  }
+  Orb_FileOps::Set(saved);
 }
 
 } // namespace
