@@ -104,7 +104,7 @@ Lum_TlmLibrary *Lum_TlmModel::CreateLibrary(char const *name, unsigned version, 
 }
 
 Lum_TlmLibrary *Lum_TlmModel::GetLibrary() {
-  std::vector<Orb_DesignMgr *> const &designMgrs = GetOrbModel()->GetDesignMgrs();
+  auto const designMgrs = GetOrbModel()->GetDesignMgrs();
   return designMgrs.empty() ? nullptr
                             : static_cast<Lum_TlmLibrary *>(Specialize(designMgrs.front()));
 }

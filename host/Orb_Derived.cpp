@@ -211,6 +211,13 @@ void Orb_Sync::FireDelete(Orb_Persistent *object) {
 // ---------------------------------------------------------------------------
 // Client bases
 
+// NOLINTNEXTLINE(misc-new-delete-overloads): matched by the sized delete
+void *Orb_ClientObject::operator new(std::size_t size) { return Orb_SmallAllocate(size); }
+
+void Orb_ClientObject::operator delete(void *pointer, std::size_t size) noexcept {
+  Orb_SmallRelease(pointer, size);
+}
+
 Orb_ClientObject::Orb_ClientObject(Orb_Context *context, Orb_Persistent *object)
     : m_pContext(context), m_pOrbObject(object) {
   assert(context && object && "a client needs a context and a host object");
@@ -353,7 +360,7 @@ Orb_ModelDerived::~Orb_ModelDerived() {
     // host objects in memory while the walk goes on, and the walk looks each
     // client up when it gets there.
     Orb_Model::FreeHold hold(*model);
-    std::vector<Orb_DesignMgr *> const &designMgrs = model->GetDesignMgrs();
+    auto const designMgrs = model->GetDesignMgrs();
     for (std::size_t i = 0; i < designMgrs.size(); ++i)
       Orb_VisitPostOrder(designMgrs[i],
                          [this](Orb_Persistent *object) { delete GetClient(object); });

@@ -9,6 +9,7 @@
 #include "Orb_Model.h"
 #include "Orb_Sync.h"
 
+#include <cstddef>
 #include <memory>
 #include <vector>
 
@@ -24,6 +25,12 @@ public:
 
   // Lets the client add its lines to the host's dump of its object.
   virtual void DebugDumpCallback(Port::Stream *stream, int indent) const;
+
+  // Client objects are many and small: they come from the size-class free
+  // lists of Orb_SmallAllocate, not from one heap block each.
+  // The matching delete is the sized one below, so that the size class is known.
+  static void *operator new(std::size_t size); // NOLINT(misc-new-delete-overloads)
+  static void operator delete(void *pointer, std::size_t size) noexcept;
 
   Orb_Context *GetContext() const { return m_pContext; }
   Orb_ModelDerived *GetClientOrbModel() const;
@@ -88,7 +95,9 @@ public:
       : Orb_ClientObject(context, network) {}
   Orb_Network *GetOrbNetwork() const { return static_cast<Orb_Network *>(GetOrbObject()); }
   Orb_ViewDerived *GetParent() const;
-  std::vector<Orb_Signal *> const &GetSignals() const { return GetOrbNetwork()->GetSignals(); }
+  Orb_Range<Orb_Signal, Orb_NetworkSlot> GetSignals() const {
+    return GetOrbNetwork()->GetSignals();
+  }
   void Dbg() const { DbgHost(); }
 };
 
@@ -105,9 +114,9 @@ public:
   Orb_BlockDerived *GetParent() const;
   Orb_ViewDerived *GetView() const;
 
-  std::vector<Orb_Block *> const &GetBlocks() const { return GetOrbBlock()->GetBlocks(); }
-  std::vector<Orb_Pin *> const &GetPins() const { return GetOrbBlock()->GetPins(); }
-  std::vector<Orb_Signal *> const &GetSignals() const { return GetOrbBlock()->GetSignals(); }
+  Orb_Range<Orb_Block> GetBlocks() const { return GetOrbBlock()->GetBlocks(); }
+  Orb_Range<Orb_Pin> GetPins() const { return GetOrbBlock()->GetPins(); }
+  Orb_Range<Orb_Signal> GetSignals() const { return GetOrbBlock()->GetSignals(); }
   unsigned GetNumPins() const { return GetOrbBlock()->GetNumPins(); }
 
   // The pin's client, specialized on demand, or null when there is no pin of
@@ -136,7 +145,7 @@ public:
   Orb_DesignDerived *GetParent() const;
   // The top block's client, specialized on demand, or null.
   Orb_BlockDerived *GetBlock() const;
-  std::vector<Orb_Network *> const &GetNetworks() const { return GetOrbView()->GetNetworks(); }
+  Orb_Range<Orb_Network> GetNetworks() const { return GetOrbView()->GetNetworks(); }
 
   Orb_BlockDerived *CreateTopBlock(char const *name);
   Orb_NetworkDerived *CreateNetwork(char const *name);

@@ -10,6 +10,7 @@
 #include <algorithm>
 #include <cassert>
 #include <exception>
+#include <mutex>
 #include <new>
 #include <string>
 
@@ -89,10 +90,10 @@ char const *Orb_PinDirectionName(Orb_Pin::PIN_DIRECTION direction) {
 
 Orb_Persistent::Orb_Persistent(Orb_Model *model, Orb_Kind kind, Orb_Persistent *parent,
                                std::string name)
-    : m_Name(std::move(name)), m_pModel(model), m_pParent(parent),
-      m_BridgeId(model->AllocateBridgeId(kind)), m_Kind(static_cast<std::uint8_t>(kind)) {}
+    : m_Name(std::move(name)), m_pModel(model), m_pParent(parent), m_BridgeId(0),
+      m_Kind(static_cast<std::uint8_t>(kind)) {}
 
-Orb_Persistent::~Orb_Persistent() { m_pModel->ReleaseBridgeId(GetKind(), m_BridgeId); }
+Orb_Persistent::~Orb_Persistent() = default;
 
 Orb_Pin::Orb_Pin(Orb_Model *model, Orb_Block *parent, std::string name, PIN_DIRECTION direction)
     : Orb_Persistent(model, Orb_Kind::Pin, parent, std::move(name)), m_Direction(direction) {}
@@ -127,18 +128,17 @@ void Orb_Pin::Link(Orb_Signal *&side, Orb_Signal *signal) {
     return;
   // Room first, so that running out of memory changes nothing.
   if (signal)
-    signal->m_Pins.reserve(signal->m_Pins.size() + 1);
+    signal->m_Pins.Reserve(1);
   Unlink(side);
   side = signal;
   if (signal)
-    signal->m_Pins.push_back(this);
+    signal->m_Pins.Add(this);
 }
 
 void Orb_Pin::Unlink(Orb_Signal *&side) noexcept {
   if (!side)
     return;
-  auto &pins = side->m_Pins;
-  pins.erase(std::find(pins.begin(), pins.end(), this));
+  side->m_Pins.Remove(this);
   side = nullptr;
 }
 
@@ -160,14 +160,14 @@ void Orb_Network::AddSignal(Orb_Signal *signal) {
                         "A network can only hold signals of its own view.");
   if (signal->m_pNetwork)
     signal->m_pNetwork->RemoveSignal(signal);
-  m_Signals.push_back(signal);
+  m_Signals.Add(signal);
   signal->m_pNetwork = this;
 }
 
 void Orb_Network::RemoveSignal(Orb_Signal *signal) {
   if (!signal || signal->m_pNetwork != this)
     return;
-  m_Signals.erase(std::find(m_Signals.begin(), m_Signals.end(), signal));
+  m_Signals.Remove(signal);
   signal->m_pNetwork = nullptr;
 }
 
@@ -190,34 +190,25 @@ unsigned Orb_Block::GetDepth() const {
 Orb_Block *Orb_Block::CreateBlock(char const *name, int /*flags*/) {
   CheckName(name, "block");
   CheckNotDying(this, "block", name);
-  if (m_Blocks.Find(name))
-    ThrowDuplicate(this, "block", name);
   if (GetDepth() >= Orb_MaxBlockDepth)
     throw Orb_Exception(kSource, __LINE__, name,
                         ("A child block of block <" + Port::Exception::ShownName(GetNameString()) +
                          "> would lie deeper than " + std::to_string(Orb_MaxBlockDepth) +
                          " levels.")
                             .c_str());
-  auto *block = GetModel()->Adopt(m_Blocks, new Orb_Block(GetModel(), this, m_pView, name));
-  return GetModel()->Announce(block);
+  return GetModel()->Adopt(GetModel()->Make<Orb_Block>(GetModel(), this, m_pView, name), "block");
 }
 
 Orb_Pin *Orb_Block::CreatePin(char const *name, Orb_Pin::PIN_DIRECTION direction) {
   CheckName(name, "pin");
   CheckNotDying(this, "pin", name);
-  if (m_Pins.Find(name))
-    ThrowDuplicate(this, "pin", name);
-  auto *pin = GetModel()->Adopt(m_Pins, new Orb_Pin(GetModel(), this, name, direction));
-  return GetModel()->Announce(pin);
+  return GetModel()->Adopt(GetModel()->Make<Orb_Pin>(GetModel(), this, name, direction), "pin");
 }
 
 Orb_Signal *Orb_Block::CreateSignal(char const *name) {
   CheckName(name, "signal");
   CheckNotDying(this, "signal", name);
-  if (m_Signals.Find(name))
-    ThrowDuplicate(this, "signal", name);
-  auto *signal = GetModel()->Adopt(m_Signals, new Orb_Signal(GetModel(), this, name));
-  return GetModel()->Announce(signal);
+  return GetModel()->Adopt(GetModel()->Make<Orb_Signal>(GetModel(), this, name), "signal");
 }
 
 void Orb_Block::DeleteBlock(Orb_Block *child) {
@@ -236,9 +227,7 @@ void Orb_Block::DeleteSignal(Orb_Signal *signal) {
 }
 
 void Orb_Block::SortPins(Orb_SortFtor<Orb_Pin> const &ftor) {
-  auto &pins = m_Pins.MutableItems();
-  std::stable_sort(pins.begin(), pins.end(),
-                   [&ftor](Orb_Pin const *a, Orb_Pin const *b) { return ftor(a, b); });
+  m_Pins.StableSort([&ftor](Orb_Pin const *a, Orb_Pin const *b) { return ftor(a, b); });
 }
 
 Orb_View::Orb_View(Orb_Model *model, Orb_Design *parent, std::string name)
@@ -251,17 +240,13 @@ Orb_Block *Orb_View::CreateTopBlock(char const *name) {
   CheckNotDying(this, "block", name);
   if (m_pTopBlock)
     throw Orb_Exception(kSource, __LINE__, GetName(), "The view already has a top block.");
-  m_pTopBlock = new Orb_Block(GetModel(), this, this, name);
-  return GetModel()->Announce(m_pTopBlock);
+  return GetModel()->Adopt(GetModel()->Make<Orb_Block>(GetModel(), this, this, name), "block");
 }
 
 Orb_Network *Orb_View::CreateNetwork(char const *name) {
   CheckName(name, "network");
   CheckNotDying(this, "network", name);
-  if (m_Networks.Find(name))
-    ThrowDuplicate(this, "network", name);
-  auto *network = GetModel()->Adopt(m_Networks, new Orb_Network(GetModel(), this, name));
-  return GetModel()->Announce(network);
+  return GetModel()->Adopt(GetModel()->Make<Orb_Network>(GetModel(), this, name), "network");
 }
 
 void Orb_View::DeleteTopBlock() {
@@ -284,10 +269,7 @@ Orb_DesignMgr *Orb_Design::GetParent() const {
 Orb_View *Orb_Design::CreateView(char const *name) {
   CheckName(name, "view");
   CheckNotDying(this, "view", name);
-  if (m_Views.Find(name))
-    ThrowDuplicate(this, "view", name);
-  auto *view = GetModel()->Adopt(m_Views, new Orb_View(GetModel(), this, name));
-  return GetModel()->Announce(view);
+  return GetModel()->Adopt(GetModel()->Make<Orb_View>(GetModel(), this, name), "view");
 }
 
 void Orb_Design::DeleteView(Orb_View *view) {
@@ -301,10 +283,7 @@ Orb_DesignMgr::Orb_DesignMgr(Orb_Model *model, std::string name)
 Orb_Design *Orb_DesignMgr::CreateDesign(char const *name) {
   CheckName(name, "design");
   CheckNotDying(this, "design", name);
-  if (m_Designs.Find(name))
-    ThrowDuplicate(this, "design", name);
-  auto *design = GetModel()->Adopt(m_Designs, new Orb_Design(GetModel(), this, name));
-  return GetModel()->Announce(design);
+  return GetModel()->Adopt(GetModel()->Make<Orb_Design>(GetModel(), this, name), "design");
 }
 
 void Orb_DesignMgr::DeleteDesign(Orb_Design *design) {
@@ -321,7 +300,13 @@ std::unique_ptr<Orb_Model> Orb_ModelCompanion::ReleaseTakenModel() { return null
 
 Orb_Model::Orb_Model(char const *name, char const *dbName, char const *path, bool readOnly)
     : m_Name(name ? name : ""), m_DbName(dbName ? dbName : ""), m_Path(path ? path : ""),
-      m_ReadOnly(readOnly) {}
+      m_ReadOnly(readOnly) {
+  std::size_t const sizes[Orb_KindCount] = {
+      sizeof(Orb_DesignMgr), sizeof(Orb_Design), sizeof(Orb_View),   sizeof(Orb_Block),
+      sizeof(Orb_Pin),       sizeof(Orb_Signal), sizeof(Orb_Network)};
+  for (unsigned k = 0; k < Orb_KindCount; ++k)
+    m_Pools[k].SetSlotSize(sizes[k]);
+}
 
 Orb_Model::~Orb_Model() {
   assert(m_Contexts.empty() && "Orb_Model destroyed while client models are attached");
@@ -330,17 +315,17 @@ Orb_Model::~Orb_Model() {
   // before this model's objects.
   m_Companions.clear();
   m_LoadedCompanions.clear();
-  // Free leaves the containers alone, so the list can be walked as it is.
+  // The pools go whole: objects are destroyed without giving back their
+  // slots. Free leaves the containers alone, so the list can be walked as
+  // it is.
+  m_TearingDown = true;
   for (Orb_DesignMgr *designMgr : m_DesignMgrs.Items())
     Free(designMgr, false);
 }
 
 Orb_DesignMgr *Orb_Model::CreateDesignMgr(char const *name) {
   CheckName(name, "design manager");
-  if (m_DesignMgrs.Find(name))
-    ThrowDuplicate(nullptr, "design manager", name);
-  auto *designMgr = Adopt(m_DesignMgrs, new Orb_DesignMgr(this, name));
-  return Announce(designMgr);
+  return Adopt(Make<Orb_DesignMgr>(this, name), "design manager");
 }
 
 void Orb_Model::DeleteDesignMgr(Orb_DesignMgr *designMgr) {
@@ -423,25 +408,13 @@ std::size_t Orb_Model::GetObjectCount(Orb_Kind kind) const {
   return m_ObjectCount[static_cast<unsigned>(kind)];
 }
 
-unsigned Orb_Model::AllocateBridgeId(Orb_Kind kind) {
-  auto const k = static_cast<unsigned>(kind);
-  ++m_ObjectCount[k];
-  if (!m_FreeBridgeIds[k].empty()) {
-    unsigned const id = m_FreeBridgeIds[k].back();
-    m_FreeBridgeIds[k].pop_back();
-    return id;
-  }
-  return m_NextBridgeId[k]++;
-}
-
-void Orb_Model::ReleaseBridgeId(Orb_Kind kind, unsigned id) noexcept {
-  auto const k = static_cast<unsigned>(kind);
+void Orb_Model::Destroy(Orb_Persistent *object) noexcept {
+  auto const k = static_cast<unsigned>(object->GetKind());
+  unsigned const id = object->m_BridgeId;
+  object->~Orb_Persistent();
   --m_ObjectCount[k];
-  // Runs in destructors. Without memory the id is just never reused.
-  try {
-    m_FreeBridgeIds[k].push_back(id);
-  } catch (std::bad_alloc const &) {
-  }
+  if (!m_TearingDown)
+    m_Pools[k].Release(object, id);
 }
 
 template <class T> T *Orb_Model::Announce(T *object) {
@@ -454,6 +427,24 @@ template <class T> T *Orb_Model::Announce(T *object) {
     throw;
   }
   return object;
+}
+
+template <class T> T *Orb_Model::Adopt(T *object, char const *kind) {
+  bool linked = false;
+  try {
+    linked = Link(object);
+  } catch (...) {
+    // In no container: nothing else would ever free it.
+    Destroy(object);
+    throw;
+  }
+  if (!linked) {
+    std::string const name = object->GetNameString();
+    Orb_Persistent *parent = object->GetParentObject();
+    Destroy(object);
+    ThrowDuplicate(parent, kind, name.c_str());
+  }
+  return Announce(object);
 }
 
 void Orb_Model::AnnounceLoad(Orb_Persistent *object) {
@@ -473,10 +464,12 @@ namespace {
 // child blocks.
 void CollectBlockTree(Orb_Block *block, std::vector<Orb_Persistent *> &out) {
   out.push_back(block);
-  out.insert(out.end(), block->GetPins().begin(), block->GetPins().end());
-  out.insert(out.end(), block->GetSignals().begin(), block->GetSignals().end());
-  for (Orb_Block *child : block->GetBlocks())
-    CollectBlockTree(child, out);
+  Orb_ForEachChild(block, [&out](Orb_Persistent *child) {
+    if (child->GetKind() == Orb_Kind::Block)
+      CollectBlockTree(static_cast<Orb_Block *>(child), out);
+    else
+      out.push_back(child);
+  });
 }
 
 } // namespace
@@ -486,12 +479,15 @@ void Orb_Model::AnnounceLoadTree(Orb_DesignMgr *designMgr) {
   // is walked from a snapshot, which the caller's FreeHold keeps in memory,
   // one view at a time.
   assert(m_HoldDepth > 0 && "AnnounceLoadTree needs a FreeHold");
+  // Without subscribers no event fires and no handler runs.
+  if (m_Subscribers.empty())
+    return;
   AnnounceLoad(designMgr);
-  std::vector<Orb_Design *> const designs = designMgr->GetDesigns();
+  std::vector<Orb_Design *> const designs = designMgr->GetDesigns().ToVector();
   std::vector<Orb_Persistent *> objects;
   for (Orb_Design *design : designs) {
     AnnounceLoad(design);
-    std::vector<Orb_View *> const views = design->GetViews();
+    std::vector<Orb_View *> const views = design->GetViews().ToVector();
     for (Orb_View *view : views) {
       AnnounceLoad(view);
       if (view->m_Dying)
@@ -499,7 +495,8 @@ void Orb_Model::AnnounceLoadTree(Orb_DesignMgr *designMgr) {
       objects.clear();
       if (view->GetBlock())
         CollectBlockTree(view->GetBlock(), objects);
-      objects.insert(objects.end(), view->GetNetworks().begin(), view->GetNetworks().end());
+      auto const networks = view->GetNetworks();
+      objects.insert(objects.end(), networks.begin(), networks.end());
       for (Orb_Persistent *object : objects)
         AnnounceLoad(object);
     }
@@ -523,6 +520,8 @@ void Orb_Model::Delete(Orb_Persistent *object) {
   // The snapshot stays readable under the hold whatever the handlers change.
   // Memory is taken first: a failure here must leave nothing marked.
   std::vector<Orb_Persistent *> doomed;
+  // A block with its pins and signals fits without regrowing.
+  doomed.reserve(32);
   Orb_VisitPostOrder(object, [&doomed](Orb_Persistent *owned) { doomed.push_back(owned); });
   if (m_PendingFrees.size() == m_PendingFrees.capacity())
     m_PendingFrees.reserve(2 * m_PendingFrees.size() + 1);
@@ -561,6 +560,36 @@ void Orb_Model::ReleaseHold() noexcept {
   --m_HoldDepth;
 }
 
+bool Orb_Model::Link(Orb_Persistent *object) {
+  Orb_Persistent *parent = object->GetParentObject();
+  switch (object->GetKind()) {
+  case Orb_Kind::DesignMgr:
+    return m_DesignMgrs.AddUnique(static_cast<Orb_DesignMgr *>(object));
+  case Orb_Kind::Design:
+    return static_cast<Orb_DesignMgr *>(parent)->m_Designs.AddUnique(
+        static_cast<Orb_Design *>(object));
+  case Orb_Kind::View:
+    return static_cast<Orb_Design *>(parent)->m_Views.AddUnique(static_cast<Orb_View *>(object));
+  case Orb_Kind::Block:
+    if (parent->GetKind() == Orb_Kind::View) {
+      auto *view = static_cast<Orb_View *>(parent);
+      if (view->m_pTopBlock)
+        return false;
+      view->m_pTopBlock = static_cast<Orb_Block *>(object);
+      return true;
+    }
+    return static_cast<Orb_Block *>(parent)->m_Blocks.AddUnique(static_cast<Orb_Block *>(object));
+  case Orb_Kind::Pin:
+    return static_cast<Orb_Block *>(parent)->m_Pins.AddUnique(static_cast<Orb_Pin *>(object));
+  case Orb_Kind::Signal:
+    return static_cast<Orb_Block *>(parent)->m_Signals.AddUnique(static_cast<Orb_Signal *>(object));
+  case Orb_Kind::Network:
+    return static_cast<Orb_View *>(parent)->m_Networks.AddUnique(
+        static_cast<Orb_Network *>(object));
+  }
+  return false;
+}
+
 void Orb_Model::Unlink(Orb_Persistent *object) {
   Orb_Persistent *parent = object->GetParentObject();
   switch (object->GetKind()) {
@@ -592,67 +621,41 @@ void Orb_Model::Unlink(Orb_Persistent *object) {
 }
 
 void Orb_Model::Free(Orb_Persistent *object, bool keepLinks) noexcept {
-  switch (object->GetKind()) {
-  case Orb_Kind::DesignMgr:
-    for (Orb_Design *design : static_cast<Orb_DesignMgr *>(object)->GetDesigns())
-      Free(design, false);
-    break;
-  case Orb_Kind::Design:
-    for (Orb_View *view : static_cast<Orb_Design *>(object)->GetViews())
-      Free(view, false);
-    break;
-  case Orb_Kind::View: {
-    auto *view = static_cast<Orb_View *>(object);
-    for (Orb_Network *network : view->GetNetworks())
-      Free(network, false);
-    if (view->m_pTopBlock)
-      Free(view->m_pTopBlock, false);
-    break;
-  }
-  case Orb_Kind::Block: {
-    auto *block = static_cast<Orb_Block *>(object);
-    // Signals before pins: a signal lets go of all its pins at once, so the
-    // pins connected to it (its block's and its children's) have nothing to
-    // undo.
-    for (Orb_Signal *signal : block->GetSignals())
-      Free(signal, keepLinks);
-    for (Orb_Pin *pin : block->GetPins())
-      Free(pin, keepLinks);
-    for (Orb_Block *child : block->GetBlocks())
-      Free(child, keepLinks);
-    break;
-  }
-  case Orb_Kind::Pin:
-    if (keepLinks) {
+  // Connections and network memberships never leave a view: inside a view
+  // that goes whole, nothing needs unhooking.
+  bool const inner = keepLinks && object->GetKind() != Orb_Kind::View;
+  Orb_ForEachChild(object, [this, inner](Orb_Persistent *child) { Free(child, inner); });
+  if (keepLinks) {
+    switch (object->GetKind()) {
+    case Orb_Kind::Pin: {
       auto *pin = static_cast<Orb_Pin *>(object);
       pin->Unlink(pin->m_pSignal);
       pin->Unlink(pin->m_pInnerSignal);
+      break;
     }
-    break;
-  case Orb_Kind::Signal: {
-    auto *signal = static_cast<Orb_Signal *>(object);
-    if (!keepLinks)
+    case Orb_Kind::Signal: {
+      auto *signal = static_cast<Orb_Signal *>(object);
+      for (Orb_Pin *pin : signal->m_Pins.Range())
+        (pin->GetParent() == signal->GetParent() ? pin->m_pInnerSignal : pin->m_pSignal) = nullptr;
+      if (signal->m_pNetwork)
+        signal->m_pNetwork->RemoveSignal(signal);
       break;
-    for (Orb_Pin *pin : signal->m_Pins)
-      (pin->GetParent() == signal->GetParent() ? pin->m_pInnerSignal : pin->m_pSignal) = nullptr;
-    if (signal->m_pNetwork)
-      signal->m_pNetwork->RemoveSignal(signal);
-    break;
-  }
-  case Orb_Kind::Network: {
-    auto *network = static_cast<Orb_Network *>(object);
-    if (!keepLinks)
+    }
+    case Orb_Kind::Network: {
+      auto *network = static_cast<Orb_Network *>(object);
+      for (Orb_Signal *signal : network->m_Signals.Range())
+        signal->m_pNetwork = nullptr;
       break;
-    for (Orb_Signal *signal : network->m_Signals)
-      signal->m_pNetwork = nullptr;
-    break;
-  }
+    }
+    default:
+      break;
+    }
   }
   // A client made for the object after its delete event (a handler that
   // specialized a dying sibling) goes with it.
   for (std::size_t i = 0; i < m_Contexts.size(); ++i)
     delete m_Contexts[i]->GetClient(object);
-  delete object;
+  Destroy(object);
 }
 
 // ---------------------------------------------------------------------------
@@ -664,4 +667,126 @@ void Orb_Persistent::DebugDump(Port::Stream *stream, int indent) const {
   for (Orb_ModelDerived *context : m_pModel->GetContexts())
     if (Orb_ClientObject *client = context->GetClient(this))
       client->DebugDumpCallback(stream, indent + 1);
+}
+
+// ---------------------------------------------------------------------------
+// Pools
+
+Orb_ObjectPool::~Orb_ObjectPool() {
+  for (void *chunk : m_Chunks)
+    ::operator delete(chunk);
+}
+
+void Orb_ObjectPool::SetSlotSize(std::size_t size) {
+  assert(m_Chunks.empty() && "Orb_ObjectPool::SetSlotSize after the first allocation");
+  // Host objects hold pointers and integers: pointer alignment is enough.
+  std::size_t const align = alignof(void *);
+  m_SlotSize = (std::max(size, sizeof(FreeSlot)) + align - 1) / align * align;
+}
+
+void *Orb_ObjectPool::Allocate(unsigned &id) {
+  if (m_pFree) {
+    FreeSlot *slot = m_pFree;
+    m_pFree = slot->next;
+    id = slot->id;
+    return slot;
+  }
+  if (m_pNext == m_pEnd) {
+    std::size_t const bytes = m_NextChunkSlots * m_SlotSize;
+    m_Chunks.reserve(m_Chunks.size() + 1);
+    auto *chunk = static_cast<unsigned char *>(::operator new(bytes));
+    m_Chunks.push_back(chunk);
+    m_pNext = chunk;
+    m_pEnd = chunk + bytes;
+    m_Bytes += bytes;
+    // Chunks double up to about a megabyte: small models stay small.
+    if (bytes < (std::size_t(1) << 20))
+      m_NextChunkSlots *= 2;
+  }
+  void *slot = m_pNext;
+  m_pNext += m_SlotSize;
+  id = m_NextId++;
+  return slot;
+}
+
+void Orb_ObjectPool::Release(void *slot, unsigned id) noexcept {
+  m_pFree = new (slot) FreeSlot{m_pFree, id};
+}
+
+namespace {
+
+// Free lists by size class (multiples of 8 bytes up to Orb_SmallLimit),
+// carved from 64 KiB chunks.
+class SmallPool {
+public:
+  static constexpr std::size_t kGrain = 8;
+
+  void *Allocate(std::size_t size) {
+    std::size_t const cls = (size + kGrain - 1) / kGrain;
+    std::lock_guard<std::mutex> const lock(m_Mutex);
+    if (Free *block = m_Free[cls]) {
+      m_Free[cls] = block->next;
+      return block;
+    }
+    std::size_t const bytes = cls * kGrain;
+    if (static_cast<std::size_t>(m_pEnd - m_pNext) < bytes) {
+      // What is left of the chunk goes to the free lists of smaller classes.
+      for (std::size_t left = static_cast<std::size_t>(m_pEnd - m_pNext) / kGrain; left > 0;) {
+        std::size_t const piece = std::min(left, Orb_SmallLimit / kGrain);
+        m_Free[piece] = new (m_pNext) Free{m_Free[piece]};
+        m_pNext += piece * kGrain;
+        left -= piece;
+      }
+      m_pNext = static_cast<unsigned char *>(::operator new(kChunk));
+      m_pEnd = m_pNext + kChunk;
+    }
+    void *block = m_pNext;
+    m_pNext += bytes;
+    return block;
+  }
+  void Release(void *pointer, std::size_t size) noexcept {
+    std::size_t const cls = (size + kGrain - 1) / kGrain;
+    std::lock_guard<std::mutex> const lock(m_Mutex);
+    m_Free[cls] = new (pointer) Free{m_Free[cls]};
+  }
+
+private:
+  struct Free {
+    Free *next;
+  };
+  static constexpr std::size_t kChunk = std::size_t(1) << 16;
+  std::mutex m_Mutex;
+  Free *m_Free[Orb_SmallLimit / kGrain + 1] = {};
+  unsigned char *m_pNext = nullptr;
+  unsigned char *m_pEnd = nullptr;
+};
+
+// Never destroyed: small blocks of static models may outlive any static
+// here. Its chunks stay reachable through it.
+SmallPool &TheSmallPool() {
+  static auto *pool = new SmallPool;
+  return *pool;
+}
+
+#if defined(__SANITIZE_ADDRESS__)
+constexpr bool kPooled = false;
+#else
+constexpr bool kPooled = true;
+#endif
+
+} // namespace
+
+void *Orb_SmallAllocate(std::size_t size) {
+  if (!kPooled || size == 0 || size > Orb_SmallLimit)
+    return ::operator new(size);
+  return TheSmallPool().Allocate(size);
+}
+
+void Orb_SmallRelease(void *pointer, std::size_t size) noexcept {
+  if (!pointer)
+    return;
+  if (!kPooled || size == 0 || size > Orb_SmallLimit)
+    ::operator delete(pointer);
+  else
+    TheSmallPool().Release(pointer, size);
 }

@@ -4,6 +4,8 @@
 // signals and networks, each with a name and properties, owned by one
 // Orb_Model. Clients attach through Orb_ModelDerived (Orb_Derived.h).
 
+#include "Orb_List.h"
+#include "Orb_Pool.h"
 #include "Orb_Property.h"
 
 #include <algorithm>
@@ -15,6 +17,7 @@
 #include <string>
 #include <string_view>
 #include <unordered_map>
+#include <utility>
 #include <vector>
 
 class Orb_Block;
@@ -69,50 +72,120 @@ protected:
 
 private:
   friend class Orb_Model;
+  friend struct Orb_ChildSlot;
   std::string m_Name;
   Orb_Model *m_pModel;
   Orb_Persistent *m_pParent;
   unsigned m_BridgeId;
+  // The object's slot in its parent's container (Orb_List).
+  std::uint32_t m_Slot = 0;
   // The kind and the deletion marks share the word the kind alone took.
   std::uint8_t m_Kind;
   bool m_Dying = false;
   bool m_DeleteFired = false;
 };
 
-// Children of one kind in host order, with O(1) lookup by name.
-template <class T> class Orb_NamedList {
-public:
-  std::vector<T *> const &Items() const { return m_Items; }
-  std::size_t Size() const { return m_Items.size(); }
-  T *Find(std::string_view name) const {
-    auto it = m_ByName.find(name);
-    return it == m_ByName.end() ? nullptr : it->second;
+// Where a host object keeps its slot in its parent's container.
+struct Orb_ChildSlot {
+  std::uint32_t &operator()(Orb_Persistent *object, void const * /*list*/) const {
+    return object->m_Slot;
   }
-  // All or nothing: when the item cannot be added, the list stays as it was.
-  void Add(T *item) {
-    m_Items.push_back(item);
-    try {
-      m_ByName.emplace(std::string_view(item->GetNameString()), item);
-    } catch (...) {
-      m_Items.pop_back();
-      throw;
-    }
-  }
-  void Remove(T *item);
-  std::vector<T *> &MutableItems() { return m_Items; }
-
-private:
-  std::vector<T *> m_Items;
-  std::unordered_map<std::string_view, T *> m_ByName;
 };
 
-template <class T> void Orb_NamedList<T>::Remove(T *item) {
-  m_ByName.erase(std::string_view(item->GetNameString()));
-  m_Items.erase(std::find(m_Items.begin(), m_Items.end(), item));
+// Children of one kind in host order (Orb_List: O(1) removal), with lookup
+// by name: a scan while there are few, an index (Orb_NameIndex) once there
+// are many.
+template <class T> class Orb_NamedList {
+public:
+  Orb_NamedList() = default;
+  Orb_NamedList(Orb_NamedList const &) = delete;
+  Orb_NamedList &operator=(Orb_NamedList const &) = delete;
+
+  Orb_Range<T> Items() const { return m_List.Range(); }
+  std::size_t Size() const { return m_List.Size(); }
+  // The child of that name, or null (also for a null name).
+  T *Find(std::string_view name) const;
+  T *Find(char const *name) const { return name ? Find(std::string_view(name)) : nullptr; }
+  T *Find(std::string const &name) const { return Find(std::string_view(name)); }
+  // Appends `item` unless a child has its name; then returns false and
+  // changes nothing. One hash insertion for a large list.
+  bool AddUnique(T *item);
+  void Remove(T *item) noexcept {
+    if (m_pIndex)
+      m_pIndex->Erase(item);
+    m_List.Remove(item);
+    if (m_List.Size() == 0)
+      m_pIndex.reset();
+  }
+  // Forgets every child without touching them.
+  void Clear() noexcept {
+    m_List.Clear();
+    m_pIndex.reset();
+  }
+  void Reserve(std::size_t more) { m_List.Reserve(more); }
+  template <class Less> void StableSort(Less const &less) { m_List.StableSort(less); }
+
+private:
+  // Builds the index when the list has grown past a scan.
+  void IndexIfLarge() const;
+
+  Orb_List<T, Orb_ChildSlot> m_List;
+  mutable std::unique_ptr<Orb_NameIndex<T>> m_pIndex;
+};
+
+template <class T> void Orb_NamedList<T>::IndexIfLarge() const {
+  if (m_pIndex || m_List.Size() <= Orb_NameIndex<T>::kScanLimit)
+    return;
+  auto index = std::make_unique<Orb_NameIndex<T>>();
+  for (T *item : m_List.Range())
+    index->Insert(item);
+  m_pIndex = std::move(index);
 }
+
+template <class T> T *Orb_NamedList<T>::Find(std::string_view name) const {
+  IndexIfLarge();
+  if (m_pIndex)
+    return m_pIndex->Find(name);
+  for (T *item : m_List.Range())
+    if (item->GetNameString() == name)
+      return item;
+  return nullptr;
+}
+
+template <class T> bool Orb_NamedList<T>::AddUnique(T *item) {
+  IndexIfLarge();
+  if (!m_pIndex) {
+    if (Find(item->GetNameString()))
+      return false;
+    m_List.Add(item);
+    return true;
+  }
+  if (m_pIndex->Insert(item))
+    return false;
+  try {
+    m_List.Add(item);
+  } catch (...) {
+    m_pIndex->Erase(item);
+    throw;
+  }
+  return true;
+}
+
+// Where a pin keeps its slot in the pin list of the signal it connects to,
+// on the side that the list is of.
+struct Orb_ConnectionSlot {
+  std::uint32_t &operator()(Orb_Pin *pin, void const *list) const;
+};
+
+// Where a signal keeps its slot in its network's list.
+struct Orb_NetworkSlot {
+  std::uint32_t &operator()(Orb_Signal *signal, void const *list) const;
+};
 
 class LUM_PLATFORM_API Orb_Pin : public Orb_Persistent {
 public:
+  static constexpr Orb_Kind kKind = Orb_Kind::Pin;
+
   enum PIN_DIRECTION { PIN_INPUT, PIN_OUTPUT, PIN_BIDIRECTIONAL };
 
   PIN_DIRECTION GetDirection() const { return m_Direction; }
@@ -133,6 +206,7 @@ private:
   friend class Orb_Model;
   friend class Orb_ModelIO;
   friend class Orb_Block;
+  friend struct Orb_ConnectionSlot;
   Orb_Pin(Orb_Model *model, Orb_Block *parent, std::string name, PIN_DIRECTION direction);
   // Points `side` (m_pSignal or m_pInnerSignal) at `signal`, keeping the
   // signals' pin lists in step.
@@ -141,19 +215,24 @@ private:
   PIN_DIRECTION m_Direction;
   Orb_Signal *m_pSignal = nullptr;
   Orb_Signal *m_pInnerSignal = nullptr;
+  // Slots in the pin lists of the two signals.
+  std::uint32_t m_OuterSlot = 0;
+  std::uint32_t m_InnerSlot = 0;
 };
 
 LUM_PLATFORM_API char const *Orb_PinDirectionName(Orb_Pin::PIN_DIRECTION direction);
 
 class LUM_PLATFORM_API Orb_Signal : public Orb_Persistent {
 public:
+  static constexpr Orb_Kind kKind = Orb_Kind::Signal;
+
   Orb_Block *GetParent() const;
   // The network the signal belongs to, or null.
   Orb_Network *GetNetwork() const { return m_pNetwork; }
   // Pins connected to the signal from either side, in connection order: pins
   // of its own block (their inner connection) and pins of its block's child
   // blocks (their outer one).
-  std::vector<Orb_Pin *> const &GetPins() const { return m_Pins; }
+  Orb_Range<Orb_Pin, Orb_ConnectionSlot> GetPins() const { return m_Pins.Range(); }
 
 private:
   friend class Orb_Model;
@@ -161,16 +240,31 @@ private:
   friend class Orb_Block;
   friend class Orb_Pin;
   friend class Orb_Network;
+  friend struct Orb_ConnectionSlot;
+  friend struct Orb_NetworkSlot;
   Orb_Signal(Orb_Model *model, Orb_Block *parent, std::string name);
   Orb_Network *m_pNetwork = nullptr;
-  std::vector<Orb_Pin *> m_Pins;
+  // The signal's slot in its network's list.
+  std::uint32_t m_NetworkSlot = 0;
+  Orb_List<Orb_Pin, Orb_ConnectionSlot> m_Pins;
 };
+
+inline std::uint32_t &Orb_ConnectionSlot::operator()(Orb_Pin *pin, void const *list) const {
+  return pin->m_pInnerSignal && list == &pin->m_pInnerSignal->m_Pins ? pin->m_InnerSlot
+                                                                     : pin->m_OuterSlot;
+}
+
+inline std::uint32_t &Orb_NetworkSlot::operator()(Orb_Signal *signal, void const * /*list*/) const {
+  return signal->m_NetworkSlot;
+}
 
 class LUM_PLATFORM_API Orb_Network : public Orb_Persistent {
 public:
+  static constexpr Orb_Kind kKind = Orb_Kind::Network;
+
   Orb_View *GetParent() const;
   // The network's signals in host order.
-  std::vector<Orb_Signal *> const &GetSignals() const { return m_Signals; }
+  Orb_Range<Orb_Signal, Orb_NetworkSlot> GetSignals() const { return m_Signals.Range(); }
   // Adds a signal of the same view, moving it out of any other network.
   // A signal of another view throws Orb_Exception.
   void AddSignal(Orb_Signal *signal);
@@ -182,18 +276,20 @@ private:
   friend class Orb_ModelIO;
   friend class Orb_View;
   Orb_Network(Orb_Model *model, Orb_View *parent, std::string name);
-  std::vector<Orb_Signal *> m_Signals;
+  Orb_List<Orb_Signal, Orb_NetworkSlot> m_Signals;
 };
 
 class LUM_PLATFORM_API Orb_Block : public Orb_Persistent {
 public:
+  static constexpr Orb_Kind kKind = Orb_Kind::Block;
+
   // The parent block, or null for a view's top block.
   Orb_Block *GetParent() const;
   Orb_View *GetView() const { return m_pView; }
 
-  std::vector<Orb_Block *> const &GetBlocks() const { return m_Blocks.Items(); }
-  std::vector<Orb_Pin *> const &GetPins() const { return m_Pins.Items(); }
-  std::vector<Orb_Signal *> const &GetSignals() const { return m_Signals.Items(); }
+  Orb_Range<Orb_Block> GetBlocks() const { return m_Blocks.Items(); }
+  Orb_Range<Orb_Pin> GetPins() const { return m_Pins.Items(); }
+  Orb_Range<Orb_Signal> GetSignals() const { return m_Signals.Items(); }
   unsigned GetNumPins() const { return static_cast<unsigned>(m_Pins.Size()); }
 
   Orb_Block *GetBlockByName(char const *name) const { return m_Blocks.Find(name); }
@@ -236,10 +332,12 @@ private:
 
 class LUM_PLATFORM_API Orb_View : public Orb_Persistent {
 public:
+  static constexpr Orb_Kind kKind = Orb_Kind::View;
+
   Orb_Design *GetParent() const;
   // The top block, or null.
   Orb_Block *GetBlock() const { return m_pTopBlock; }
-  std::vector<Orb_Network *> const &GetNetworks() const { return m_Networks.Items(); }
+  Orb_Range<Orb_Network> GetNetworks() const { return m_Networks.Items(); }
   Orb_Network *GetNetworkByName(char const *name) const { return m_Networks.Find(name); }
 
   // A view has at most one top block; a second one throws Orb_Exception.
@@ -259,8 +357,10 @@ private:
 
 class LUM_PLATFORM_API Orb_Design : public Orb_Persistent {
 public:
+  static constexpr Orb_Kind kKind = Orb_Kind::Design;
+
   Orb_DesignMgr *GetParent() const;
-  std::vector<Orb_View *> const &GetViews() const { return m_Views.Items(); }
+  Orb_Range<Orb_View> GetViews() const { return m_Views.Items(); }
   Orb_View *GetViewByName(char const *name) const { return m_Views.Find(name); }
   Orb_View *CreateView(char const *name);
   void DeleteView(Orb_View *view);
@@ -275,7 +375,9 @@ private:
 
 class LUM_PLATFORM_API Orb_DesignMgr : public Orb_Persistent {
 public:
-  std::vector<Orb_Design *> const &GetDesigns() const { return m_Designs.Items(); }
+  static constexpr Orb_Kind kKind = Orb_Kind::DesignMgr;
+
+  Orb_Range<Orb_Design> GetDesigns() const { return m_Designs.Items(); }
   Orb_Design *GetDesignByName(char const *name) const { return m_Designs.Find(name); }
   Orb_Design *CreateDesign(char const *name);
   void DeleteDesign(Orb_Design *design);
@@ -287,16 +389,17 @@ private:
   Orb_NamedList<Orb_Design> m_Designs;
 };
 
-// Visits the object and everything it owns, children before parents: a
+// Calls `visit` on each object that `object` owns directly, in host order: a
 // design manager's designs, a design's views, a view's networks and then its
-// block tree, a block's pins, signals and child blocks; each object after
-// what it owns. Containers are read by index with their size read afresh, so
-// a visit that removes objects (under an Orb_Model::FreeHold, which keeps
-// them in memory) may make the walk miss some, but never read freed memory.
-template <class F> void Orb_VisitPostOrder(Orb_Persistent *object, F const &visit) {
+// top block, a block's pins, then its signals, then its child blocks. The one
+// place that knows the shape of the tree. Containers are read by index with
+// their size read afresh, so a visit that removes objects (under an
+// Orb_Model::FreeHold, which keeps them in memory) may make the walk miss
+// some, but never read freed memory.
+template <class F> void Orb_ForEachChild(Orb_Persistent *object, F const &visit) {
   auto each = [&visit](auto const &items) {
     for (std::size_t i = 0; i < items.size(); ++i)
-      Orb_VisitPostOrder(items[i], visit);
+      visit(items[i]);
   };
   switch (object->GetKind()) {
   case Orb_Kind::DesignMgr:
@@ -309,7 +412,7 @@ template <class F> void Orb_VisitPostOrder(Orb_Persistent *object, F const &visi
     auto *view = static_cast<Orb_View *>(object);
     each(view->GetNetworks());
     if (view->GetBlock())
-      Orb_VisitPostOrder(view->GetBlock(), visit);
+      visit(view->GetBlock());
     break;
   }
   case Orb_Kind::Block: {
@@ -324,6 +427,13 @@ template <class F> void Orb_VisitPostOrder(Orb_Persistent *object, F const &visi
   case Orb_Kind::Network:
     break;
   }
+}
+
+// Visits the object and everything it owns, children before parents, each
+// object after what it owns, in the order of Orb_ForEachChild. Recursion
+// goes only as deep as blocks nest (Orb_MaxBlockDepth).
+template <class F> void Orb_VisitPostOrder(Orb_Persistent *object, F const &visit) {
+  Orb_ForEachChild(object, [&visit](Orb_Persistent *child) { Orb_VisitPostOrder(child, visit); });
   visit(object);
 }
 
@@ -358,7 +468,7 @@ public:
   char const *GetPath() const { return m_Path.c_str(); }
   bool IsReadOnly() const { return m_ReadOnly; }
 
-  std::vector<Orb_DesignMgr *> const &GetDesignMgrs() const { return m_DesignMgrs.Items(); }
+  Orb_Range<Orb_DesignMgr> GetDesignMgrs() const { return m_DesignMgrs.Items(); }
   Orb_DesignMgr *GetDesignMgrByName(char const *name) const { return m_DesignMgrs.Find(name); }
   Orb_DesignMgr *CreateDesignMgr(char const *name);
   void DeleteDesignMgr(Orb_DesignMgr *designMgr);
@@ -448,28 +558,27 @@ private:
   };
   void RestoreCompanions(OpenJournal &journal) noexcept;
 
-  unsigned AllocateBridgeId(Orb_Kind kind);
-  void ReleaseBridgeId(Orb_Kind kind, unsigned id) noexcept;
+  // Builds a host object of class T in its kind's pool and gives it the
+  // slot's bridge id; Destroy destroys it and gives the slot back (except
+  // while the model itself goes, when the pools go whole).
+  template <class T, class... Args> T *Make(Args &&...args);
+  void Destroy(Orb_Persistent *object) noexcept;
 
-  // Adds a new object, which has no children yet, to its parent's list; when
-  // the list cannot take it, frees it and rethrows.
-  template <class T> T *Adopt(Orb_NamedList<T> &list, T *object) {
-    try {
-      list.Add(object);
-    } catch (...) {
-      Free(object);
-      throw;
-    }
-    return object;
-  }
   // Fires OnCreate for a new object; on a throw deletes it and rethrows.
   template <class T> T *Announce(T *object);
+  // Links a new object (of `kind`, for the message) and announces it. A
+  // sibling of the same name frees the object and throws Orb_Exception.
+  template <class T> T *Adopt(T *object, char const *kind);
   // Fires OnLoad for the object in every subscribed context that has no
   // client for it yet.
   void AnnounceLoad(Orb_Persistent *object);
   void AnnounceLoadTree(Orb_DesignMgr *designMgr);
   void FireDelete(Orb_Persistent *object);
-  // Removes the object from its parent's containers.
+  // The one place that puts a new object into its parent's container (a
+  // view's top block into the view) and takes it out again. Link returns
+  // false and adds nothing when a sibling of the same kind has the object's
+  // name (or the view has a top block).
+  bool Link(Orb_Persistent *object);
   void Unlink(Orb_Persistent *object);
   // Frees the object and its subtree without events, with any client that
   // some context still holds for them. Connections and network memberships
@@ -484,8 +593,8 @@ private:
   Orb_NamedList<Orb_DesignMgr> m_DesignMgrs;
   std::vector<Orb_ModelDerived *> m_Contexts;
   std::vector<Orb_ModelDerived *> m_Subscribers;
-  unsigned m_NextBridgeId[Orb_KindCount] = {};
-  std::vector<unsigned> m_FreeBridgeIds[Orb_KindCount];
+  Orb_ObjectPool m_Pools[Orb_KindCount];
+  bool m_TearingDown = false;
   std::size_t m_ObjectCount[Orb_KindCount] = {};
   std::map<std::string, std::unique_ptr<Orb_ModelCompanion>> m_Companions;
   std::map<std::string, std::unique_ptr<Orb_Model>> m_LoadedCompanions;
@@ -496,3 +605,19 @@ private:
   // Set while an Open fires its events.
   OpenJournal *m_pOpenJournal = nullptr;
 };
+
+template <class T, class... Args> T *Orb_Model::Make(Args &&...args) {
+  auto const k = static_cast<unsigned>(T::kKind);
+  unsigned id = 0;
+  void *memory = m_Pools[k].Allocate(id);
+  T *object = nullptr;
+  try {
+    object = new (memory) T(std::forward<Args>(args)...);
+  } catch (...) {
+    m_Pools[k].Release(memory, id);
+    throw;
+  }
+  object->m_BridgeId = id;
+  ++m_ObjectCount[k];
+  return object;
+}

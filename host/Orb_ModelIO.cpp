@@ -34,34 +34,28 @@
 
 #include "Orb_Model.h"
 
+#include "Orb_ByteIO.h"
 #include "Orb_Derived.h"
 #include "Orb_Exception.h"
-#include "Orb_FileOps.h"
 
 #include <algorithm>
-#include <cerrno>
-#include <charconv>
 #include <cstdint>
-#include <cstring>
-#include <dirent.h>
-#include <fcntl.h>
 #include <map>
 #include <memory>
-#include <signal.h>
 #include <string>
 #include <string_view>
-#include <sys/stat.h>
-#include <system_error>
-#include <unistd.h>
 #include <unordered_set>
 #include <vector>
 
 namespace {
 
+using Orb_IO::ByteReader;
+using Orb_IO::ByteWriter;
+using Orb_IO::QuotePath;
+
 char const *const kSource = "host/Orb_ModelIO";
 constexpr std::string_view kMagic = "Orb design database\n";
 constexpr std::uint64_t kFormatVersion = 1;
-constexpr std::size_t kBufferSize = std::size_t(1) << 16;
 static_assert(Orb_Pin::PIN_INPUT == 0 && Orb_Pin::PIN_OUTPUT == 1 &&
                   Orb_Pin::PIN_BIDIRECTIONAL == 2,
               "design databases store pin directions by these numbers");
@@ -69,351 +63,6 @@ static_assert(Orb_Pin::PIN_INPUT == 0 && Orb_Pin::PIN_OUTPUT == 1 &&
 // Names come from files and callers and may be huge: messages cut them.
 // Paths are quoted whole.
 std::string Quote(std::string_view name) { return "'" + Port::Exception::ShownName(name) + "'"; }
-std::string QuotePath(std::string_view path) { return "'" + std::string(path) + "'"; }
-
-// The file a save replaces: `path`, or the file that its chain of symbolic
-// links ends at (which may not exist yet). Empty with errno set when a link
-// cannot be read or the chain does not end.
-std::string ResolveLinks(std::string path) {
-  for (int hop = 0; hop < 40; ++hop) {
-    struct stat status {};
-    if (::lstat(path.c_str(), &status) != 0 || !S_ISLNK(status.st_mode))
-      return path;
-    std::string link(static_cast<std::size_t>(status.st_size) + 1, '\0');
-    for (;;) {
-      ssize_t const length = ::readlink(path.c_str(), link.data(), link.size());
-      if (length < 0)
-        return std::string();
-      if (static_cast<std::size_t>(length) < link.size()) {
-        link.resize(static_cast<std::size_t>(length));
-        break;
-      }
-      link.resize(link.size() * 2 + 64); // changed since lstat, or st_size 0
-    }
-    // A relative link is relative to the directory that holds it.
-    std::size_t const slash = path.rfind('/');
-    if ((!link.empty() && link.front() == '/') || slash == std::string::npos) {
-      path = std::move(link);
-    } else {
-      path.resize(slash + 1);
-      path += link;
-    }
-  }
-  errno = ELOOP;
-  return std::string();
-}
-
-// Removes the "<target>.tmp.<pid>.<n>" files of processes that are gone,
-// left behind by saves killed midway. A process that still exists, even one
-// we may not signal, keeps its files; anything that cannot be removed stays.
-void RemoveStaleTemporaries(std::string const &target) {
-  std::size_t const slash = target.rfind('/');
-  std::string const directory = slash == std::string::npos ? "." : target.substr(0, slash + 1);
-  std::string const prefix =
-      (slash == std::string::npos ? target : target.substr(slash + 1)) + ".tmp.";
-  std::unique_ptr<DIR, int (*)(DIR *)> dir(::opendir(directory.c_str()), &::closedir);
-  if (!dir)
-    return;
-  pid_t const self = ::getpid();
-  while (dirent const *entry = ::readdir(dir.get())) {
-    std::string_view const name = entry->d_name;
-    if (name.size() <= prefix.size() || name.compare(0, prefix.size(), prefix) != 0)
-      continue;
-    // "<pid>.<n>", both decimal, nothing more.
-    char const *const first = name.data() + prefix.size();
-    char const *const last = name.data() + name.size();
-    pid_t pid = 0;
-    auto const parsed = std::from_chars(first, last, pid);
-    if (parsed.ec != std::errc() || pid <= 0 || pid == self || parsed.ptr == last ||
-        *parsed.ptr != '.' || parsed.ptr + 1 == last)
-      continue;
-    if (!std::all_of(parsed.ptr + 1, last, [](char c) { return c >= '0' && c <= '9'; }))
-      continue;
-    if (::kill(pid, 0) == 0 || errno != ESRCH)
-      continue;
-    ::unlinkat(::dirfd(dir.get()), entry->d_name, 0);
-  }
-}
-
-// Writes a temporary file next to the target through a buffer. Commit syncs
-// it and renames it over the target; until then the destructor removes it,
-// so a failed save leaves the target as it was. The target is the file a
-// symbolic link at the path leads to (the link stays), and a file it
-// replaces passes on its permission bits.
-class ByteWriter {
-public:
-  explicit ByteWriter(std::string const &path);
-  ByteWriter(ByteWriter const &) = delete;
-  ByteWriter &operator=(ByteWriter const &) = delete;
-  ~ByteWriter();
-
-  void Raw(std::string_view data);
-  void Tag(char tag) { Raw(std::string_view(&tag, 1)); }
-  void Num(std::uint64_t value);
-  void Str(std::string_view text);
-  void End() { Raw("\n"); }
-  // A whole record of a tag and one string.
-  void Named(char tag, std::string_view name) {
-    Tag(tag);
-    Str(name);
-    End();
-  }
-
-  // Throws Orb_Exception naming the target if the data cannot be made
-  // durable or the rename fails.
-  void Commit();
-  // Throws Orb_Exception naming the target and `what`.
-  [[noreturn]] void Refuse(std::string const &what) const;
-
-private:
-  [[noreturn]] void Fail(char const *step, int error) const;
-  void Flush();
-
-  std::string m_Path;
-  std::string m_Target;
-  std::string m_TempPath;
-  int m_Fd = -1;
-  bool m_Committed = false;
-  // The permission bits of the file being replaced; -1 when there is none.
-  int m_Mode = -1;
-  std::string m_Buffer;
-};
-
-ByteWriter::ByteWriter(std::string const &path) : m_Path(path), m_Target(ResolveLinks(path)) {
-  if (m_Target.empty())
-    Refuse(std::string("cannot follow the symbolic link: ") + std::strerror(errno));
-  struct stat status {};
-  if (::stat(m_Target.c_str(), &status) == 0 && S_ISREG(status.st_mode))
-    m_Mode = static_cast<int>(status.st_mode & 07777);
-  RemoveStaleTemporaries(m_Target);
-  // Before the file exists: a constructor that throws after it would leave
-  // the file behind, since the destructor does not run.
-  m_Buffer.reserve(kBufferSize);
-  // O_EXCL with a fresh suffix on collision: a stale file of a crashed save
-  // or a concurrent save to the same target is never reused. Private until
-  // Commit gives it the replaced file's bits.
-  for (unsigned attempt = 0; m_Fd < 0; ++attempt) {
-    m_TempPath = m_Target + ".tmp." + std::to_string(::getpid()) + "." + std::to_string(attempt);
-    m_Fd = ::open(m_TempPath.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC,
-                  m_Mode < 0 ? 0666 : 0600);
-    if (m_Fd < 0 && (errno != EEXIST || attempt == 100))
-      Fail("cannot create the temporary file", errno);
-  }
-}
-
-ByteWriter::~ByteWriter() {
-  if (m_Fd >= 0)
-    ::close(m_Fd);
-  if (!m_Committed)
-    ::unlink(m_TempPath.c_str());
-}
-
-void ByteWriter::Fail(char const *step, int error) const {
-  std::string const message = "Cannot save design database " + QuotePath(m_Path) + ": " + step +
-                              " " + QuotePath(m_TempPath) + ": " + std::strerror(error) + ".";
-  throw Orb_Exception(kSource, __LINE__, m_Path.c_str(), message.c_str());
-}
-
-void ByteWriter::Refuse(std::string const &what) const {
-  std::string const message =
-      "Cannot save design database " + QuotePath(m_Path) + ": " + what + ".";
-  throw Orb_Exception(kSource, __LINE__, m_Path.c_str(), message.c_str());
-}
-
-void ByteWriter::Raw(std::string_view data) {
-  if (m_Buffer.size() + data.size() > kBufferSize)
-    Flush();
-  m_Buffer.append(data);
-}
-
-void ByteWriter::Num(std::uint64_t value) {
-  char digits[24];
-  digits[0] = ' ';
-  auto const result = std::to_chars(digits + 1, digits + sizeof digits, value);
-  Raw(std::string_view(digits, static_cast<std::size_t>(result.ptr - digits)));
-}
-
-void ByteWriter::Str(std::string_view text) {
-  Num(text.size());
-  Raw(":");
-  Raw(text);
-}
-
-void ByteWriter::Flush() {
-  char const *data = m_Buffer.data();
-  std::size_t left = m_Buffer.size();
-  while (left > 0) {
-    ssize_t const written = Orb_FileOps::Get().write(m_Fd, data, left);
-    if (written < 0) {
-      if (errno == EINTR)
-        continue;
-      Fail("cannot write", errno);
-    }
-    data += written;
-    left -= static_cast<std::size_t>(written);
-  }
-  m_Buffer.clear();
-}
-
-void ByteWriter::Commit() {
-  Flush();
-  if (m_Mode >= 0 && ::fchmod(m_Fd, static_cast<mode_t>(m_Mode)) != 0)
-    Fail("cannot set the permissions of", errno);
-  if (Orb_FileOps::Get().fsync(m_Fd) != 0)
-    Fail("cannot flush", errno);
-  int const fd = m_Fd;
-  m_Fd = -1;
-  if (Orb_FileOps::Get().close(fd) != 0)
-    Fail("cannot close", errno);
-  if (Orb_FileOps::Get().rename(m_TempPath.c_str(), m_Target.c_str()) != 0)
-    Fail("cannot rename", errno);
-  m_Committed = true;
-}
-
-// Reads a design database through a buffer, field by field. Every failure
-// throws Orb_Exception naming the file and, for broken data, the offset.
-class ByteReader {
-public:
-  explicit ByteReader(std::string const &path);
-  ByteReader(ByteReader const &) = delete;
-  ByteReader &operator=(ByteReader const &) = delete;
-  ~ByteReader();
-
-  // The next byte, or -1 at the end of the file.
-  int Get() {
-    if (m_Pos == m_Size && !Fill())
-      return -1;
-    return static_cast<unsigned char>(m_Buffer[m_Pos++]);
-  }
-
-  // A record's tag; the end of the file here means the file was cut.
-  char Tag();
-  std::uint64_t Num();
-  // A string of any bytes.
-  void Str(std::string &out);
-  // A string without NUL.
-  void Name(std::string &out);
-  void End() { Expect('\n', "end of record"); }
-
-  [[noreturn]] void Refuse(std::string const &what) const;
-  [[noreturn]] void Truncated() const;
-  [[noreturn]] void Corrupt(std::string const &what) const;
-
-private:
-  bool Fill();
-  void Expect(char expected, char const *what);
-  std::uint64_t Digits();
-
-  std::string m_Path;
-  int m_Fd = -1;
-  std::vector<char> m_Buffer;
-  std::size_t m_Pos = 0;
-  std::size_t m_Size = 0;
-  std::uint64_t m_BufferOffset = 0;
-};
-
-ByteReader::ByteReader(std::string const &path) : m_Path(path), m_Buffer(kBufferSize) {
-  m_Fd = ::open(path.c_str(), O_RDONLY | O_CLOEXEC);
-  if (m_Fd < 0)
-    Refuse(std::string("cannot be opened: ") + std::strerror(errno));
-}
-
-ByteReader::~ByteReader() {
-  if (m_Fd >= 0)
-    ::close(m_Fd);
-}
-
-bool ByteReader::Fill() {
-  m_BufferOffset += m_Size;
-  m_Pos = m_Size = 0;
-  for (;;) {
-    ssize_t const got = ::read(m_Fd, m_Buffer.data(), m_Buffer.size());
-    if (got >= 0) {
-      m_Size = static_cast<std::size_t>(got);
-      return got > 0;
-    }
-    if (errno != EINTR)
-      Refuse(std::string("cannot be read: ") + std::strerror(errno));
-  }
-}
-
-void ByteReader::Refuse(std::string const &what) const {
-  std::string const message = "Design database " + QuotePath(m_Path) + " " + what + ".";
-  throw Orb_Exception(kSource, __LINE__, m_Path.c_str(), message.c_str());
-}
-
-void ByteReader::Truncated() const {
-  Refuse("is truncated at byte " + std::to_string(m_BufferOffset + m_Pos));
-}
-
-void ByteReader::Corrupt(std::string const &what) const {
-  Refuse("is corrupt at byte " + std::to_string(m_BufferOffset + m_Pos) + ": " + what);
-}
-
-char ByteReader::Tag() {
-  int const c = Get();
-  if (c < 0)
-    Truncated();
-  return static_cast<char>(c);
-}
-
-void ByteReader::Expect(char expected, char const *what) {
-  int const c = Get();
-  if (c < 0)
-    Truncated();
-  if (c != static_cast<unsigned char>(expected))
-    Corrupt(std::string("expected ") + what);
-}
-
-std::uint64_t ByteReader::Digits() {
-  std::uint64_t value = 0;
-  bool any = false;
-  for (;;) {
-    if (m_Pos == m_Size && !Fill())
-      Truncated();
-    char const c = m_Buffer[m_Pos];
-    if (c < '0' || c > '9')
-      break;
-    auto const digit = static_cast<std::uint64_t>(c - '0');
-    if (value > (UINT64_MAX - digit) / 10)
-      Corrupt("number too large");
-    value = value * 10 + digit;
-    any = true;
-    ++m_Pos;
-  }
-  if (!any)
-    Corrupt("expected a number");
-  return value;
-}
-
-std::uint64_t ByteReader::Num() {
-  Expect(' ', "a field");
-  return Digits();
-}
-
-void ByteReader::Str(std::string &out) {
-  Expect(' ', "a field");
-  std::uint64_t left = Digits();
-  Expect(':', "':' after a string length");
-  out.clear();
-  // Appended as the bytes arrive: a corrupt length cannot make us allocate
-  // more than the file holds.
-  while (left > 0) {
-    if (m_Pos == m_Size && !Fill())
-      Truncated();
-    std::size_t const take =
-        static_cast<std::size_t>(std::min<std::uint64_t>(left, m_Size - m_Pos));
-    out.append(m_Buffer.data() + m_Pos, take);
-    m_Pos += take;
-    left -= take;
-  }
-}
-
-void ByteReader::Name(std::string &out) {
-  Str(out);
-  if (out.find('\0') != std::string::npos)
-    Corrupt("NUL byte in a name");
-}
 
 } // namespace
 
@@ -441,7 +90,7 @@ private:
   explicit Orb_ModelIO(ByteWriter *out) : m_pOut(out) {}
   explicit Orb_ModelIO(ByteReader *in) : m_pIn(in) {}
 
-  static void FreeDesignMgrs(Orb_Model &model, std::vector<Orb_DesignMgr *> const &designMgrs);
+  static void FreeDesignMgrs(Orb_Model &model, Orb_Range<Orb_DesignMgr> designMgrs);
   // Moves the section's design managers into its model, without events.
   static std::vector<Orb_DesignMgr *> Commit(Section &section);
   static void Rollback(Orb_Model &model, std::vector<Orb_DesignMgr *> const &loaded,
@@ -461,8 +110,7 @@ private:
   // Reads a design manager's or a design's records: its properties, then its
   // children of one kind, each read by `readChild`, up to the closing 'E'.
   template <class Parent, class Child>
-  void ReadContainer(Parent *parent, Orb_NamedList<Child> &children, char childTag,
-                     char const *parentKind, char const *childKind,
+  void ReadContainer(Parent *parent, char childTag, char const *parentKind, char const *childKind,
                      void (Orb_ModelIO::*readChild)(Child *));
   void ReadDesignMgr(Orb_DesignMgr *designMgr);
   void ReadDesign(Orb_Design *design);
@@ -476,6 +124,9 @@ private:
   Orb_Pin *PinAt(std::uint64_t index) const;
   Orb_Signal *SignalAt(std::uint64_t index) const;
   [[noreturn]] void Unexpected(char tag, char const *where) const;
+  // Puts a new object into its parent's container; a sibling of the same
+  // name frees it and refuses the file.
+  void Place(Orb_Persistent *object, char const *kind) const;
   [[noreturn]] void Duplicate(char const *kind, std::string const &name,
                               Orb_Persistent const *parent) const;
 
@@ -527,10 +178,10 @@ void Orb_ModelIO::Save(Orb_Model const &model, std::string const &path) {
 void Orb_ModelIO::WriteModel(Orb_Model const &model, std::string_view const *companionKey) {
   auto const pins = static_cast<unsigned>(Orb_Kind::Pin);
   auto const signals = static_cast<unsigned>(Orb_Kind::Signal);
-  if (m_PinNumber.size() < model.m_NextBridgeId[pins])
-    m_PinNumber.resize(model.m_NextBridgeId[pins]);
-  if (m_SignalNumber.size() < model.m_NextBridgeId[signals])
-    m_SignalNumber.resize(model.m_NextBridgeId[signals]);
+  if (m_PinNumber.size() < model.m_Pools[pins].IdLimit())
+    m_PinNumber.resize(model.m_Pools[pins].IdLimit());
+  if (m_SignalNumber.size() < model.m_Pools[signals].IdLimit())
+    m_SignalNumber.resize(model.m_Pools[signals].IdLimit());
 
   m_pOut->Tag('M');
   m_pOut->Str(model.m_Name);
@@ -581,7 +232,7 @@ void Orb_ModelIO::WriteView(Orb_View const *view) {
   if (view->GetBlock())
     WriteBlock(view->GetBlock());
   for (std::size_t s = 0; s < m_ViewSignals.size(); ++s) {
-    std::vector<Orb_Pin *> const &pins = m_ViewSignals[s]->GetPins();
+    auto const pins = m_ViewSignals[s]->GetPins();
     if (pins.empty())
       continue;
     m_pOut->Tag('C');
@@ -714,24 +365,25 @@ void Orb_ModelIO::Open(Orb_Model &model, std::string const &path) {
   model.m_pOpenJournal = nullptr;
 }
 
-void Orb_ModelIO::FreeDesignMgrs(Orb_Model &model, std::vector<Orb_DesignMgr *> const &designMgrs) {
+void Orb_ModelIO::FreeDesignMgrs(Orb_Model &model, Orb_Range<Orb_DesignMgr> designMgrs) {
   for (Orb_DesignMgr *designMgr : designMgrs)
     model.Free(designMgr);
 }
 
 std::vector<Orb_DesignMgr *> Orb_ModelIO::Commit(Section &section) {
-  std::vector<Orb_DesignMgr *> loaded = section.designMgrs.Items();
+  std::vector<Orb_DesignMgr *> loaded = section.designMgrs.Items().ToVector();
+  // Names were checked against the model's when read. A failure undoes the
+  // move: the section still owns them all and frees them.
   std::size_t added = 0;
   try {
     for (; added < loaded.size(); ++added)
-      section.model.m_DesignMgrs.Add(loaded[added]);
+      section.model.m_DesignMgrs.AddUnique(loaded[added]);
   } catch (...) {
-    // The section still owns them all and frees them.
     for (std::size_t i = 0; i < added; ++i)
       section.model.m_DesignMgrs.Remove(loaded[i]);
     throw;
   }
-  section.designMgrs = Orb_NamedList<Orb_DesignMgr>();
+  section.designMgrs.Clear();
   return loaded;
 }
 
@@ -788,8 +440,14 @@ void Orb_ModelIO::ReadModel(Section &section, bool companion) {
         m_pIn->Refuse("holds design manager " + Quote(name) + ", which the model already has");
       if (section.designMgrs.Find(name))
         Duplicate("design manager", name, nullptr);
-      auto *designMgr = section.model.Adopt(section.designMgrs,
-                                            new Orb_DesignMgr(&section.model, std::move(name)));
+      auto *designMgr = section.model.Make<Orb_DesignMgr>(&section.model, std::move(name));
+      try {
+        section.designMgrs.AddUnique(designMgr);
+      } catch (...) {
+        // In no list: nothing else would ever free it.
+        section.model.Free(designMgr);
+        throw;
+      }
       ReadDesignMgr(designMgr);
     } else if (tag == 'K') {
       if (companion)
@@ -827,9 +485,8 @@ void Orb_ModelIO::ReadCompanion(Section &section) {
 }
 
 template <class Parent, class Child>
-void Orb_ModelIO::ReadContainer(Parent *parent, Orb_NamedList<Child> &children, char childTag,
-                                char const *parentKind, char const *childKind,
-                                void (Orb_ModelIO::*readChild)(Child *)) {
+void Orb_ModelIO::ReadContainer(Parent *parent, char childTag, char const *parentKind,
+                                char const *childKind, void (Orb_ModelIO::*readChild)(Child *)) {
   Orb_PropertyHolder *holder = parent;
   for (;;) {
     char const tag = m_pIn->Tag();
@@ -838,10 +495,9 @@ void Orb_ModelIO::ReadContainer(Parent *parent, Orb_NamedList<Child> &children, 
     if (tag == childTag) {
       std::string name = ReadName(childKind);
       m_pIn->End();
-      if (children.Find(name))
-        Duplicate(childKind, name, parent);
-      auto *child = parent->GetModel()->Adopt(
-          children, new Child(parent->GetModel(), parent, std::move(name)));
+      auto *child =
+          parent->GetModel()->template Make<Child>(parent->GetModel(), parent, std::move(name));
+      Place(child, childKind);
       (this->*readChild)(child);
       holder = nullptr;
     } else if (tag == 'E') {
@@ -854,12 +510,12 @@ void Orb_ModelIO::ReadContainer(Parent *parent, Orb_NamedList<Child> &children, 
 }
 
 void Orb_ModelIO::ReadDesignMgr(Orb_DesignMgr *designMgr) {
-  ReadContainer(designMgr, designMgr->m_Designs, 'G', "design manager", "design",
-                &Orb_ModelIO::ReadDesign);
+  ReadContainer<Orb_DesignMgr, Orb_Design>(designMgr, 'G', "design manager", "design",
+                                           &Orb_ModelIO::ReadDesign);
 }
 
 void Orb_ModelIO::ReadDesign(Orb_Design *design) {
-  ReadContainer(design, design->m_Views, 'W', "design", "view", &Orb_ModelIO::ReadView);
+  ReadContainer<Orb_Design, Orb_View>(design, 'W', "design", "view", &Orb_ModelIO::ReadView);
 }
 
 void Orb_ModelIO::ReadView(Orb_View *view) {
@@ -875,7 +531,8 @@ void Orb_ModelIO::ReadView(Orb_View *view) {
       m_pIn->End();
       if (view->m_pTopBlock)
         m_pIn->Corrupt("second top block in view " + Quote(view->GetNameString()));
-      view->m_pTopBlock = new Orb_Block(view->GetModel(), view, view, std::move(name));
+      view->m_pTopBlock =
+          view->GetModel()->Make<Orb_Block>(view->GetModel(), view, view, std::move(name));
       ReadBlock(view->m_pTopBlock);
       holder = nullptr;
     } else if (tag == 'C') {
@@ -911,30 +568,25 @@ void Orb_ModelIO::ReadBlock(Orb_Block *top) {
       if (code > Orb_Pin::PIN_BIDIRECTIONAL)
         m_pIn->Corrupt("unknown direction of pin " + Quote(name));
       auto const direction = static_cast<Orb_Pin::PIN_DIRECTION>(code);
-      if (block->m_Pins.Find(name))
-        Duplicate("pin", name, block);
-      auto *pin =
-          model->Adopt(block->m_Pins, new Orb_Pin(model, block, std::move(name), direction));
+      auto *pin = model->Make<Orb_Pin>(model, block, std::move(name), direction);
+      Place(pin, "pin");
       m_Pins.push_back(pin);
       holder = pin;
     } else if (tag == 'S') {
       std::string name = ReadName("signal");
       m_pIn->End();
-      if (block->m_Signals.Find(name))
-        Duplicate("signal", name, block);
-      auto *signal = model->Adopt(block->m_Signals, new Orb_Signal(model, block, std::move(name)));
+      auto *signal = model->Make<Orb_Signal>(model, block, std::move(name));
+      Place(signal, "signal");
       m_Signals.push_back(signal);
       holder = signal;
     } else if (tag == 'B') {
       std::string name = ReadName("block");
       m_pIn->End();
-      if (block->m_Blocks.Find(name))
-        Duplicate("block", name, block);
       if (open.size() >= Orb_MaxBlockDepth)
         m_pIn->Corrupt("block " + Quote(name) + " nested deeper than " +
                        std::to_string(Orb_MaxBlockDepth) + " levels");
-      auto *child = model->Adopt(block->m_Blocks,
-                                 new Orb_Block(model, block, block->m_pView, std::move(name)));
+      auto *child = model->Make<Orb_Block>(model, block, block->m_pView, std::move(name));
+      Place(child, "block");
       open.push_back(child);
       holder = child;
     } else if (tag == 'E') {
@@ -951,7 +603,11 @@ void Orb_ModelIO::ReadBlock(Orb_Block *top) {
 
 void Orb_ModelIO::ReadConnections() {
   Orb_Signal *signal = SignalAt(m_pIn->Num());
-  for (std::uint64_t n = m_pIn->Num(); n > 0; --n) {
+  std::uint64_t const count = m_pIn->Num();
+  // The count is the file's word: no more than the view has pins.
+  signal->m_Pins.ReserveExact(
+      static_cast<std::size_t>(std::min<std::uint64_t>(count, m_Pins.size())));
+  for (std::uint64_t n = count; n > 0; --n) {
     Orb_Pin *pin = PinAt(m_pIn->Num());
     Orb_Block *block = pin->GetParent();
     bool const inner = block == signal->GetParent();
@@ -970,11 +626,12 @@ void Orb_ModelIO::ReadConnections() {
 
 Orb_Network *Orb_ModelIO::ReadNetwork(Orb_View *view) {
   std::string name = ReadName("network");
-  if (view->m_Networks.Find(name))
-    Duplicate("network", name, view);
-  auto *network = view->GetModel()->Adopt(view->m_Networks,
-                                          new Orb_Network(view->GetModel(), view, std::move(name)));
-  for (std::uint64_t n = m_pIn->Num(); n > 0; --n) {
+  auto *network = view->GetModel()->Make<Orb_Network>(view->GetModel(), view, std::move(name));
+  Place(network, "network");
+  std::uint64_t const count = m_pIn->Num();
+  network->m_Signals.ReserveExact(
+      static_cast<std::size_t>(std::min<std::uint64_t>(count, m_Signals.size())));
+  for (std::uint64_t n = count; n > 0; --n) {
     Orb_Signal *signal = SignalAt(m_pIn->Num());
     if (signal->GetNetwork())
       m_pIn->Corrupt("signal " + Quote(signal->GetNameString()) + " is in two networks");
@@ -1045,6 +702,24 @@ void Orb_ModelIO::Unexpected(char tag, char const *where) const {
   std::string const shown =
       byte > ' ' && byte < 0x7f ? Quote(std::string(1, tag)) : "byte " + std::to_string(byte);
   m_pIn->Corrupt("unexpected record " + shown + " in a " + where);
+}
+
+void Orb_ModelIO::Place(Orb_Persistent *object, char const *kind) const {
+  Orb_Model *model = object->GetModel();
+  bool linked = false;
+  try {
+    linked = model->Link(object);
+  } catch (...) {
+    // In no container: nothing else would ever free it.
+    model->Free(object);
+    throw;
+  }
+  if (linked)
+    return;
+  std::string const name = object->GetNameString();
+  Orb_Persistent const *parent = object->GetParentObject();
+  model->Free(object);
+  Duplicate(kind, name, parent);
 }
 
 void Orb_ModelIO::Duplicate(char const *kind, std::string const &name,

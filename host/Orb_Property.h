@@ -2,6 +2,7 @@
 
 #include "Lum_PlatformApi.h"
 
+#include <cstddef>
 #include <memory>
 #include <string>
 #include <vector>
@@ -28,6 +29,11 @@ public:
   Orb_Property &operator=(Orb_Property const &) = delete;
   ~Orb_Property();
 
+  // Properties are many and small: they come from Orb_SmallAllocate.
+  // The matching delete is the sized one below, so that the size class is known.
+  static void *operator new(std::size_t size); // NOLINT(misc-new-delete-overloads)
+  static void operator delete(void *pointer, std::size_t size) noexcept;
+
   Kind GetKind() const { return m_Kind; }
   char const *GetName() const { return m_Name.c_str(); }
 
@@ -37,20 +43,34 @@ public:
   void SetStringValue(std::string value) { m_Value = std::move(value); }
 
   // String list: read, cleared and appended to in order.
-  std::vector<std::string> const &GetStrings() const { return m_Strings; }
-  void ClearStrings() { m_Strings.clear(); }
-  void AppendString(std::string value) { m_Strings.push_back(std::move(value)); }
+  std::vector<std::string> const &GetStrings() const {
+    return m_pLists ? m_pLists->strings : NoLists().strings;
+  }
+  void ClearStrings() {
+    if (m_pLists)
+      m_pLists->strings.clear();
+  }
+  void AppendString(std::string value) { Lists().strings.push_back(std::move(value)); }
 
   // List: appends a string member (names may repeat) and returns it.
   Orb_Property *CreatePropertyString(char const *name, char const *value);
-  std::vector<std::unique_ptr<Orb_Property>> const &GetMembers() const { return m_Members; }
+  std::vector<std::unique_ptr<Orb_Property>> const &GetMembers() const {
+    return m_pLists ? m_pLists->members : NoLists().members;
+  }
 
 private:
   Kind m_Kind;
   std::string m_Name;
   std::string m_Value;
-  std::vector<std::string> m_Strings;
-  std::vector<std::unique_ptr<Orb_Property>> m_Members;
+  // The entries of a string list or the members of a list; null for a
+  // string property, the common kind, which so costs one pointer for them.
+  struct ListData {
+    std::vector<std::string> strings;
+    std::vector<std::unique_ptr<Orb_Property>> members;
+  };
+  static ListData const &NoLists();
+  ListData &Lists();
+  std::unique_ptr<ListData> m_pLists;
 };
 
 // The properties of one host object, in creation order. Names are unique:
@@ -74,7 +94,9 @@ public:
   void DeleteProperty(char const *name);
   void DeleteProperty(Orb_Property *property);
 
-  std::vector<std::unique_ptr<Orb_Property>> const &GetProperties() const { return m_Properties; }
+  std::vector<std::unique_ptr<Orb_Property>> const &GetProperties() const {
+    return m_pProperties ? *m_pProperties : NoProperties();
+  }
 
   // Prints every property through the debug printer, one per line (list
   // entries and members indented one level deeper).
@@ -85,7 +107,11 @@ public:
   void CopyPropertiesFrom(Orb_PropertyHolder const &other);
 
 private:
+  using Properties = std::vector<std::unique_ptr<Orb_Property>>;
+  static Properties const &NoProperties();
   Orb_Property *Insert(std::unique_ptr<Orb_Property> property);
 
-  std::vector<std::unique_ptr<Orb_Property>> m_Properties;
+  // Null while the object has no property: most objects have none, and a
+  // pointer costs a third of an empty vector.
+  std::unique_ptr<Properties> m_pProperties;
 };

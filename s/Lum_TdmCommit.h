@@ -10,8 +10,8 @@
 // Commits each host child in host order through its client, which is
 // specialized on the spot when it has none. The bridge table is fetched once
 // for the loop.
-template <class Client, class Host>
-void Lum_TdmCommitEach(Orb_Context *context, Orb_Kind kind, std::vector<Host *> const &children) {
+template <class Client, class Children>
+void Lum_TdmCommitEach(Orb_Context *context, Orb_Kind kind, Children const &children) {
   if (children.empty())
     return;
   Orb_BridgeHandle const bridge = context->GetBridgeHandle(kind);

@@ -151,10 +151,10 @@ inline std::size_t ObjectCount(Orb_Model const &model) {
   return count;
 }
 
-// Names of objects in order, blank-separated.
-template <class T> std::string Names(std::vector<T *> const &objects) {
+// Names of objects in order, blank-separated (a vector or a host range).
+template <class Objects> std::string Names(Objects const &objects) {
   std::string text;
-  for (T const *object : objects)
+  for (auto const *object : objects)
     text += (text.empty() ? "" : " ") + object->GetNameString();
   return text;
 }

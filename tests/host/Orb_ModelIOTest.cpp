@@ -184,6 +184,19 @@ TEST_F(Orb_ModelIOTest, RefusesBrokenFiles) {
                               ": block 'c' nested deeper than 1000 levels";
   for (unsigned level = 1; level <= Orb_MaxBlockDepth; ++level)
     deep += "E\n";
+  // Siblings past the point where a container indexes its names, then a
+  // repeated name: found by the index.
+  auto const record = [](char const *head, std::string const &name, char const *tail) {
+    return head + std::to_string(name.size()) + ":" + name + tail;
+  };
+  std::string manySignals;
+  std::string manyBlocks;
+  for (int i = 0; i < 40; ++i) {
+    manySignals += record("S ", "s" + std::to_string(i), "\n");
+    manyBlocks += record("B ", "c" + std::to_string(i), "\nE\n");
+  }
+  manySignals += record("S ", "s5", "\n");
+  manyBlocks += record("B ", "c37", "\nE\n");
   // Each replaces `from` once in kSmallDatabase; an empty `from` replaces all.
   struct {
     std::string_view from, to;
@@ -200,6 +213,8 @@ TEST_F(Orb_ModelIOTest, RefusesBrokenFiles) {
        "connects to signal 't' of block 'c', neither its own block nor its parent"},
       {"S 1:s\n", "I 2 1:p\n", "second pin named 'p'"},
       {"S 1:s\n", "S 1:s\nP 1:k 0:\nP 1:k 0:\n", "second property named 'k'"},
+      {"S 1:s\n", manySignals, "second signal named 's5'"},
+      {"B 1:c\nI 1 1:q\nE\n", manyBlocks, "second block named 'c37'"},
       {"1:p", "1:\0"sv, "NUL byte in a name"},
       {"P 1:k", "P 2:k\0"sv, "NUL byte in a name"},
       {"Z\n", "Z\nZ\n", "data after the end record"},

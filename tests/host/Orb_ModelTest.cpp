@@ -369,3 +369,120 @@ TEST(PropertyTest, ReplaceDeleteAndCopyInPlace) {
 }
 
 } // namespace
+
+namespace {
+
+// Deleting children in the patterns callers use keeps host order and the
+// name lookups right, on either side of the size where a block starts
+// indexing names, and a deleted name can be used again.
+TEST_F(HostModelTest, DeletionsKeepOrderAndLookups) {
+  top->DeleteBlock(c);
+  std::vector<std::string> expected;
+  for (int i = 0; i < 60; ++i) {
+    expected.push_back("b" + std::to_string(i));
+    top->CreateBlock(expected.back().c_str());
+  }
+  auto const check = [&](char const *when) {
+    std::string joined;
+    for (std::string const &name : expected)
+      joined += (joined.empty() ? "" : " ") + name;
+    EXPECT_EQ(Names(top->GetBlocks()), joined) << when;
+    for (int i = 0; i < 60; ++i) {
+      std::string const name = "b" + std::to_string(i);
+      bool const live = std::find(expected.begin(), expected.end(), name) != expected.end();
+      Orb_Block *found = top->GetBlockByName(name.c_str());
+      EXPECT_EQ(found != nullptr, live) << when << ": " << name;
+      if (found) {
+        EXPECT_EQ(found->GetNameString(), name) << when;
+      }
+    }
+  };
+  auto const erase = [&](Orb_Block *block) {
+    expected.erase(std::find(expected.begin(), expected.end(), block->GetNameString()));
+    top->DeleteBlock(block);
+  };
+  // A snapshot of every tenth, then the front, then by index walk.
+  std::vector<Orb_Block *> snapshot;
+  for (std::size_t i = 0; i < top->GetBlocks().size(); i += 10)
+    snapshot.push_back(top->GetBlocks()[i]);
+  for (Orb_Block *block : snapshot)
+    erase(block);
+  check("snapshot");
+  for (int k = 0; k < 5; ++k)
+    erase(top->GetBlocks().front());
+  check("front");
+  for (std::size_t i = 0; i < top->GetBlocks().size(); ++i)
+    if (i % 3 == 0)
+      erase(top->GetBlocks()[i--]);
+  check("index walk");
+  while (top->GetBlocks().size() > 10)
+    erase(top->GetBlocks().back());
+  check("back, below the index size");
+  top->CreateBlock("b0");
+  expected.push_back("b0");
+  check("a deleted name again");
+  EXPECT_THROW(top->CreateBlock(expected.front().c_str()), Orb_Exception);
+}
+
+// A signal's pin list keeps connection order when pins leave it from either
+// side, one by one or with their block; so does a network's signal list.
+TEST_F(HostModelTest, ConnectionsLeaveInOrder) {
+  std::vector<Orb_Pin *> pins;
+  for (int i = 0; i < 6; ++i) {
+    Orb_Block *block = top->CreateBlock(("k" + std::to_string(i)).c_str());
+    pins.push_back(block->CreatePin("x", Orb_Pin::PIN_INPUT));
+    pins.back()->Connect(s);
+  }
+  Orb_Pin *q = top->CreatePin("q", Orb_Pin::PIN_OUTPUT);
+  q->ConnectInner(s);
+  EXPECT_EQ(Names(s->GetPins()), "p cp x x x x x x q");
+  pins[1]->Connect(nullptr);
+  p->ConnectInner(nullptr);
+  top->DeleteBlock(pins[3]->GetParent());
+  std::vector<std::string> parents;
+  for (Orb_Pin *pin : s->GetPins())
+    parents.push_back(pin->GetParent()->GetNameString() + "." + pin->GetNameString());
+  EXPECT_EQ(Joined(parents, " "), "c.cp k0.x k2.x k4.x k5.x top.q");
+  pins[1]->Connect(s);
+  EXPECT_EQ(s->GetPins().back(), pins[1]) << "a reconnected pin goes last";
+
+  std::vector<Orb_Signal *> signals{s};
+  for (int i = 0; i < 5; ++i) {
+    signals.push_back(top->CreateSignal(("t" + std::to_string(i)).c_str()));
+    n->AddSignal(signals.back());
+  }
+  n->RemoveSignal(signals[2]);
+  top->DeleteSignal(signals[4]);
+  EXPECT_EQ(Names(n->GetSignals()), "s t0 t2 t4");
+}
+
+} // namespace
+
+namespace {
+
+// Creating and deleting blocks over and over reuses the freed slots of each
+// kind: bridge ids (slot numbers) stay as few as the objects alive at once.
+TEST_F(HostModelTest, ChurnReusesSlots) {
+  unsigned highestBlock = 0;
+  unsigned highestPin = 0;
+  for (int round = 0; round < 40; ++round) {
+    std::vector<Orb_Block *> blocks;
+    for (int i = 0; i < 25; ++i) {
+      Orb_Block *block = top->CreateBlock(("r" + std::to_string(i)).c_str());
+      Orb_Pin *pin = block->CreatePin("x", Orb_Pin::PIN_INPUT);
+      pin->Connect(s);
+      highestBlock = std::max(highestBlock, block->GetBridgeId());
+      highestPin = std::max(highestPin, pin->GetBridgeId());
+      blocks.push_back(block);
+    }
+    for (std::size_t i = blocks.size(); i-- > 0;)
+      top->DeleteBlock(blocks[i]);
+  }
+  // Top, c and the 25 of a round; the fixture's pins p, cp and the 25.
+  EXPECT_LT(highestBlock, 27u);
+  EXPECT_LT(highestPin, 27u);
+  EXPECT_EQ(Names(s->GetPins()), "p cp");
+  EXPECT_EQ(model->GetClientCount(), ObjectCount(*host));
+}
+
+} // namespace
