@@ -22,10 +22,13 @@ std::string StringProperty(Orb_ClientObject const *object, char const *name) {
                                                                  : std::string();
 }
 
-// The top block of a type block design's "type" view, or null.
+// The top block of a type block design's "type" view, or null. A block
+// named otherwise than its design is no type block: its unique tag names the
+// block, and a lookup of that tag, which goes by design, would not find it.
 Orb_Block *TypeViewBlock(Orb_Design const *design) {
   Orb_View const *view = design ? design->GetViewByName(Lum_TlmNames::kTypeViewName) : nullptr;
-  return view ? view->GetBlock() : nullptr;
+  Orb_Block *block = view ? view->GetBlock() : nullptr;
+  return block && block->GetNameString() == design->GetNameString() ? block : nullptr;
 }
 
 // Keeps a design database's local library: its own host model and the

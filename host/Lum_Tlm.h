@@ -103,7 +103,8 @@ public:
   virtual Port::StringBase<char> GetFirstQualifier() const;
   virtual Port::StringBase<char> GetSecondQualifier() const;
 
-  // The type block of that name (exact bytes), or null. O(1).
+  // The type block of that name (exact bytes), or null, also when the top
+  // block of that design's type view is named otherwise (a damaged file). O(1).
   Lum_TlmBlock const *GetTypeBlock(Port::StringBase<char> const &name) const;
   Lum_TlmBlock *GetTypeBlock(Port::StringBase<char> const &name);
 

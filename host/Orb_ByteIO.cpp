@@ -3,6 +3,7 @@
 #include "Orb_ByteIO.h"
 
 #include "Orb_Exception.h"
+#include "Orb_FileOps.h"
 
 #include <algorithm>
 #include <cerrno>
@@ -99,6 +100,9 @@ ByteWriter::ByteWriter(std::string const &path) : m_Path(path), m_Target(Resolve
   if (::stat(m_Target.c_str(), &status) == 0 && S_ISREG(status.st_mode))
     m_Mode = static_cast<int>(status.st_mode & 07777);
   RemoveStaleTemporaries(m_Target);
+  // Before the file exists: a constructor that throws after it would leave
+  // the file behind, since the destructor does not run.
+  m_Buffer.reserve(kBufferSize);
   // O_EXCL with a fresh suffix on collision: a stale file of a crashed save
   // or a concurrent save to the same target is never reused. Private until
   // Commit gives it the replaced file's bits.
@@ -109,7 +113,6 @@ ByteWriter::ByteWriter(std::string const &path) : m_Path(path), m_Target(Resolve
     if (m_Fd < 0 && (errno != EEXIST || attempt == 100))
       Fail("cannot create the temporary file", errno);
   }
-  m_Buffer.reserve(kBufferSize);
 }
 
 ByteWriter::~ByteWriter() {
@@ -154,7 +157,7 @@ void ByteWriter::Flush() {
   char const *data = m_Buffer.data();
   std::size_t left = m_Buffer.size();
   while (left > 0) {
-    ssize_t const written = ::write(m_Fd, data, left);
+    ssize_t const written = Orb_FileOps::Get().write(m_Fd, data, left);
     if (written < 0) {
       if (errno == EINTR)
         continue;
@@ -170,13 +173,13 @@ void ByteWriter::Commit() {
   Flush();
   if (m_Mode >= 0 && ::fchmod(m_Fd, static_cast<mode_t>(m_Mode)) != 0)
     Fail("cannot set the permissions of", errno);
-  if (::fsync(m_Fd) != 0)
+  if (Orb_FileOps::Get().fsync(m_Fd) != 0)
     Fail("cannot flush", errno);
   int const fd = m_Fd;
   m_Fd = -1;
-  if (::close(fd) != 0)
+  if (Orb_FileOps::Get().close(fd) != 0)
     Fail("cannot close", errno);
-  if (::rename(m_TempPath.c_str(), m_Target.c_str()) != 0)
+  if (Orb_FileOps::Get().rename(m_TempPath.c_str(), m_Target.c_str()) != 0)
     Fail("cannot rename", errno);
   m_Committed = true;
 }

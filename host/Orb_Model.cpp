@@ -430,7 +430,15 @@ template <class T> T *Orb_Model::Announce(T *object) {
 }
 
 template <class T> T *Orb_Model::Adopt(T *object, char const *kind) {
-  if (!Link(object)) {
+  bool linked = false;
+  try {
+    linked = Link(object);
+  } catch (...) {
+    // In no container: nothing else would ever free it.
+    Destroy(object);
+    throw;
+  }
+  if (!linked) {
     std::string const name = object->GetNameString();
     Orb_Persistent *parent = object->GetParentObject();
     Destroy(object);

@@ -372,10 +372,18 @@ void Orb_ModelIO::FreeDesignMgrs(Orb_Model &model, Orb_Range<Orb_DesignMgr> desi
 
 std::vector<Orb_DesignMgr *> Orb_ModelIO::Commit(Section &section) {
   std::vector<Orb_DesignMgr *> loaded = section.designMgrs.Items().ToVector();
+  // Names were checked against the model's when read. A failure undoes the
+  // move: the section still owns them all and frees them.
+  std::size_t added = 0;
+  try {
+    for (; added < loaded.size(); ++added)
+      section.model.m_DesignMgrs.AddUnique(loaded[added]);
+  } catch (...) {
+    for (std::size_t i = 0; i < added; ++i)
+      section.model.m_DesignMgrs.Remove(loaded[i]);
+    throw;
+  }
   section.designMgrs.Clear();
-  // Names were checked against the model's when read.
-  for (Orb_DesignMgr *designMgr : loaded)
-    section.model.m_DesignMgrs.AddUnique(designMgr);
   return loaded;
 }
 
@@ -433,7 +441,13 @@ void Orb_ModelIO::ReadModel(Section &section, bool companion) {
       if (section.designMgrs.Find(name))
         Duplicate("design manager", name, nullptr);
       auto *designMgr = section.model.Make<Orb_DesignMgr>(&section.model, std::move(name));
-      section.designMgrs.AddUnique(designMgr);
+      try {
+        section.designMgrs.AddUnique(designMgr);
+      } catch (...) {
+        // In no list: nothing else would ever free it.
+        section.model.Free(designMgr);
+        throw;
+      }
       ReadDesignMgr(designMgr);
     } else if (tag == 'K') {
       if (companion)
@@ -692,7 +706,15 @@ void Orb_ModelIO::Unexpected(char tag, char const *where) const {
 
 void Orb_ModelIO::Place(Orb_Persistent *object, char const *kind) const {
   Orb_Model *model = object->GetModel();
-  if (model->Link(object))
+  bool linked = false;
+  try {
+    linked = model->Link(object);
+  } catch (...) {
+    // In no container: nothing else would ever free it.
+    model->Free(object);
+    throw;
+  }
+  if (linked)
     return;
   std::string const name = object->GetNameString();
   Orb_Persistent const *parent = object->GetParentObject();

@@ -14,7 +14,7 @@ namespace {
 constexpr unsigned kMaxField = 65535;
 
 // One conversion's flags, width and precision.
-struct Spec {
+struct Conversion {
   bool left = false;  // '-'
   bool zero = false;  // '0'
   bool plus = false;  // '+'
@@ -36,24 +36,24 @@ bool ReadField(char const *&p, unsigned &value) {
 }
 
 // Appends the body, padded with blanks to the width.
-void Pad(std::string &out, Spec const &spec, std::string_view body) {
-  std::size_t const fill = spec.width > body.size() ? spec.width - body.size() : 0;
-  if (!spec.left)
+void Pad(std::string &out, Conversion const &conv, std::string_view body) {
+  std::size_t const fill = conv.width > body.size() ? conv.width - body.size() : 0;
+  if (!conv.left)
     out.append(fill, ' ');
   out.append(body);
-  if (spec.left)
+  if (conv.left)
     out.append(fill, ' ');
 }
 
 // A number as printf lays it out: sign or prefix, zeros up to the
 // precision, then padding to the width (zeros with '0' unless '-' or a
 // precision is given).
-void AppendNumber(std::string &out, Spec const &spec, std::string_view prefix,
+void AppendNumber(std::string &out, Conversion const &conv, std::string_view prefix,
                   std::uint64_t magnitude, unsigned base) {
   char digits[32];
   int n = 0;
   // A zero precision prints nothing for the value zero.
-  if (magnitude != 0 || spec.precision != 0) {
+  if (magnitude != 0 || conv.precision != 0) {
     do {
       auto const digit = static_cast<unsigned>(magnitude % base);
       digits[n++] = static_cast<char>(digit < 10 ? '0' + digit : 'a' + (digit - 10));
@@ -61,15 +61,15 @@ void AppendNumber(std::string &out, Spec const &spec, std::string_view prefix,
     } while (magnitude != 0);
   }
   std::size_t zeros =
-      spec.precision > n ? static_cast<std::size_t>(spec.precision - n) : std::size_t(0);
+      conv.precision > n ? static_cast<std::size_t>(conv.precision - n) : std::size_t(0);
   std::size_t const length = prefix.size() + zeros + static_cast<std::size_t>(n);
-  if (spec.zero && !spec.left && spec.precision < 0 && spec.width > length)
-    zeros += spec.width - length;
+  if (conv.zero && !conv.left && conv.precision < 0 && conv.width > length)
+    zeros += conv.width - length;
   std::string body(prefix);
   body.append(zeros, '0');
   while (n > 0)
     body += digits[--n];
-  Pad(out, spec, body);
+  Pad(out, conv, body);
 }
 
 } // namespace
@@ -84,26 +84,26 @@ std::string vformat(char const *format, va_list args) {
       continue;
     }
     char const *const start = p++;
-    Spec spec;
+    Conversion conv;
     for (;; ++p) {
       if (*p == '-')
-        spec.left = true;
+        conv.left = true;
       else if (*p == '0')
-        spec.zero = true;
+        conv.zero = true;
       else if (*p == '+')
-        spec.plus = true;
+        conv.plus = true;
       else if (*p == ' ')
-        spec.space = true;
+        conv.space = true;
       else if (*p == '#')
-        spec.alt = true;
+        conv.alt = true;
       else
         break;
     }
-    bool valid = ReadField(p, spec.width);
+    bool valid = ReadField(p, conv.width);
     if (valid && *p == '.') {
       unsigned precision = 0;
       valid = ReadField(++p, precision);
-      spec.precision = static_cast<int>(precision);
+      conv.precision = static_cast<int>(precision);
     }
     // The conversion; '\0' for one that is unknown or malformed. 'U' stands
     // for %lU and is unknown on its own.
@@ -119,34 +119,34 @@ std::string vformat(char const *format, va_list args) {
     case 's': {
       char const *text = va_arg(args, char const *);
       std::string_view value = text ? text : "(null)";
-      if (spec.precision >= 0 && value.size() > static_cast<std::size_t>(spec.precision))
-        value = value.substr(0, static_cast<std::size_t>(spec.precision));
-      Pad(out, spec, value);
+      if (conv.precision >= 0 && value.size() > static_cast<std::size_t>(conv.precision))
+        value = value.substr(0, static_cast<std::size_t>(conv.precision));
+      Pad(out, conv, value);
       break;
     }
     case 'c': {
       char const c = static_cast<char>(va_arg(args, int));
-      Pad(out, spec, std::string_view(&c, 1));
+      Pad(out, conv, std::string_view(&c, 1));
       break;
     }
     case 'd': {
       int const value = va_arg(args, int);
       // Through int64: the magnitude of INT_MIN does not fit an int.
       auto const wide = static_cast<std::int64_t>(value);
-      std::string_view const sign = value < 0 ? "-" : spec.plus ? "+" : spec.space ? " " : "";
-      AppendNumber(out, spec, sign, static_cast<std::uint64_t>(value < 0 ? -wide : wide), 10);
+      std::string_view const sign = value < 0 ? "-" : conv.plus ? "+" : conv.space ? " " : "";
+      AppendNumber(out, conv, sign, static_cast<std::uint64_t>(value < 0 ? -wide : wide), 10);
       break;
     }
     case 'u':
-      AppendNumber(out, spec, "", va_arg(args, unsigned), 10);
+      AppendNumber(out, conv, "", va_arg(args, unsigned), 10);
       break;
     case 'x': {
       std::uintptr_t const value = va_arg(args, std::uintptr_t);
-      AppendNumber(out, spec, spec.alt && value != 0 ? "0x" : "", value, 16);
+      AppendNumber(out, conv, conv.alt && value != 0 ? "0x" : "", value, 16);
       break;
     }
     case 'U':
-      AppendNumber(out, spec, "", va_arg(args, std::uint64_t), 10);
+      AppendNumber(out, conv, "", va_arg(args, std::uint64_t), 10);
       break;
     default:
       // Unknown, malformed or cut short: the arguments that follow can no

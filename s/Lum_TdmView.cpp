@@ -186,9 +186,13 @@ void Lum_TdmView::GetDevicePic(PM_PIC &personality) const {
 }
 
 void Lum_TdmView::AppendLibrary(Lum_TlmLibrary const *library) const {
+  // Both lists grow together or not at all: the destructor reads one entry
+  // of each per library.
+  bool const isLocal = IsLocalLibrary(library);
   m_LocalEntries.reserve(m_pLibrary->size() + 1);
+  m_pLibrary->reserve(m_pLibrary->size() + 1);
   m_pLibrary->push_back(library);
-  m_LocalEntries.push_back(IsLocalLibrary(library));
+  m_LocalEntries.push_back(isLocal);
 }
 
 std::vector<Lum_TlmLibrary const *> &Lum_TdmView::GetLibraryList() const {
@@ -235,7 +239,13 @@ void Lum_TdmView::BuildLibraryList() const {
     if (!library)
       throw Lum_ExceptionInvalidLibrary("Lum", kSourcePath, kRevision, __LINE__, name.c_str(),
                                         "Null library pointer specified.", false);
-    AppendLibrary(library);
+    try {
+      AppendLibrary(library);
+    } catch (...) {
+      // Not in the list, so the destructor would not give it back.
+      Lum_TlmLibrary::ReleaseLibrary(library);
+      throw;
+    }
     Lum_Tlm::pTypeIDRegistry->RegisterTypeLibrary(library);
   }
 }

@@ -113,6 +113,18 @@ TEST_F(TlmTest, BuiltLibraryIsComplete) {
   EXPECT_EQ(HostTest::ObjectCount(*model.GetOrbModel()), before);
 }
 
+// A type view whose top block is named otherwise than its design (a damaged
+// file) holds no type block: binding to it would store a tag that no lookup
+// finds again.
+TEST_F(TlmTest, TypeBlockNamedOtherwiseThanItsDesignIsNone) {
+  Lum_TlmModel model("m", "m", "", false);
+  Lum_TlmLibrary *library = BuildGates(model);
+  library->CreateDesign("LOC")->CreateView("type")->CreateTopBlock("LNC");
+  EXPECT_EQ(library->GetTypeBlock("LOC"), nullptr);
+  EXPECT_EQ(library->GetTypeBlock("LNC"), nullptr);
+  EXPECT_EQ(library->GetTypeBlocks().size(), 2u) << "AND2 and MUX only";
+}
+
 // Loads are counted; the last release unloads, and the next load reads the file again.
 TEST_F(TlmTest, LoadsFromFileAndUnloadsAtLastRelease) {
   Lum_TlmCatalog::AddSearchDirectory(SaveGates("", 2).c_str());

@@ -1,0 +1,322 @@
+// Allocation failure: an open in which the k-th allocation fails, for every
+// k, throws std::bad_alloc or one of the library's exceptions and leaves the
+// model as it was. A program of its own, since it replaces the global
+// operator new.
+
+#include "Lum_TdmFaultSupport.h"
+
+#include "Lum_TdmTypePinMap.h"
+#include "Orb_Exception.h"
+#include "Orb_FileOps.h"
+#include "Port_Exception.h"
+
+#include <gtest/gtest.h>
+
+#include <cstdlib>
+#include <filesystem>
+#include <new>
+#include <string>
+
+namespace {
+
+// Counts allocations while armed; the allocation numbered g_FailAt (from 1)
+// throws std::bad_alloc, once.
+unsigned long g_Allocations = 0;
+unsigned long g_FailAt = 0;
+bool g_Armed = false;
+
+void *Allocate(std::size_t size) {
+  if (g_Armed && ++g_Allocations == g_FailAt)
+    throw std::bad_alloc();
+  if (void *memory = std::malloc(size ? size : 1))
+    return memory;
+  throw std::bad_alloc();
+}
+
+// Arms the counter for one scope.
+class FailingAllocation {
+public:
+  explicit FailingAllocation(unsigned long failAt) {
+    g_Allocations = 0;
+    g_FailAt = failAt;
+    g_Armed = true;
+  }
+  ~FailingAllocation() { g_Armed = false; }
+  FailingAllocation(FailingAllocation const &) = delete;
+  FailingAllocation &operator=(FailingAllocation const &) = delete;
+};
+
+// Whether this program's operator new is the one in use: a memory checker
+// such as valgrind puts its own in place, and nothing can fail then.
+bool ReplacementInUse() {
+  FailingAllocation failing(1);
+  try {
+    delete new int(0);
+  } catch (std::bad_alloc const &) {
+    return true;
+  }
+  return false;
+}
+
+} // namespace
+
+// The replacements must be visible to the shared libraries, which the
+// project builds with hidden visibility by default.
+#define LUM_REPLACE __attribute__((visibility("default")))
+LUM_REPLACE void *operator new(std::size_t size) { return Allocate(size); }
+LUM_REPLACE void *operator new[](std::size_t size) { return Allocate(size); }
+LUM_REPLACE void *operator new(std::size_t size, std::nothrow_t const &) noexcept {
+  try {
+    return Allocate(size);
+  } catch (std::bad_alloc const &) {
+    return nullptr;
+  }
+}
+LUM_REPLACE void *operator new[](std::size_t size, std::nothrow_t const &) noexcept {
+  try {
+    return Allocate(size);
+  } catch (std::bad_alloc const &) {
+    return nullptr;
+  }
+}
+LUM_REPLACE void operator delete(void *memory) noexcept { std::free(memory); }
+LUM_REPLACE void operator delete[](void *memory) noexcept { std::free(memory); }
+LUM_REPLACE void operator delete(void *memory, std::size_t) noexcept { std::free(memory); }
+LUM_REPLACE void operator delete[](void *memory, std::size_t) noexcept { std::free(memory); }
+LUM_REPLACE void operator delete(void *memory, std::nothrow_t const &) noexcept {
+  std::free(memory);
+}
+LUM_REPLACE void operator delete[](void *memory, std::nothrow_t const &) noexcept {
+  std::free(memory);
+}
+
+using namespace lumtest;
+
+namespace {
+
+// Every allocation of an open, in turn, fails: the open throws std::bad_alloc
+// or a Port::Exception with a message, and the model keeps exactly its own
+// objects, clients, companions and saved bytes, and then opens the design in
+// full. The last k is the first that the open survives.
+TEST(TdmAllocFaultTest, FailedAllocationAtEveryStepOfAnOpenLeavesTheModelAsItWas) {
+  if (!ReplacementInUse())
+    GTEST_SKIP() << "operator new is not this program's (a memory checker replaced it)";
+  FaultDesign design;
+  std::string expected;
+  {
+    Lum_TdmModel model("alloc", "allocdb", "");
+    model.Open(design.Path().c_str());
+    expected = FaultDesign::Typing(model);
+  }
+
+  unsigned long k = 1;
+  for (;; ++k) {
+    SCOPED_TRACE("allocation " + std::to_string(k));
+    Lum_TdmModel model("alloc", "allocdb", "");
+    FaultDesign::AddOwnContent(model);
+    ModelState const before = StateOf(model, design.Scratch("before.odb"));
+    bool opened = false;
+    std::string failure;
+    {
+      FailingAllocation failing(k);
+      try {
+        model.Open(design.Path().c_str());
+        opened = true;
+      } catch (std::bad_alloc const &) {
+      } catch (Port::Exception const &e) {
+        failure = e.GetMessage().empty() ? "a Port::Exception without a message" : "";
+      } catch (...) {
+        failure = "an exception of another kind";
+      }
+    }
+    ASSERT_EQ(failure, "");
+    if (opened) {
+      EXPECT_EQ(FaultDesign::Typing(model), expected);
+      break;
+    }
+    ASSERT_EQ(StateOf(model, design.Scratch("after.odb")), before);
+    EXPECT_FALSE(Lum_TlmCatalog::IsLoaded("CELLS")) << "the library file stays loaded";
+    model.Open(design.Path().c_str());
+    ASSERT_EQ(FaultDesign::Typing(model), expected);
+  }
+  EXPECT_GT(k, 100u) << "the open made fewer allocations than expected";
+}
+
+// Host objects reachable from the model's design managers.
+std::size_t Reachable(Orb_Block const *block) {
+  std::size_t count = 1 + block->GetPins().size() + block->GetSignals().size();
+  for (Orb_Block const *child : block->GetBlocks())
+    count += Reachable(child);
+  return count;
+}
+
+std::size_t Reachable(Orb_Model const &model) {
+  std::size_t count = 0;
+  for (Orb_DesignMgr const *designMgr : model.GetDesignMgrs()) {
+    ++count;
+    for (Orb_Design const *design : designMgr->GetDesigns()) {
+      ++count;
+      for (Orb_View const *view : design->GetViews())
+        count +=
+            1 + view->GetNetworks().size() + (view->GetBlock() ? Reachable(view->GetBlock()) : 0);
+    }
+  }
+  return count;
+}
+
+// Building a design through the API with the k-th allocation failing throws
+// std::bad_alloc and leaves no object that the model counts but cannot
+// reach: an object the host made but could not file away is freed.
+TEST(TdmAllocFaultTest, FailedAllocationWhileCreatingLeavesNoStrayObject) {
+  if (!ReplacementInUse())
+    GTEST_SKIP() << "operator new is not this program's (a memory checker replaced it)";
+  for (unsigned long k = 1;; ++k) {
+    SCOPED_TRACE("allocation " + std::to_string(k));
+    Lum_TdmModel model("alloc", "allocdb", "");
+    bool built = false;
+    {
+      FailingAllocation failing(k);
+      try {
+        Lum_TdmView *view = model.CreateDesignMgr("dm")->CreateDesign("d")->CreateView("v");
+        Lum_TdmBlock *top = view->CreateTopBlock("top");
+        Lum_TdmSignal *signal = top->CreateSignal("s");
+        view->CreateNetwork("n")->GetOrbNetwork()->AddSignal(signal->GetOrbSignal());
+        top->CreateBlock("u1", 0)->CreatePin("a", Orb_Pin::PIN_INPUT);
+        built = true;
+      } catch (std::bad_alloc const &) {
+      }
+    }
+    std::size_t objects = 0;
+    for (unsigned kind = 0; kind < Orb_KindCount; ++kind)
+      objects += model.GetOrbModel()->GetObjectCount(static_cast<Orb_Kind>(kind));
+    ASSERT_EQ(objects, Reachable(*model.GetOrbModel()));
+    if (built)
+      break;
+  }
+}
+
+// A save whose k-th allocation fails, for every k, throws std::bad_alloc or
+// Orb_Exception and leaves the previous database byte for byte, with no
+// temporary file beside it.
+TEST(TdmAllocFaultTest, FailedAllocationWhileSavingKeepsThePreviousDatabase) {
+  if (!ReplacementInUse())
+    GTEST_SKIP() << "operator new is not this program's (a memory checker replaced it)";
+  TempDir dir;
+  std::string const path = dir.File("d.odb");
+  TypedDesign design;
+  Lum_TdmBlock *top = design.m_pView->CreateTopBlock("top");
+  design.Model().Save(path.c_str());
+  std::string const previous = FileBytes(path);
+  top->CreateBlock("u1", 0)->CreatePin("a", Orb_Pin::PIN_INPUT);
+
+  for (unsigned long k = 1;; ++k) {
+    SCOPED_TRACE("allocation " + std::to_string(k));
+    bool saved = false;
+    {
+      FailingAllocation failing(k);
+      try {
+        design.Model().Save(path.c_str());
+        saved = true;
+      } catch (std::bad_alloc const &) {
+      } catch (Orb_Exception const &) {
+      }
+    }
+    std::size_t files = 0;
+    for (auto const &entry : std::filesystem::directory_iterator(dir.Path()))
+      files += entry.is_regular_file() ? 1 : 0;
+    ASSERT_EQ(files, 1u) << "a temporary file stays";
+    if (saved)
+      break;
+    ASSERT_EQ(FileBytes(path), previous);
+  }
+  auto reopened = std::make_unique<Lum_TdmModel>("r", "r", "");
+  reopened->Open(path.c_str());
+  EXPECT_NE(FirstView(*reopened)->GetBlock()->GetBlockByName("u1"), nullptr);
+}
+
+// The binding of a block and its pins, in host order.
+std::string BindingOf(Lum_TdmBlock *block) {
+  std::string text = block->GetTypeBlock() ? block->GetTypeBlock()->GetUniqueTag().str() : "-";
+  for (std::size_t i = 0; i < block->GetPins().size(); ++i) {
+    Lum_TdmPin *pin = block->GetPin(i);
+    text += std::string(" ") + pin->GetName() + ">" +
+            (pin->GetTypePin() ? pin->GetTypePin()->GetName() : "-");
+  }
+  return text;
+}
+
+int NoSync(int) { return 0; }
+
+// Rebinding with and without a pin map, and a typed child with its pins and
+// its grafted hierarchy, each with the k-th allocation failing, for every k:
+// the call throws std::bad_alloc or a library exception, a failed rebinding
+// leaves the block's binding and pins as they were, no object is left that
+// the model counts but cannot reach, and the design still saves and reopens.
+TEST(TdmAllocFaultTest, FailedAllocationInCallerOperationsKeepsTheDesignWhole) {
+  if (!ReplacementInUse())
+    GTEST_SKIP() << "operator new is not this program's (a memory checker replaced it)";
+  FaultDesign design;
+  // Thousands of saves: durability is not what this test is about.
+  Orb_FileOps fast = Orb_FileOps::Get();
+  fast.fsync = &NoSync;
+  Orb_FileOps const saved = Orb_FileOps::Set(fast);
+  for (int operation = 0; operation < 3; ++operation) {
+    for (unsigned long k = 1;; ++k) {
+      ASSERT_LT(k, 20000u) << "operation " << operation << " never succeeds";
+      SCOPED_TRACE("operation " + std::to_string(operation) + ", allocation " + std::to_string(k));
+      Lum_TdmModel model("alloc", "allocdb", "");
+      model.Open(design.Path().c_str());
+      Lum_TdmView *view =
+          model.GetDesignMgrByName("dm")->GetDesignByName("top")->GetViewByName("netlist");
+      Lum_TdmBlock *top = view->GetBlock();
+      // u2 (A connected, Y) and u4 (CLK, D0, D1, Q) are unbound first, to
+      // be bound again.
+      Lum_TdmBlock *u2 = top->GetBlockByName("u2");
+      Lum_TdmBlock *u4 = top->GetBlockByName("u4");
+      Lum_TlmBlock const *nand = u2->GetTypeBlock();
+      Lum_TlmBlock const *reg = u4->GetTypeBlock();
+      u2->SetTypeBlock(nullptr);
+      u4->SetTypeBlock(nullptr);
+      Lum_TdmTypePinMap map;
+      for (std::size_t i = 0; i < u4->GetPins().size(); ++i)
+        map.SetPinMap(u4->GetPin(i), reg->GetPinByName(u4->GetPin(i)->GetName()));
+      Lum_TdmBlock *rebound = operation == 0 ? u2 : u4;
+      std::string const before = BindingOf(rebound);
+      bool done = false;
+      bool failed = false;
+      {
+        FailingAllocation failing(k);
+        try {
+          if (operation == 0)
+            u2->SetTypeBlock(nand);
+          else if (operation == 1)
+            u4->SetTypeBlock(reg, map);
+          else
+            top->CreateTypedBlock("u9", reg, true, true);
+          done = true;
+        } catch (std::bad_alloc const &) {
+          failed = true;
+        } catch (Port::Exception const &e) {
+          failed = !e.GetMessage().empty();
+        }
+      }
+      ASSERT_TRUE(done || failed) << "an exception without a message";
+      if (failed && operation < 2) {
+        EXPECT_EQ(BindingOf(rebound), before) << "a failed rebinding changed the block";
+      }
+      std::size_t objects = 0;
+      for (unsigned kind = 0; kind < Orb_KindCount; ++kind)
+        objects += model.GetOrbModel()->GetObjectCount(static_cast<Orb_Kind>(kind));
+      ASSERT_EQ(objects, Reachable(*model.GetOrbModel()));
+      view->CommitAll();
+      model.Save(design.Scratch("caller.odb").c_str());
+      Lum_TdmModel reopened("r", "r", "");
+      reopened.Open(design.Scratch("caller.odb").c_str());
+      if (done)
+        break;
+    }
+  }
+  Orb_FileOps::Set(saved);
+}
+
+} // namespace

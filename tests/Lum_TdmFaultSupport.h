@@ -1,0 +1,144 @@
+#pragma once
+
+// The small typed design that the fault-injection tests open again and
+// again, and what a refused open must leave unchanged.
+
+#include "Lum_TdmTestSupport.h"
+
+#include "Lum_Tlm.h"
+#include "Ora_GraftMgr.h"
+
+#include <fstream>
+#include <iterator>
+#include <string>
+
+namespace lumtest {
+
+inline std::string FileBytes(std::string const &path) {
+  std::ifstream in(path, std::ios::binary);
+  return std::string(std::istreambuf_iterator<char>(in), std::istreambuf_iterator<char>());
+}
+
+// Type libraries and a design database that uses every road of a typed open:
+// the in-memory library LIBT, the library file CELLS on the search path and
+// the database's local library; a block bound through a pin map that gains
+// its missing pins and is sorted, a block with a grafted hierarchy, a block
+// of the local library, connections, a network and a second view.
+class FaultDesign {
+public:
+  FaultDesign() : m_Libt("LIBT", 2, 1) {
+    Lum_TlmBlock *reg = m_Libt.AddTypeBlock("REG", {"D0", "D1", "CLK"});
+    reg->CreatePin("Q", Orb_Pin::PIN_OUTPUT);
+    Lum_TlmBlock *hier = reg->CreateHier("netlist");
+    hier->CreatePin("D0", Orb_Pin::PIN_INPUT);
+    hier->CreateBlock("ff", 0)->CreatePin("D", Orb_Pin::PIN_INPUT);
+    {
+      Lum_TlmModel cells("CELLS", "CELLS", "", false);
+      Lum_TlmBlock *nand = cells.CreateLibrary("CELLS", 1, 0)->CreateTypeBlock("NAND");
+      nand->CreatePin("A", Orb_Pin::PIN_INPUT);
+      nand->CreatePin("Y", Orb_Pin::PIN_OUTPUT);
+      cells.GetLibrary()->Save(m_Dir.File("CELLS.tlm").c_str());
+    }
+    Lum_TlmCatalog::AddSearchDirectory(m_Dir.Path().c_str());
+
+    TypedDesign design;
+    Orb_Property *libraries = design.m_pView->CreatePropertyStringList("TDS_VIEW_TYPE_LIBS");
+    libraries->AppendString("LIBT 2.1");
+    libraries->AppendString("CELLS 1.0");
+    libraries->AppendString(Lum_TlmLibrary::LOCAL_LIBRARY_NAME);
+    Lum_TlmLibrary::GetLocalLibrary(design.Host(), PM_PIC("pm1", "part1", nullptr))
+        ->CreateTypeBlock("LOC")
+        ->CreatePin("L", Orb_Pin::PIN_INPUT);
+    Lum_TdmBlock *top = design.m_pView->CreateTopBlock("top");
+    Lum_TdmSignal *signal = top->CreateSignal("s");
+    design.m_pView->CreateNetwork("n")->GetOrbNetwork()->AddSignal(signal->GetOrbSignal());
+    Lum_TdmBlock *u1 = top->CreateBlock("u1", 0);
+    for (char const *name : {"DATA0", "CLK"})
+      u1->CreatePin(name, Orb_Pin::PIN_INPUT)->GetOrbPin()->Connect(signal->GetOrbSignal());
+    u1->CreatePropertyString("TDS_BLOCK_TYPE", "LIBT:REG");
+    u1->CreatePropertyList("TDS_BLOCK_PIN_MAP")->CreatePropertyString("DATA0", "D0");
+    Lum_TdmBlock *u2 = top->CreateBlock("u2", 0);
+    u2->CreatePin("A", Orb_Pin::PIN_INPUT)->GetOrbPin()->Connect(signal->GetOrbSignal());
+    u2->CreatePropertyString("TDS_BLOCK_TYPE", "CELLS:NAND");
+    Lum_TdmBlock *u3 = top->CreateBlock("u3", 0);
+    u3->CreatePropertyString("TDS_BLOCK_TYPE",
+                             (std::string(Lum_TlmLibrary::LOCAL_LIBRARY_NAME) + ":LOC").c_str());
+    Lum_TdmBlock *u4 = top->CreateBlock("u4", 0);
+    u4->CreatePin("D0", Orb_Pin::PIN_INPUT);
+    Ora_GraftMgr(false, false).Graft(hier->GetOrbBlock(), u4->GetOrbBlock());
+    u4->CreatePropertyString("TDS_BLOCK_TYPE", "LIBT:REG");
+    design.m_pDesign->CreateView("schematic")->CreateTopBlock("s");
+    design.Model().Save(Path().c_str());
+  }
+  ~FaultDesign() { Lum_TlmCatalog::ClearSearchDirectories(); }
+  FaultDesign(FaultDesign const &) = delete;
+  FaultDesign &operator=(FaultDesign const &) = delete;
+
+  std::string Path() const { return m_Dir.File("fault.odb"); }
+  std::string Scratch(char const *name) const { return m_Dir.File(name); }
+
+  // Gives the model content of its own that a refused open must keep: a
+  // design manager "keep" with a design, a view and a block with a pin.
+  static void AddOwnContent(Lum_TdmModel &model) {
+    Lum_TdmView *view = model.CreateDesignMgr("keep")->CreateDesign("d")->CreateView("v");
+    view->CreateTopBlock("t")->CreatePin("p", Orb_Pin::PIN_INPUT);
+  }
+
+  // The typing a successful open gives, block by block.
+  static std::string Typing(Lum_TdmModel &model) {
+    Lum_TdmView *view =
+        model.GetDesignMgrByName("dm")->GetDesignByName("top")->GetViewByName("netlist");
+    std::string text;
+    Lum_TdmBlock *top = view->GetBlock();
+    for (std::size_t i = 0; i < top->GetBlocks().size(); ++i) {
+      Lum_TdmBlock *block = top->GetBlock(i);
+      text += std::string(block->GetName()) + "=" +
+              (block->GetTypeBlock() ? block->GetTypeBlock()->GetUniqueTag().str() : "-") + "(";
+      for (std::size_t p = 0; p < block->GetPins().size(); ++p) {
+        Lum_TdmPin *pin = block->GetPin(p);
+        text += std::string(p ? "," : "") + pin->GetName() + ">" +
+                (pin->GetTypePin() ? pin->GetTypePin()->GetName() : "-");
+      }
+      text += ") ";
+    }
+    return text;
+  }
+
+private:
+  TempDir m_Dir;
+  TestLibrary m_Libt;
+};
+
+// What a refused open must leave as it was: the host objects, the clients,
+// the companions and the saved bytes of the model.
+struct ModelState {
+  std::size_t hostObjects = 0;
+  std::size_t clients = 0;
+  bool hasLocalLibrary = false;
+  std::string saved;
+
+  bool operator==(ModelState const &other) const {
+    return hostObjects == other.hostObjects && clients == other.clients &&
+           hasLocalLibrary == other.hasLocalLibrary && saved == other.saved;
+  }
+};
+
+inline std::ostream &operator<<(std::ostream &out, ModelState const &state) {
+  return out << state.hostObjects << " host objects, " << state.clients << " clients, "
+             << (state.hasLocalLibrary ? "a" : "no") << " local library, " << state.saved.size()
+             << " bytes saved";
+}
+
+inline ModelState StateOf(Lum_TdmModel &model, std::string const &savePath) {
+  ModelState state;
+  Orb_Model const *host = model.GetOrbModel();
+  for (unsigned k = 0; k < Orb_KindCount; ++k)
+    state.hostObjects += host->GetObjectCount(static_cast<Orb_Kind>(k));
+  state.clients = model.GetClientCount();
+  state.hasLocalLibrary = host->GetCompanion(Lum_TlmNames::kLocalLibraryCompanion) != nullptr;
+  model.Save(savePath.c_str());
+  state.saved = FileBytes(savePath);
+  return state;
+}
+
+} // namespace lumtest
