@@ -60,11 +60,6 @@ std::string Members(Orb_ClientObject const *object, char const *name) {
   return text;
 }
 
-std::string FileBytes(std::string const &path) {
-  std::ifstream in(path, std::ios::binary);
-  return std::string(std::istreambuf_iterator<char>(in), std::istreambuf_iterator<char>());
-}
-
 // What a test design's child block "u1" is stored with.
 struct StoredBlock {
   char const *type;                                          // TDS_BLOCK_TYPE, or null for none
