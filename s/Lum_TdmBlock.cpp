@@ -58,7 +58,7 @@ Client *ClientOf(Orb_Context *context, Orb_BridgeHandle const &bridge, Host *obj
 // until it returns true; returns that child or null. The bridge table is
 // fetched once for the walk.
 template <class Visit> Lum_TdmBlock *FindChild(Lum_TdmBlock const *block, Visit const &visit) {
-  std::vector<Orb_Block *> const &children = block->GetBlocks();
+  auto const children = block->GetBlocks();
   if (children.empty())
     return nullptr;
   Orb_Context *context = block->GetContext();
@@ -73,7 +73,7 @@ template <class Visit> Lum_TdmBlock *FindChild(Lum_TdmBlock const *block, Visit 
 
 // The same over the pins of `block`.
 template <class Visit> Lum_TdmPin *FindPin(Lum_TdmBlock const *block, Visit const &visit) {
-  std::vector<Orb_Pin *> const &pins = block->GetPins();
+  auto const pins = block->GetPins();
   if (pins.empty())
     return nullptr;
   Orb_Context *context = block->GetContext();
@@ -109,7 +109,7 @@ void DiscardGraftedClients(Orb_Block const *block, Orb_Context *context) {
   enter(block);
   while (!stack.empty()) {
     Frame &frame = stack.back();
-    std::vector<Orb_Block *> const &children = frame.block->GetBlocks();
+    auto const children = frame.block->GetBlocks();
     if (frame.nextChild == children.size()) {
       stack.pop_back();
       continue;
@@ -203,7 +203,7 @@ void Lum_TdmBlock::ResolveTypeBlock() {
 
 void Lum_TdmBlock::ReconcilePins(Lum_TlmBlock const *typeBlock) {
   Orb_Context *context = GetContext();
-  std::vector<Orb_Pin *> const &pins = GetOrbBlock()->GetPins();
+  auto const pins = GetOrbBlock()->GetPins();
   Orb_BridgeHandle const bridge = context->GetBridgeHandle(Orb_Kind::Pin);
   auto clientOf = [&](Orb_Pin *pin) {
     Orb_ClientObject *client = bridge[pin->GetBridgeId()];
@@ -405,7 +405,7 @@ void Lum_TdmBlock::SetTypeBlock(Lum_TlmBlock const *typeBlock) {
   // it may have rebound some pins and created others before it threw.
   Orb_Context *context = GetContext();
   Orb_BridgeHandle const bridge = context->GetBridgeHandle(Orb_Kind::Pin);
-  std::vector<Orb_Pin *> const &pins = GetOrbBlock()->GetPins();
+  auto const pins = GetOrbBlock()->GetPins();
   std::vector<std::pair<Orb_Pin *, Lum_TlmPin const *>> before;
   before.reserve(pins.size());
   for (Orb_Pin *pin : pins)
@@ -436,7 +436,7 @@ void Lum_TdmBlock::SetTypeBlock(Lum_TlmBlock const *typeBlock, Lum_TdmTypePinMap
     return;
   Orb_Context *context = GetContext();
   Orb_BridgeHandle const bridge = context->GetBridgeHandle(Orb_Kind::Pin);
-  std::vector<Orb_Pin *> const &pins = GetOrbBlock()->GetPins();
+  auto const pins = GetOrbBlock()->GetPins();
   if (!typeBlock) {
     m_pTypeBlock = nullptr;
     for (Orb_Pin *pin : pins)
@@ -635,7 +635,7 @@ void Lum_TdmBlock::CommitTypeProperties() {
   if (!m_pTypeBlock)
     return;
 
-  std::vector<Orb_Pin *> const &pins = GetOrbBlock()->GetPins();
+  auto const pins = GetOrbBlock()->GetPins();
   if (pins.empty())
     return;
   Orb_Context *context = GetContext();

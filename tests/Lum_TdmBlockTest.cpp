@@ -60,11 +60,6 @@ std::string Members(Orb_ClientObject const *object, char const *name) {
   return text;
 }
 
-std::string FileBytes(std::string const &path) {
-  std::ifstream in(path, std::ios::binary);
-  return std::string(std::istreambuf_iterator<char>(in), std::istreambuf_iterator<char>());
-}
-
 // What a test design's child block "u1" is stored with.
 struct StoredBlock {
   char const *type;                                          // TDS_BLOCK_TYPE, or null for none
@@ -495,13 +490,6 @@ protected:
   Lum_TdmBlock *m_pTop = nullptr;
 };
 
-// The view, its networks, its block tree depth first (pins, signals, then
-// children), then its user design.
-TEST_F(TdmCommitOrderTest, CommitWalksInOrder) {
-  m_pView->CommitAll();
-  EXPECT_EQ(m_Model.m_Commits, "view,N1,N2,T,P1,P2,S1,C1,Q1,C2,design");
-}
-
 // A design with a foreign mark is not committed, and keeps its mark.
 TEST_F(TdmCommitOrderTest, ForeignDesignIsNotCommitted) {
   Lum_TdmDesign *design = m_pView->GetParent();
@@ -511,9 +499,13 @@ TEST_F(TdmCommitOrderTest, ForeignDesignIsNotCommitted) {
   EXPECT_EQ(PropertyValue(design, "TDS_DESIGN_TYPE"), "OTHER");
 }
 
-// Objects whose clients were discarded get new ones, built by the model, and
-// are committed in their places.
-TEST_F(TdmCommitOrderTest, DiscardedClientsAreRebuiltAndCommitted) {
+// The view, its networks, its block tree depth first (pins, signals, then
+// children), then its user design; objects whose clients were discarded get
+// new ones, built by the model, and are committed in their places.
+TEST_F(TdmCommitOrderTest, CommitWalksInOrderRebuildingDiscardedClients) {
+  m_pView->CommitAll();
+  EXPECT_EQ(m_Model.m_Commits, "view,N1,N2,T,P1,P2,S1,C1,Q1,C2,design");
+  m_Model.m_Commits.clear();
   Orb_Block *c1 = m_pTop->GetOrbBlock()->GetBlockByName("C1");
   for (Orb_Persistent *object : std::vector<Orb_Persistent *>{
            c1->GetPins().front(), c1, m_pTop->GetOrbBlock()->GetSignals().front(),
@@ -571,9 +563,6 @@ TEST(TdmPinAlpaSorterTest, EqualNamesAreNotOrdered) {
   EXPECT_FALSE(delegating(first, second));
   EXPECT_FALSE(delegating(second, first));
 }
-
-// ---------------------------------------------------------------------------
-// Dump
 
 // ---------------------------------------------------------------------------
 // Caller operations

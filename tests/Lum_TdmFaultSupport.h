@@ -8,16 +8,9 @@
 #include "Lum_Tlm.h"
 #include "Ora_GraftMgr.h"
 
-#include <fstream>
-#include <iterator>
 #include <string>
 
 namespace lumtest {
-
-inline std::string FileBytes(std::string const &path) {
-  std::ifstream in(path, std::ios::binary);
-  return std::string(std::istreambuf_iterator<char>(in), std::istreambuf_iterator<char>());
-}
 
 // Type libraries and a design database that uses every road of a typed open:
 // the in-memory library LIBT, the library file CELLS on the search path and

@@ -80,24 +80,4 @@ TEST_F(TdmPinTest, CommitWritesNothingForPinsSignalsNetworks) {
   EXPECT_EQ(before, "USER=kept;||");
 }
 
-// The view's commit reaches every network, block, pin and signal, making
-// clients for those that had none.
-TEST_F(TdmPinTest, CommitSpecializesEveryObject) {
-  Lum_TdmBlock *child = m_pTop->CreateBlock("c", 0);
-  child->CreatePin("q", Orb_Pin::PIN_OUTPUT);
-  m_pTop->CreateSignal("s");
-  m_Design.m_pView->CreateNetwork("n");
-  Orb_Model *host = m_Design.Host();
-  for (Orb_Persistent *object : std::vector<Orb_Persistent *>{
-           child->GetOrbBlock()->GetPins().front(), m_pTop->GetOrbBlock()->GetSignals().front(),
-           child->GetOrbBlock()})
-    delete m_Design.Model().GetClient(object);
-
-  m_Design.m_pView->CommitAll();
-  std::size_t objects = 0;
-  for (unsigned k = 0; k < Orb_KindCount; ++k)
-    objects += host->GetObjectCount(static_cast<Orb_Kind>(k));
-  EXPECT_EQ(m_Design.Model().GetClientCount(), objects) << "every host object has its client";
-}
-
 } // namespace

@@ -19,6 +19,8 @@
 
 #include <cstdlib>
 #include <filesystem>
+#include <fstream>
+#include <iterator>
 #include <memory>
 #include <string>
 #include <vector>
@@ -130,6 +132,12 @@ inline std::string ListValue(Orb_ClientObject const *object, char const *name) {
   for (std::string const &entry : property->GetStrings())
     joined += (joined.empty() ? "" : "|") + entry;
   return joined;
+}
+
+// The bytes of a file.
+inline std::string FileBytes(std::string const &path) {
+  std::ifstream in(path, std::ios::binary);
+  return std::string(std::istreambuf_iterator<char>(in), std::istreambuf_iterator<char>());
 }
 
 } // namespace lumtest

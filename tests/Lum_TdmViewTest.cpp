@@ -58,6 +58,13 @@ std::string Names(std::vector<Lum_TlmLibrary const *> const &libraries) {
   return names;
 }
 
+// The names of the libraries a view lists, in order.
+std::string LibNames(Lum_TdmView *view) {
+  std::vector<Lum_TlmLibrary const *> libraries;
+  view->GetLibraries(libraries);
+  return Names(libraries);
+}
+
 unsigned Registrations(char const *name) {
   return Lum_Tlm::pTypeIDRegistry->GetRegistrationCount(name);
 }
@@ -243,9 +250,7 @@ protected:
 TEST_F(TdmViewLibraryTest, AbsentListIsEmpty) {
   View()->DeleteProperty("TDS_DEVICE_PM");
   EXPECT_EQ(View()->GetLibrary("LIBA"), nullptr);
-  std::vector<Lum_TlmLibrary const *> libraries;
-  View()->GetLibraries(libraries);
-  EXPECT_TRUE(libraries.empty());
+  EXPECT_EQ(LibNames(View()), "");
   View()->CommitAll();
   Orb_Property const *written = View()->GetPropertyByName("TDS_VIEW_TYPE_LIBS");
   ASSERT_NE(written, nullptr);
@@ -265,9 +270,7 @@ TEST_F(TdmViewLibraryTest, ListIsReadByNameAndWrittenInFull) {
   view->CommitAll();
   EXPECT_EQ(ListValue(view, "TDS_VIEW_TYPE_LIBS"),
             "LIBA 1.2|LIBB 2.0 fast|LIBC 3.4 rev2|LIBD 7.11 q1 q2");
-  std::vector<Lum_TlmLibrary const *> libraries;
-  view->GetLibraries(libraries);
-  EXPECT_EQ(Names(libraries), "LIBA,LIBB,LIBC,LIBD");
+  EXPECT_EQ(LibNames(view), "LIBA,LIBB,LIBC,LIBD");
 }
 
 // A library listed twice is loaded, registered, written and released twice.
@@ -275,9 +278,7 @@ TEST_F(TdmViewLibraryTest, DuplicateEntryCountsTwice) {
   SetLibs({"LIBA", "LIBA"});
   unsigned const registered = Registrations("LIBA");
   HookedView *view = Reopen();
-  std::vector<Lum_TlmLibrary const *> libraries;
-  view->GetLibraries(libraries);
-  EXPECT_EQ(Names(libraries), "LIBA,LIBA");
+  EXPECT_EQ(LibNames(view), "LIBA,LIBA");
   EXPECT_EQ(Lum_TlmCatalog::GetReferenceCount("LIBA"), 2u);
   EXPECT_EQ(Registrations("LIBA"), registered + 2);
   view->CommitAll();
@@ -317,9 +318,7 @@ TEST_F(TdmViewLibraryTest, AddLocalLibraryAppendsOnce) {
   Lum_TlmLibrary const *local = view->AddLocalLibrary();
   ASSERT_NE(local, nullptr);
   EXPECT_EQ(view->AddLocalLibrary(), local);
-  std::vector<Lum_TlmLibrary const *> libraries;
-  view->GetLibraries(libraries);
-  EXPECT_EQ(Names(libraries), std::string("LIBA,") + Lum_TlmLibrary::LOCAL_LIBRARY_NAME);
+  EXPECT_EQ(LibNames(view), std::string("LIBA,") + Lum_TlmLibrary::LOCAL_LIBRARY_NAME);
 }
 
 // SetLibrary adds and registers a library once; a null library, given or
@@ -340,9 +339,7 @@ TEST_F(TdmViewLibraryTest, NullLibraryIsRefused) {
     EXPECT_EQ(e.GetMessage(), "Null library pointer specified.");
     EXPECT_EQ(e.GetObjectName(), "");
   }
-  std::vector<Lum_TlmLibrary const *> libraries;
-  view->GetLibraries(libraries);
-  EXPECT_EQ(Names(libraries), "LIBB");
+  EXPECT_EQ(LibNames(view), "LIBB");
 }
 
 // GetLibraries keeps what the caller's vector held, appends after it and
@@ -390,10 +387,7 @@ TEST_F(TdmViewLibraryTest, ViewOutlivesItsLibraries) {
   auto doomed = std::make_unique<TestLibrary>("DOOMED", 1, 0);
   SetLibs({"DOOMED", Lum_TlmLibrary::LOCAL_LIBRARY_NAME, "LIBA"});
   HookedView *view = Reopen();
-  std::vector<Lum_TlmLibrary const *> libraries;
-  view->GetLibraries(libraries);
-  EXPECT_EQ(Names(libraries),
-            std::string("DOOMED,") + Lum_TlmLibrary::LOCAL_LIBRARY_NAME + ",LIBA");
+  EXPECT_EQ(LibNames(view), std::string("DOOMED,") + Lum_TlmLibrary::LOCAL_LIBRARY_NAME + ",LIBA");
   doomed.reset();
   m_Reopened.reset();
   EXPECT_EQ(Lum_TlmCatalog::GetReferenceCount("LIBA"), 0u);
@@ -420,9 +414,7 @@ TEST_F(TdmViewLibraryTest, BlankEntriesAreSkipped) {
   SetLibs({"", "  LIBB 2.0", "   "});
   HookedView *view = Reopen();
   Port_MsgCapture capture;
-  std::vector<Lum_TlmLibrary const *> libraries;
-  view->GetLibraries(libraries);
-  EXPECT_EQ(Names(libraries), "LIBB");
+  EXPECT_EQ(LibNames(view), "LIBB");
   EXPECT_EQ(capture.GetReports().size(), 2u);
   view->CommitAll();
   EXPECT_EQ(ListValue(view, "TDS_VIEW_TYPE_LIBS"), "LIBB 2.0 fast");
@@ -523,19 +515,15 @@ TEST(TdmViewSizeTest, ThreeBlocksOfThirtyTwoBytes) {
 }
 
 // A view with no blocks and no networks measures 0 and prints no section.
-TEST(TdmViewSizeTest, EmptyViewHasNoSections) {
-  TypedDesign design;
-  EXPECT_EQ(Measure(design.m_pView), "0 | 0/0 | 0/0 | 0/0 | 0/0");
-  EXPECT_EQ(Report(design.m_pView), kReportRule +
-                                        "Design <top> View <netlist> consumes 0 bytes of memory\n" +
-                                        "  0 specialized objects\n" + kReportRule);
-}
-
 // Pins are counted through their blocks and signals through their networks
 // (a signal in no network is not counted); what is reached without a client
 // gets one, and a second measurement gives the same counters.
 TEST(TdmViewSizeTest, MeasurementReachesEveryObjectOnce) {
   TypedDesign design;
+  EXPECT_EQ(Measure(design.m_pView), "0 | 0/0 | 0/0 | 0/0 | 0/0");
+  EXPECT_EQ(Report(design.m_pView), kReportRule +
+                                        "Design <top> View <netlist> consumes 0 bytes of memory\n" +
+                                        "  0 specialized objects\n" + kReportRule);
   Lum_TdmModel &model = design.Model();
   Lum_TdmBlock *top = design.m_pView->CreateTopBlock("top");
   Orb_Block *child = top->CreateBlock("c1", 0)->GetOrbBlock();
