@@ -33,6 +33,8 @@
 
 #include "Lum_TdmWorkload.h"
 
+#include "Lum_BenchCounters.h"
+
 #include "Lum_TdmBlock.h"
 #include "Lum_TdmModel.h"
 #include "Lum_TdmPin.h"
@@ -62,63 +64,14 @@
 #include <unistd.h>
 #include <vector>
 
-// ---------------------------------------------------------------------------
-// Heap allocations, counted by replacing the global operator new of this
-// program (the libraries' allocations come here too).
-
-namespace {
-std::uint64_t g_Allocations = 0;
-
-void *CountedAlloc(std::size_t size) {
-  ++g_Allocations;
-  if (void *p = std::malloc(size ? size : 1))
-    return p;
-  throw std::bad_alloc();
-}
-} // namespace
-
-void *operator new(std::size_t size) { return CountedAlloc(size); }
-void *operator new[](std::size_t size) { return CountedAlloc(size); }
-void *operator new(std::size_t size, std::nothrow_t const & /*tag*/) noexcept {
-  ++g_Allocations;
-  return std::malloc(size ? size : 1);
-}
-void *operator new[](std::size_t size, std::nothrow_t const & /*tag*/) noexcept {
-  ++g_Allocations;
-  return std::malloc(size ? size : 1);
-}
-void operator delete(void *p) noexcept { std::free(p); }
-void operator delete[](void *p) noexcept { std::free(p); }
-void operator delete(void *p, std::size_t /*size*/) noexcept { std::free(p); }
-void operator delete[](void *p, std::size_t /*size*/) noexcept { std::free(p); }
-
 namespace {
 
 using Clock = std::chrono::steady_clock;
+using Lum_BenchCounters::CpuSeconds;
+using Lum_BenchCounters::g_Allocations;
+using Lum_BenchCounters::HeapBytes;
+using Lum_BenchCounters::ResidentBytes;
 using Lum_TdmWorkload::Library;
-
-std::int64_t ResidentBytes() {
-  long pages = 0;
-  long resident = 0;
-  if (FILE *statm = std::fopen("/proc/self/statm", "r")) {
-    if (std::fscanf(statm, "%ld %ld", &pages, &resident) != 2)
-      resident = 0;
-    std::fclose(statm);
-  }
-  return static_cast<std::int64_t>(resident) * ::sysconf(_SC_PAGESIZE);
-}
-
-std::int64_t HeapBytes() {
-  struct mallinfo2 const info = ::mallinfo2();
-  return static_cast<std::int64_t>(info.uordblks + info.hblkhd);
-}
-
-// CPU time of the process (every thread; the libraries start none).
-double CpuSeconds() {
-  timespec now{};
-  ::clock_gettime(CLOCK_PROCESS_CPUTIME_ID, &now);
-  return static_cast<double>(now.tv_sec) + static_cast<double>(now.tv_nsec) * 1e-9;
-}
 
 // What one run of a phase costs: CPU and wall time, allocations, heap and
 // resident growth.

@@ -24,6 +24,8 @@
 
 #include "Orb_HostWorkload.h"
 
+#include "Lum_BenchCounters.h"
+
 #include "Lum_TdmModel.h"
 #include "Orb_Model.h"
 
@@ -46,85 +48,13 @@
 #include <unistd.h>
 #include <vector>
 
-// ---------------------------------------------------------------------------
-// Heap allocations, counted by replacing the global operator new of this
-// program (the libraries' allocations come here too).
-
-namespace {
-std::uint64_t g_Allocations = 0;
-
-void *CountedAlloc(std::size_t size) {
-  ++g_Allocations;
-  if (void *p = std::malloc(size ? size : 1))
-    return p;
-  throw std::bad_alloc();
-}
-
-void *CountedAlignedAlloc(std::size_t size, std::align_val_t align) {
-  ++g_Allocations;
-  auto const alignment = static_cast<std::size_t>(align);
-  void *p = nullptr;
-  if (::posix_memalign(&p, alignment < sizeof(void *) ? sizeof(void *) : alignment,
-                       size ? size : 1) == 0)
-    return p;
-  throw std::bad_alloc();
-}
-} // namespace
-
-void *operator new(std::size_t size) { return CountedAlloc(size); }
-void *operator new[](std::size_t size) { return CountedAlloc(size); }
-void *operator new(std::size_t size, std::nothrow_t const & /*tag*/) noexcept {
-  ++g_Allocations;
-  return std::malloc(size ? size : 1);
-}
-void *operator new[](std::size_t size, std::nothrow_t const & /*tag*/) noexcept {
-  ++g_Allocations;
-  return std::malloc(size ? size : 1);
-}
-void *operator new(std::size_t size, std::align_val_t align) {
-  return CountedAlignedAlloc(size, align);
-}
-void *operator new[](std::size_t size, std::align_val_t align) {
-  return CountedAlignedAlloc(size, align);
-}
-void operator delete(void *p) noexcept { std::free(p); }
-void operator delete[](void *p) noexcept { std::free(p); }
-void operator delete(void *p, std::size_t /*size*/) noexcept { std::free(p); }
-void operator delete[](void *p, std::size_t /*size*/) noexcept { std::free(p); }
-void operator delete(void *p, std::align_val_t /*align*/) noexcept { std::free(p); }
-void operator delete[](void *p, std::align_val_t /*align*/) noexcept { std::free(p); }
-void operator delete(void *p, std::size_t /*size*/, std::align_val_t /*align*/) noexcept {
-  std::free(p);
-}
-void operator delete[](void *p, std::size_t /*size*/, std::align_val_t /*align*/) noexcept {
-  std::free(p);
-}
-
 namespace {
 
 using Clock = std::chrono::steady_clock;
-
-double CpuSeconds() {
-  timespec now{};
-  ::clock_gettime(CLOCK_PROCESS_CPUTIME_ID, &now);
-  return static_cast<double>(now.tv_sec) + static_cast<double>(now.tv_nsec) * 1e-9;
-}
-
-std::int64_t ResidentBytes() {
-  long pages = 0;
-  long resident = 0;
-  if (FILE *statm = std::fopen("/proc/self/statm", "r")) {
-    if (std::fscanf(statm, "%ld %ld", &pages, &resident) != 2)
-      resident = 0;
-    std::fclose(statm);
-  }
-  return static_cast<std::int64_t>(resident) * ::sysconf(_SC_PAGESIZE);
-}
-
-std::int64_t HeapBytes() {
-  struct mallinfo2 const info = ::mallinfo2();
-  return static_cast<std::int64_t>(info.uordblks + info.hblkhd);
-}
+using Lum_BenchCounters::CpuSeconds;
+using Lum_BenchCounters::g_Allocations;
+using Lum_BenchCounters::HeapBytes;
+using Lum_BenchCounters::ResidentBytes;
 
 // What a phase costs: time, allocations, heap and resident growth.
 class Probe {
