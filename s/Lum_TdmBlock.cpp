@@ -23,6 +23,7 @@
 #include <cstring>
 #include <string>
 #include <string_view>
+#include <type_traits>
 #include <unordered_map>
 #include <unordered_set>
 #include <utility>
@@ -54,36 +55,29 @@ Client *ClientOf(Orb_Context *context, Orb_BridgeHandle const &bridge, Host *obj
   return static_cast<Client *>(client);
 }
 
-// Calls `visit` with each child of `block`, in host order, as its client,
-// until it returns true; returns that child or null. The bridge table is
-// fetched once for the walk.
-template <class Visit> Lum_TdmBlock *FindChild(Lum_TdmBlock const *block, Visit const &visit) {
-  auto const children = block->GetBlocks();
-  if (children.empty())
+// Calls `visit` with each host object of `objects` (a block's children or
+// pins, in host order) as its client, until it returns true; returns that
+// client or null. The bridge table is fetched once for the walk.
+template <class Client, class Range, class Visit>
+Client *FindClient(Orb_Context *context, Range const &objects, Visit const &visit) {
+  if (objects.empty())
     return nullptr;
-  Orb_Context *context = block->GetContext();
-  Orb_BridgeHandle const bridge = context->GetBridgeHandle(Orb_Kind::Block);
-  for (std::size_t i = 0; i < children.size(); ++i) {
-    Lum_TdmBlock *child = ClientOf<Lum_TdmBlock>(context, bridge, children[i]);
-    if (visit(child))
-      return child;
+  using Host = std::remove_pointer_t<typename Range::value_type>;
+  Orb_BridgeHandle const bridge = context->GetBridgeHandle(Host::kKind);
+  for (std::size_t i = 0; i < objects.size(); ++i) {
+    Client *client = ClientOf<Client>(context, bridge, objects[i]);
+    if (visit(client))
+      return client;
   }
   return nullptr;
 }
 
-// The same over the pins of `block`.
+template <class Visit> Lum_TdmBlock *FindChild(Lum_TdmBlock const *block, Visit const &visit) {
+  return FindClient<Lum_TdmBlock>(block->GetContext(), block->GetBlocks(), visit);
+}
+
 template <class Visit> Lum_TdmPin *FindPin(Lum_TdmBlock const *block, Visit const &visit) {
-  auto const pins = block->GetPins();
-  if (pins.empty())
-    return nullptr;
-  Orb_Context *context = block->GetContext();
-  Orb_BridgeHandle const bridge = context->GetBridgeHandle(Orb_Kind::Pin);
-  for (std::size_t i = 0; i < pins.size(); ++i) {
-    Lum_TdmPin *pin = ClientOf<Lum_TdmPin>(context, bridge, pins[i]);
-    if (visit(pin))
-      return pin;
-  }
-  return nullptr;
+  return FindClient<Lum_TdmPin>(block->GetContext(), block->GetPins(), visit);
 }
 
 // Destroys the clients that `context` holds for what a graft put under
