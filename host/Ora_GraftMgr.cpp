@@ -57,7 +57,7 @@ std::string PathPrefix(Orb_Block const *block) {
 // A network of its own for the copies of one source network, named after the
 // destination and the source network, made unique in the view.
 Orb_Network *CopyNetwork(GraftRun &run, Orb_Network const *network, Orb_View *view) {
-  std::string const base = run.networkPrefix + network->GetNameString();
+  std::string const base = run.networkPrefix + network->GetName();
   std::string name = base;
   for (unsigned n = 1; view->GetNetworkByName(name.c_str()); ++n)
     name = base + "_" + std::to_string(n);

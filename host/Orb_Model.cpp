@@ -44,7 +44,7 @@ void CheckNotDying(Orb_Persistent const *parent, char const *kind, char const *n
 
 // A pin's or signal's place, as "top/u1/name".
 std::string PathOf(Orb_Persistent const *object) {
-  std::string path = object->GetNameString();
+  std::string path(object->GetNameString());
   for (Orb_Persistent const *p = object->GetParentObject(); p && p->GetKind() == Orb_Kind::Block;
        p = p->GetParentObject())
     path.insert(0, 1, '/').insert(0, p->GetNameString());
@@ -89,14 +89,14 @@ char const *Orb_PinDirectionName(Orb_Pin::PIN_DIRECTION direction) {
 // Objects
 
 Orb_Persistent::Orb_Persistent(Orb_Model *model, Orb_Kind kind, Orb_Persistent *parent,
-                               std::string name)
-    : m_Name(std::move(name)), m_pModel(model), m_pParent(parent), m_BridgeId(0),
-      m_Kind(static_cast<std::uint8_t>(kind)) {}
+                               std::string_view name)
+    : m_pParent(parent), m_Kind(static_cast<std::uint8_t>(kind)) {
+  m_LongName = m_Name.Set(model->m_Names, name);
+}
 
-Orb_Persistent::~Orb_Persistent() = default;
-
-Orb_Pin::Orb_Pin(Orb_Model *model, Orb_Block *parent, std::string name, PIN_DIRECTION direction)
-    : Orb_Persistent(model, Orb_Kind::Pin, parent, std::move(name)), m_Direction(direction) {}
+Orb_Pin::Orb_Pin(Orb_Model *model, Orb_Block *parent, std::string_view name,
+                 PIN_DIRECTION direction)
+    : Orb_Persistent(model, Orb_Kind::Pin, parent, name), m_Direction(direction) {}
 
 Orb_Block *Orb_Pin::GetParent() const { return static_cast<Orb_Block *>(GetParentObject()); }
 
@@ -142,13 +142,13 @@ void Orb_Pin::Unlink(Orb_Signal *&side) noexcept {
   side = nullptr;
 }
 
-Orb_Signal::Orb_Signal(Orb_Model *model, Orb_Block *parent, std::string name)
-    : Orb_Persistent(model, Orb_Kind::Signal, parent, std::move(name)) {}
+Orb_Signal::Orb_Signal(Orb_Model *model, Orb_Block *parent, std::string_view name)
+    : Orb_Persistent(model, Orb_Kind::Signal, parent, name) {}
 
 Orb_Block *Orb_Signal::GetParent() const { return static_cast<Orb_Block *>(GetParentObject()); }
 
-Orb_Network::Orb_Network(Orb_Model *model, Orb_View *parent, std::string name)
-    : Orb_Persistent(model, Orb_Kind::Network, parent, std::move(name)) {}
+Orb_Network::Orb_Network(Orb_Model *model, Orb_View *parent, std::string_view name)
+    : Orb_Persistent(model, Orb_Kind::Network, parent, name) {}
 
 Orb_View *Orb_Network::GetParent() const { return static_cast<Orb_View *>(GetParentObject()); }
 
@@ -171,8 +171,9 @@ void Orb_Network::RemoveSignal(Orb_Signal *signal) {
   signal->m_pNetwork = nullptr;
 }
 
-Orb_Block::Orb_Block(Orb_Model *model, Orb_Persistent *parent, Orb_View *view, std::string name)
-    : Orb_Persistent(model, Orb_Kind::Block, parent, std::move(name)), m_pView(view) {}
+Orb_Block::Orb_Block(Orb_Model *model, Orb_Persistent *parent, Orb_View *view,
+                     std::string_view name)
+    : Orb_Persistent(model, Orb_Kind::Block, parent, name), m_pView(view) {}
 
 Orb_Block *Orb_Block::GetParent() const {
   Orb_Persistent *parent = GetParentObject();
@@ -230,8 +231,8 @@ void Orb_Block::SortPins(Orb_SortFtor<Orb_Pin> const &ftor) {
   m_Pins.StableSort([&ftor](Orb_Pin const *a, Orb_Pin const *b) { return ftor(a, b); });
 }
 
-Orb_View::Orb_View(Orb_Model *model, Orb_Design *parent, std::string name)
-    : Orb_Persistent(model, Orb_Kind::View, parent, std::move(name)) {}
+Orb_View::Orb_View(Orb_Model *model, Orb_Design *parent, std::string_view name)
+    : Orb_Persistent(model, Orb_Kind::View, parent, name) {}
 
 Orb_Design *Orb_View::GetParent() const { return static_cast<Orb_Design *>(GetParentObject()); }
 
@@ -259,8 +260,8 @@ void Orb_View::DeleteNetwork(Orb_Network *network) {
   GetModel()->Delete(network);
 }
 
-Orb_Design::Orb_Design(Orb_Model *model, Orb_DesignMgr *parent, std::string name)
-    : Orb_Persistent(model, Orb_Kind::Design, parent, std::move(name)) {}
+Orb_Design::Orb_Design(Orb_Model *model, Orb_DesignMgr *parent, std::string_view name)
+    : Orb_Persistent(model, Orb_Kind::Design, parent, name) {}
 
 Orb_DesignMgr *Orb_Design::GetParent() const {
   return static_cast<Orb_DesignMgr *>(GetParentObject());
@@ -277,8 +278,8 @@ void Orb_Design::DeleteView(Orb_View *view) {
   GetModel()->Delete(view);
 }
 
-Orb_DesignMgr::Orb_DesignMgr(Orb_Model *model, std::string name)
-    : Orb_Persistent(model, Orb_Kind::DesignMgr, nullptr, std::move(name)) {}
+Orb_DesignMgr::Orb_DesignMgr(Orb_Model *model, std::string_view name)
+    : Orb_Persistent(model, Orb_Kind::DesignMgr, nullptr, name) {}
 
 Orb_Design *Orb_DesignMgr::CreateDesign(char const *name) {
   CheckName(name, "design");
@@ -305,7 +306,7 @@ Orb_Model::Orb_Model(char const *name, char const *dbName, char const *path, boo
       sizeof(Orb_DesignMgr), sizeof(Orb_Design), sizeof(Orb_View),   sizeof(Orb_Block),
       sizeof(Orb_Pin),       sizeof(Orb_Signal), sizeof(Orb_Network)};
   for (unsigned k = 0; k < Orb_KindCount; ++k)
-    m_Pools[k].SetSlotSize(sizes[k]);
+    m_Pools[k].SetSlotSize(sizes[k], this);
 }
 
 Orb_Model::~Orb_Model() {
@@ -411,7 +412,32 @@ std::size_t Orb_Model::GetObjectCount(Orb_Kind kind) const {
 void Orb_Model::Destroy(Orb_Persistent *object) noexcept {
   auto const k = static_cast<unsigned>(object->GetKind());
   unsigned const id = object->m_BridgeId;
-  object->~Orb_Persistent();
+  // The whole table goes with the model.
+  if (object->m_LongName && !m_TearingDown)
+    m_Names.Release(object->m_Name.entry);
+  switch (object->GetKind()) {
+  case Orb_Kind::DesignMgr:
+    static_cast<Orb_DesignMgr *>(object)->~Orb_DesignMgr();
+    break;
+  case Orb_Kind::Design:
+    static_cast<Orb_Design *>(object)->~Orb_Design();
+    break;
+  case Orb_Kind::View:
+    static_cast<Orb_View *>(object)->~Orb_View();
+    break;
+  case Orb_Kind::Block:
+    static_cast<Orb_Block *>(object)->~Orb_Block();
+    break;
+  case Orb_Kind::Pin:
+    static_cast<Orb_Pin *>(object)->~Orb_Pin();
+    break;
+  case Orb_Kind::Signal:
+    static_cast<Orb_Signal *>(object)->~Orb_Signal();
+    break;
+  case Orb_Kind::Network:
+    static_cast<Orb_Network *>(object)->~Orb_Network();
+    break;
+  }
   --m_ObjectCount[k];
   if (!m_TearingDown)
     m_Pools[k].Release(object, id);
@@ -439,7 +465,7 @@ template <class T> T *Orb_Model::Adopt(T *object, char const *kind) {
     throw;
   }
   if (!linked) {
-    std::string const name = object->GetNameString();
+    std::string const name(object->GetNameString());
     Orb_Persistent *parent = object->GetParentObject();
     Destroy(object);
     ThrowDuplicate(parent, kind, name.c_str());
@@ -662,9 +688,9 @@ void Orb_Model::Free(Orb_Persistent *object, bool keepLinks) noexcept {
 // Dump
 
 void Orb_Persistent::DebugDump(Port::Stream *stream, int indent) const {
-  Orb_Debug::Printf(stream, indent, "%s <%s>\n", Orb_KindName(GetKind()), m_Name.c_str());
+  Orb_Debug::Printf(stream, indent, "%s <%s>\n", Orb_KindName(GetKind()), GetName());
   DumpProperties(stream, indent + 1);
-  for (Orb_ModelDerived *context : m_pModel->GetContexts())
+  for (Orb_ModelDerived *context : GetModel()->GetContexts())
     if (Orb_ClientObject *client = context->GetClient(this))
       client->DebugDumpCallback(stream, indent + 1);
 }
@@ -674,14 +700,35 @@ void Orb_Persistent::DebugDump(Port::Stream *stream, int indent) const {
 
 Orb_ObjectPool::~Orb_ObjectPool() {
   for (void *chunk : m_Chunks)
-    ::operator delete(chunk);
+    ::operator delete(chunk, std::align_val_t(kPageBytes));
 }
 
-void Orb_ObjectPool::SetSlotSize(std::size_t size) {
+void Orb_ObjectPool::SetSlotSize(std::size_t size, void *owner) {
   assert(m_Chunks.empty() && "Orb_ObjectPool::SetSlotSize after the first allocation");
+  assert(size <= kMaxSlotSize && "Orb_ObjectPool: slot larger than a page");
   // Host objects hold pointers and integers: pointer alignment is enough.
   std::size_t const align = alignof(void *);
   m_SlotSize = (std::max(size, sizeof(FreeSlot)) + align - 1) / align * align;
+  m_pOwner = owner;
+}
+
+void Orb_ObjectPool::NextPage() {
+  if (m_pPageEnd == m_pChunkEnd) {
+    std::size_t const bytes = m_NextChunkPages * kPageBytes;
+    m_Chunks.reserve(m_Chunks.size() + 1);
+    auto *chunk = static_cast<unsigned char *>(::operator new(bytes, std::align_val_t(kPageBytes)));
+    m_Chunks.push_back(chunk);
+    m_pPageEnd = chunk;
+    m_pChunkEnd = chunk + bytes;
+    m_Bytes += bytes;
+    // Chunks double up to a megabyte: small models stay small.
+    if (bytes < (std::size_t(1) << 20))
+      m_NextChunkPages *= 2;
+  }
+  unsigned char *page = m_pPageEnd;
+  *reinterpret_cast<void **>(page) = m_pOwner;
+  m_pNext = page + kPageHeader;
+  m_pPageEnd = page + kPageBytes;
 }
 
 void *Orb_ObjectPool::Allocate(unsigned &id) {
@@ -691,18 +738,8 @@ void *Orb_ObjectPool::Allocate(unsigned &id) {
     id = slot->id;
     return slot;
   }
-  if (m_pNext == m_pEnd) {
-    std::size_t const bytes = m_NextChunkSlots * m_SlotSize;
-    m_Chunks.reserve(m_Chunks.size() + 1);
-    auto *chunk = static_cast<unsigned char *>(::operator new(bytes));
-    m_Chunks.push_back(chunk);
-    m_pNext = chunk;
-    m_pEnd = chunk + bytes;
-    m_Bytes += bytes;
-    // Chunks double up to about a megabyte: small models stay small.
-    if (bytes < (std::size_t(1) << 20))
-      m_NextChunkSlots *= 2;
-  }
+  if (static_cast<std::size_t>(m_pPageEnd - m_pNext) < m_SlotSize)
+    NextPage();
   void *slot = m_pNext;
   m_pNext += m_SlotSize;
   id = m_NextId++;

@@ -5,6 +5,7 @@
 // Orb_Model. Clients attach through Orb_ModelDerived (Orb_Derived.h).
 
 #include "Orb_List.h"
+#include "Orb_Name.h"
 #include "Orb_Pool.h"
 #include "Orb_Property.h"
 
@@ -45,17 +46,19 @@ LUM_PLATFORM_API char const *Orb_KindName(Orb_Kind kind);
 // walk of a block tree; creating, grafting or reading a deeper block fails.
 constexpr unsigned Orb_MaxBlockDepth = 1000;
 
-// Base of every host object: name, kind, parent, owning model, bridge id and
-// properties. Host objects are made and freed by their owners only.
+// Base of every host object: name, kind, parent, bridge id and properties.
+// Host objects are made and freed by their owners only, in their model's
+// pools (Orb_ObjectPool), which also know the model an object belongs to.
+// No virtual functions: the model destroys an object through its kind.
 class LUM_PLATFORM_API Orb_Persistent : public Orb_PropertyHolder {
 public:
   Orb_Persistent(Orb_Persistent const &) = delete;
   Orb_Persistent &operator=(Orb_Persistent const &) = delete;
 
-  char const *GetName() const { return m_Name.c_str(); }
-  std::string const &GetNameString() const { return m_Name; }
+  char const *GetName() const { return m_Name.CStr(m_LongName); }
+  std::string_view GetNameString() const { return m_Name.View(m_LongName); }
   Orb_Kind GetKind() const { return static_cast<Orb_Kind>(m_Kind); }
-  Orb_Model *GetModel() const { return m_pModel; }
+  Orb_Model *GetModel() const { return Orb_ObjectPool::ModelOf<Orb_Model>(this); }
   Orb_Persistent *GetParentObject() const { return m_pParent; }
   unsigned GetBridgeId() const { return m_BridgeId; }
   // Whether a deletion under way holds the object: its delete events have
@@ -67,22 +70,24 @@ public:
   void DebugDump(Port::Stream *stream, int indent) const;
 
 protected:
-  Orb_Persistent(Orb_Model *model, Orb_Kind kind, Orb_Persistent *parent, std::string name);
-  virtual ~Orb_Persistent();
+  Orb_Persistent(Orb_Model *model, Orb_Kind kind, Orb_Persistent *parent, std::string_view name);
+  // The name is given back by Orb_Model::Destroy, which knows whether the
+  // whole model is going.
+  ~Orb_Persistent() = default;
 
 private:
   friend class Orb_Model;
   friend struct Orb_ChildSlot;
-  std::string m_Name;
-  Orb_Model *m_pModel;
+  Orb_Name m_Name;
   Orb_Persistent *m_pParent;
-  unsigned m_BridgeId;
+  unsigned m_BridgeId = 0;
   // The object's slot in its parent's container (Orb_List).
   std::uint32_t m_Slot = 0;
-  // The kind and the deletion marks share the word the kind alone took.
   std::uint8_t m_Kind;
+  bool m_LongName = false;
   bool m_Dying = false;
   bool m_DeleteFired = false;
+  // The rest of the last word is free for a derived class's small fields.
 };
 
 // Where a host object keeps its slot in its parent's container.
@@ -207,11 +212,12 @@ private:
   friend class Orb_ModelIO;
   friend class Orb_Block;
   friend struct Orb_ConnectionSlot;
-  Orb_Pin(Orb_Model *model, Orb_Block *parent, std::string name, PIN_DIRECTION direction);
+  Orb_Pin(Orb_Model *model, Orb_Block *parent, std::string_view name, PIN_DIRECTION direction);
   // Points `side` (m_pSignal or m_pInnerSignal) at `signal`, keeping the
   // signals' pin lists in step.
   void Link(Orb_Signal *&side, Orb_Signal *signal);
   void Unlink(Orb_Signal *&side) noexcept;
+  // In the base's last word.
   PIN_DIRECTION m_Direction;
   Orb_Signal *m_pSignal = nullptr;
   Orb_Signal *m_pInnerSignal = nullptr;
@@ -242,10 +248,10 @@ private:
   friend class Orb_Network;
   friend struct Orb_ConnectionSlot;
   friend struct Orb_NetworkSlot;
-  Orb_Signal(Orb_Model *model, Orb_Block *parent, std::string name);
-  Orb_Network *m_pNetwork = nullptr;
-  // The signal's slot in its network's list.
+  Orb_Signal(Orb_Model *model, Orb_Block *parent, std::string_view name);
+  // The signal's slot in its network's list (in the base's last word).
   std::uint32_t m_NetworkSlot = 0;
+  Orb_Network *m_pNetwork = nullptr;
   Orb_List<Orb_Pin, Orb_ConnectionSlot> m_Pins;
 };
 
@@ -275,7 +281,7 @@ private:
   friend class Orb_Model;
   friend class Orb_ModelIO;
   friend class Orb_View;
-  Orb_Network(Orb_Model *model, Orb_View *parent, std::string name);
+  Orb_Network(Orb_Model *model, Orb_View *parent, std::string_view name);
   Orb_List<Orb_Signal, Orb_NetworkSlot> m_Signals;
 };
 
@@ -323,7 +329,7 @@ private:
   friend class Orb_Model;
   friend class Orb_ModelIO;
   friend class Orb_View;
-  Orb_Block(Orb_Model *model, Orb_Persistent *parent, Orb_View *view, std::string name);
+  Orb_Block(Orb_Model *model, Orb_Persistent *parent, Orb_View *view, std::string_view name);
   Orb_View *m_pView;
   Orb_NamedList<Orb_Block> m_Blocks;
   Orb_NamedList<Orb_Pin> m_Pins;
@@ -350,7 +356,7 @@ private:
   friend class Orb_Model;
   friend class Orb_ModelIO;
   friend class Orb_Design;
-  Orb_View(Orb_Model *model, Orb_Design *parent, std::string name);
+  Orb_View(Orb_Model *model, Orb_Design *parent, std::string_view name);
   Orb_Block *m_pTopBlock = nullptr;
   Orb_NamedList<Orb_Network> m_Networks;
 };
@@ -369,7 +375,7 @@ private:
   friend class Orb_Model;
   friend class Orb_ModelIO;
   friend class Orb_DesignMgr;
-  Orb_Design(Orb_Model *model, Orb_DesignMgr *parent, std::string name);
+  Orb_Design(Orb_Model *model, Orb_DesignMgr *parent, std::string_view name);
   Orb_NamedList<Orb_View> m_Views;
 };
 
@@ -385,9 +391,19 @@ public:
 private:
   friend class Orb_Model;
   friend class Orb_ModelIO;
-  Orb_DesignMgr(Orb_Model *model, std::string name);
+  Orb_DesignMgr(Orb_Model *model, std::string_view name);
   Orb_NamedList<Orb_Design> m_Designs;
 };
+
+// The object as a T (Orb_Block, Orb_Pin, ...) if it is of T's kind, else
+// null (also for null): host objects have no virtual functions, so this
+// stands in for dynamic_cast.
+template <class T> T *Orb_Cast(Orb_Persistent *object) {
+  return object && object->GetKind() == T::kKind ? static_cast<T *>(object) : nullptr;
+}
+template <class T> T const *Orb_Cast(Orb_Persistent const *object) {
+  return object && object->GetKind() == T::kKind ? static_cast<T const *>(object) : nullptr;
+}
 
 // Calls `visit` on each object that `object` owns directly, in host order: a
 // design manager's designs, a design's views, a view's networks and then its
@@ -594,6 +610,8 @@ private:
   std::vector<Orb_ModelDerived *> m_Contexts;
   std::vector<Orb_ModelDerived *> m_Subscribers;
   Orb_ObjectPool m_Pools[Orb_KindCount];
+  // Long object names, shared (Orb_Name.h).
+  Orb_NameTable m_Names;
   bool m_TearingDown = false;
   std::size_t m_ObjectCount[Orb_KindCount] = {};
   std::map<std::string, std::unique_ptr<Orb_ModelCompanion>> m_Companions;

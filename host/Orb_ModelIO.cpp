@@ -716,7 +716,7 @@ void Orb_ModelIO::Place(Orb_Persistent *object, char const *kind) const {
   }
   if (linked)
     return;
-  std::string const name = object->GetNameString();
+  std::string const name(object->GetNameString());
   Orb_Persistent const *parent = object->GetParentObject();
   model->Free(object);
   Duplicate(kind, name, parent);

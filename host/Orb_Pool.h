@@ -5,6 +5,10 @@
 // freed at once with the pool. Each slot has a number, its bridge id, which
 // goes with the slot when it is reused, so that bridge ids stay dense under
 // create/delete churn and deleting needs no bookkeeping beyond one link.
+//
+// Chunks are made of aligned pages, and each page starts with its pool's
+// owner (the model): an object finds its model from its own address, so no
+// object spends a pointer on it.
 
 #include "Lum_PlatformApi.h"
 
@@ -14,13 +18,18 @@
 
 class LUM_PLATFORM_API Orb_ObjectPool {
 public:
+  static constexpr std::size_t kPageBytes = 4096;
+  static constexpr std::size_t kPageHeader = sizeof(void *);
+  static constexpr std::size_t kMaxSlotSize = kPageBytes - kPageHeader;
+
   Orb_ObjectPool() = default;
   Orb_ObjectPool(Orb_ObjectPool const &) = delete;
   Orb_ObjectPool &operator=(Orb_ObjectPool const &) = delete;
   ~Orb_ObjectPool();
 
-  // Sets the slot size, before the first Allocate.
-  void SetSlotSize(std::size_t size);
+  // Sets the slot size (at most kMaxSlotSize) and the owner that every slot
+  // reports, before the first Allocate.
+  void SetSlotSize(std::size_t size, void *owner);
   // Memory for one object and its number. Throws std::bad_alloc.
   void *Allocate(unsigned &id);
   // Gives a slot back for reuse; its object must be destroyed already.
@@ -30,20 +39,31 @@ public:
   // Bytes held in chunks.
   std::size_t Bytes() const { return m_Bytes; }
 
+  // The owner of the pool that holds the object at `slot` (any address
+  // inside a slot will do).
+  template <class Owner> static Owner *ModelOf(void const *slot) {
+    auto const page = reinterpret_cast<std::uintptr_t>(slot) & ~(kPageBytes - 1);
+    return *reinterpret_cast<Owner *const *>(page); // NOLINT(performance-no-int-to-ptr)
+  }
+
 private:
   // A released slot holds the next released slot and its own number.
   struct FreeSlot {
     FreeSlot *next;
     unsigned id;
   };
+  // Starts the next page, taking a new chunk when the current one is used up.
+  void NextPage();
 
   std::size_t m_SlotSize = sizeof(FreeSlot);
+  void *m_pOwner = nullptr;
   std::vector<void *> m_Chunks;
   unsigned char *m_pNext = nullptr;
-  unsigned char *m_pEnd = nullptr;
+  unsigned char *m_pPageEnd = nullptr;
+  unsigned char *m_pChunkEnd = nullptr;
   FreeSlot *m_pFree = nullptr;
   unsigned m_NextId = 0;
-  std::size_t m_NextChunkSlots = 8;
+  std::size_t m_NextChunkPages = 1;
   std::size_t m_Bytes = 0;
 };
 

@@ -17,7 +17,7 @@ char const kRevision[] = "$Revision: 1.1 $";
 
 // The name of a design pin handed to the map; a null pin is the caller's
 // error, reported rather than dereferenced.
-std::string const &DesignPinName(Lum_TdmPin const *designPin, int line) {
+std::string_view DesignPinName(Lum_TdmPin const *designPin, int line) {
   if (!designPin)
     throw Lum_ExceptionInvalidTypeBlock("Lum", kSourcePath, kRevision, line, "",
                                         "Null design pin specified for a type pin map.", false);
@@ -44,7 +44,7 @@ void Lum_TdmTypePinMap::SetPinMap(Port::StringBase<char> name, Lum_TlmPin const 
 }
 
 void Lum_TdmTypePinMap::SetPinMap(Lum_TdmPin const *designPin, Lum_TlmPin const *typePin) {
-  SetPinMap(Port::StringBase<char>(DesignPinName(designPin, __LINE__)), typePin);
+  SetPinMap(Port::StringBase<char>(std::string(DesignPinName(designPin, __LINE__))), typePin);
 }
 
 Lum_TlmPin const *Lum_TdmTypePinMap::Find(std::string_view name) const {

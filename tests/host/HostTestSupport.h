@@ -117,7 +117,7 @@ public:
   RecClient(RecModel *model, Host *object, bool create)
       : Base(model, object), m_pLog(model->log), m_Created(create) {
     // Thrown after the host base registered the client, which must undo that.
-    model->ThrowIfRefused(object->GetNameString());
+    model->ThrowIfRefused(std::string(object->GetNameString()));
   }
   ~RecClient() override { m_pLog->push_back("~" + Describe(this->GetOrbObject())); }
 
@@ -155,7 +155,7 @@ inline std::size_t ObjectCount(Orb_Model const &model) {
 template <class Objects> std::string Names(Objects const &objects) {
   std::string text;
   for (auto const *object : objects)
-    text += (text.empty() ? "" : " ") + object->GetNameString();
+    text += (text.empty() ? "" : " ") + std::string(object->GetNameString());
   return text;
 }
 
@@ -193,28 +193,28 @@ inline std::string Dump(Orb_Persistent const *object, std::size_t depth = 0) {
   auto add = [&children](auto const &items) {
     children.insert(children.end(), items.begin(), items.end());
   };
-  if (auto const *designMgr = dynamic_cast<Orb_DesignMgr const *>(object))
+  if (auto const *designMgr = Orb_Cast<Orb_DesignMgr>(object))
     add(designMgr->GetDesigns());
-  if (auto const *design = dynamic_cast<Orb_Design const *>(object))
+  if (auto const *design = Orb_Cast<Orb_Design>(object))
     add(design->GetViews());
-  if (auto const *view = dynamic_cast<Orb_View const *>(object)) {
+  if (auto const *view = Orb_Cast<Orb_View>(object)) {
     if (view->GetBlock())
       children.push_back(view->GetBlock());
     add(view->GetNetworks());
   }
-  if (auto const *block = dynamic_cast<Orb_Block const *>(object)) {
+  if (auto const *block = Orb_Cast<Orb_Block>(object)) {
     add(block->GetPins());
     add(block->GetSignals());
     add(block->GetBlocks());
   }
-  if (auto const *pin = dynamic_cast<Orb_Pin const *>(object))
+  if (auto const *pin = Orb_Cast<Orb_Pin>(object))
     out += std::string(" ") + Orb_PinDirectionName(pin->GetDirection()) +
            (pin->GetSignal() ? " -> " + PathIn(pin->GetSignal()) : "") +
            (pin->GetInnerSignal() ? " => " + PathIn(pin->GetInnerSignal()) : "");
-  if (auto const *signal = dynamic_cast<Orb_Signal const *>(object))
+  if (auto const *signal = Orb_Cast<Orb_Signal>(object))
     for (Orb_Pin const *pin : signal->GetPins())
       out += " <- " + PathIn(pin);
-  if (auto const *network = dynamic_cast<Orb_Network const *>(object))
+  if (auto const *network = Orb_Cast<Orb_Network>(object))
     for (Orb_Signal const *signal : network->GetSignals())
       out += " " + PathIn(signal);
   out += "\n";

@@ -441,7 +441,7 @@ TEST_F(HostModelTest, ConnectionsLeaveInOrder) {
   top->DeleteBlock(pins[3]->GetParent());
   std::vector<std::string> parents;
   for (Orb_Pin *pin : s->GetPins())
-    parents.push_back(pin->GetParent()->GetNameString() + "." + pin->GetNameString());
+    parents.push_back(std::string(pin->GetParent()->GetName()) + "." + pin->GetName());
   EXPECT_EQ(Joined(parents, " "), "c.cp k0.x k2.x k4.x k5.x top.q");
   pins[1]->Connect(s);
   EXPECT_EQ(s->GetPins().back(), pins[1]) << "a reconnected pin goes last";
