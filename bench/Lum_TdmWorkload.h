@@ -109,7 +109,7 @@ inline void Wire(Orb_Block *top) {
     chain = top->CreateSignal(("c" + index).c_str());
     pins[5]->Connect(chain);
     for (int p : {1, 2, 3, 4, 6, 7}) {
-      name = "n" + index + "_" + pins[static_cast<std::size_t>(p)]->GetNameString();
+      name = "n" + index + "_" + pins[static_cast<std::size_t>(p)]->GetName();
       pins[static_cast<std::size_t>(p)]->Connect(top->CreateSignal(name.c_str()));
     }
   }

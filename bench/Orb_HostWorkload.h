@@ -63,7 +63,7 @@ inline void Build(Orb_Model &model, std::int64_t blocks) {
     chain = top->CreateSignal(("c" + index).c_str());
     pins[5]->Connect(chain);
     for (int p : {1, 2, 3, 4, 6, 7}) {
-      name = "n" + index + "_" + pins[p]->GetNameString();
+      name = "n" + index + "_" + pins[p]->GetName();
       pins[p]->Connect(top->CreateSignal(name.c_str()));
     }
   }
