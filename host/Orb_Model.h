@@ -528,6 +528,9 @@ public:
 
   // Counts of live host objects by kind (for tests and reports).
   std::size_t GetObjectCount(Orb_Kind kind) const;
+  // Distinct long names (over 7 bytes) held by the model's objects, each
+  // stored once (for tests and reports).
+  std::size_t GetSharedNameCount() const { return m_Names.Size(); }
 
   // Deletes any host object with its subtree: fires the delete events,
   // children before parents, takes the object out of its parent and frees

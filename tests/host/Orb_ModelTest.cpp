@@ -462,13 +462,51 @@ namespace {
 
 // Creating and deleting blocks over and over reuses the freed slots of each
 // kind: bridge ids (slot numbers) stay as few as the objects alive at once.
+// Names over 7 bytes are stored once per model: two pins of that name share it, lookups and
+// saves see each whole, and a name goes with the last object holding it.
+TEST_F(HostModelTest, LongNamesAreSharedAndGoWithTheirLastHolder) {
+  std::size_t const before = host->GetSharedNameCount();
+  std::string const longest(300, 'q');
+  Orb_Block *a = top->CreateBlock("seven77");
+  Orb_Block *b = top->CreateBlock(longest.c_str());
+  Orb_Pin *pa = a->CreatePin("DATA_IN_0", Orb_Pin::PIN_INPUT);
+  Orb_Pin *pb = b->CreatePin("DATA_IN_0", Orb_Pin::PIN_INPUT);
+  EXPECT_EQ(pa->GetName(), pb->GetName()); // one copy
+  EXPECT_EQ(host->GetSharedNameCount(), before + 2);
+  EXPECT_EQ(b->GetNameString(), longest);
+  EXPECT_EQ(a->GetNameString(), "seven77");
+  EXPECT_EQ(top->GetBlockByName(longest.c_str()), b);
+  EXPECT_EQ(b->GetPinByName("DATA_IN_0"), pb);
+  EXPECT_EQ(b->GetPinByName("DATA_IN_"), nullptr);
+
+  auto path = std::filesystem::temp_directory_path() / "orb_long_names.odb";
+  host->Save(path.string().c_str());
+  Orb_Model reopened("r", "r", "", false);
+  reopened.Open(path.string().c_str());
+  std::filesystem::remove(path);
+  Orb_Block *top2 =
+      reopened.GetDesignMgrByName("dm")->GetDesignByName("d")->GetViewByName("v")->GetBlock();
+  ASSERT_NE(top2->GetBlockByName(longest.c_str()), nullptr);
+  EXPECT_EQ(top2->GetBlockByName(longest.c_str())->GetPinByName("DATA_IN_0")->GetName(),
+            top2->GetBlockByName("seven77")->GetPinByName("DATA_IN_0")->GetName());
+
+  top->DeleteBlock(a);
+  EXPECT_EQ(pb->GetNameString(), "DATA_IN_0");
+  EXPECT_EQ(host->GetSharedNameCount(), before + 2);
+  top->DeleteBlock(b);
+  EXPECT_EQ(host->GetSharedNameCount(), before);
+}
+
 TEST_F(HostModelTest, ChurnReusesSlots) {
+  std::size_t const names = host->GetSharedNameCount();
   unsigned highestBlock = 0;
   unsigned highestPin = 0;
   for (int round = 0; round < 40; ++round) {
     std::vector<Orb_Block *> blocks;
     for (int i = 0; i < 25; ++i) {
-      Orb_Block *block = top->CreateBlock(("r" + std::to_string(i)).c_str());
+      // Long names, new in every round: the name table must not grow either.
+      std::string const name = "round" + std::to_string(round) + "_block" + std::to_string(i);
+      Orb_Block *block = top->CreateBlock(name.c_str());
       Orb_Pin *pin = block->CreatePin("x", Orb_Pin::PIN_INPUT);
       pin->Connect(s);
       highestBlock = std::max(highestBlock, block->GetBridgeId());
@@ -483,6 +521,7 @@ TEST_F(HostModelTest, ChurnReusesSlots) {
   EXPECT_LT(highestPin, 27u);
   EXPECT_EQ(Names(s->GetPins()), "p cp");
   EXPECT_EQ(model->GetClientCount(), ObjectCount(*host));
+  EXPECT_EQ(host->GetSharedNameCount(), names);
 }
 
 } // namespace
