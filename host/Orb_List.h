@@ -252,12 +252,6 @@ public:
     }
   }
   void Erase(T *item) noexcept;
-  // Calls `visit` on every element, in no particular order.
-  template <class F> void ForEach(F const &visit) const {
-    for (T *item : m_Slots)
-      if (item)
-        visit(item);
-  }
   std::size_t Bytes() const {
     return m_Slots.capacity() * sizeof(T *) + m_Tags.capacity() * sizeof(std::uint32_t);
   }

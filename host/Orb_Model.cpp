@@ -91,7 +91,7 @@ char const *Orb_PinDirectionName(Orb_Pin::PIN_DIRECTION direction) {
 Orb_Persistent::Orb_Persistent(Orb_Model *model, Orb_Kind kind, Orb_Persistent *parent,
                                std::string_view name)
     : m_pParent(parent), m_Kind(static_cast<std::uint8_t>(kind)) {
-  m_LongName = m_Name.Set(model->m_Names, name);
+  m_LongName = m_Name.Set(model->m_Names, name, kind == Orb_Kind::Pin);
 }
 
 Orb_Pin::Orb_Pin(Orb_Model *model, Orb_Block *parent, std::string_view name,

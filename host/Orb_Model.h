@@ -528,9 +528,9 @@ public:
 
   // Counts of live host objects by kind (for tests and reports).
   std::size_t GetObjectCount(Orb_Kind kind) const;
-  // Distinct long names (over 7 bytes) held by the model's objects, each
-  // stored once (for tests and reports).
-  std::size_t GetSharedNameCount() const { return m_Names.Size(); }
+  // Distinct long pin names (over 7 bytes) in the model, each stored once
+  // (for tests and reports).
+  std::size_t GetSharedNameCount() const { return m_Names.SharedCount(); }
 
   // Deletes any host object with its subtree: fires the delete events,
   // children before parents, takes the object out of its parent and frees
@@ -613,7 +613,7 @@ private:
   std::vector<Orb_ModelDerived *> m_Contexts;
   std::vector<Orb_ModelDerived *> m_Subscribers;
   Orb_ObjectPool m_Pools[Orb_KindCount];
-  // Long object names, shared (Orb_Name.h).
+  // Long object names (Orb_Name.h).
   Orb_NameTable m_Names;
   bool m_TearingDown = false;
   std::size_t m_ObjectCount[Orb_KindCount] = {};

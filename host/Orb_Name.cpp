@@ -2,47 +2,89 @@
 
 #include "Orb_Name.h"
 
-#include "Orb_Pool.h"
-
+#include <algorithm>
 #include <limits>
 #include <new>
 #include <stdexcept>
 
 Orb_NameTable::~Orb_NameTable() {
-  m_Index.ForEach([](Orb_NameEntry *entry) { Orb_SmallRelease(entry, EntryBytes(entry->size)); });
+  for (void *chunk : m_Chunks)
+    ::operator delete(chunk);
+  for (void *entry : m_Large)
+    ::operator delete(entry);
 }
 
-Orb_NameEntry *Orb_NameTable::Acquire(std::string_view name) {
-  if (Orb_NameEntry *found = m_Index.Find(name)) {
-    ++found->refs;
-    return found;
+void *Orb_NameTable::Allocate(std::size_t bytes) {
+  if (bytes > kClassLimit) {
+    m_Large.reserve(m_Large.size() + 1);
+    void *entry = ::operator new(bytes);
+    m_Large.insert(entry);
+    return entry;
   }
-  if (name.size() > std::numeric_limits<std::uint32_t>::max())
-    throw std::length_error("Orb_NameTable: name too long");
+  void *&free = m_Free[bytes / kGrain];
+  if (free) {
+    void *entry = free;
+    free = *static_cast<void **>(entry);
+    return entry;
+  }
+  if (static_cast<std::size_t>(m_pEnd - m_pNext) < bytes) {
+    m_Chunks.reserve(m_Chunks.size() + 1);
+    auto *chunk = static_cast<unsigned char *>(::operator new(kChunkBytes));
+    m_Chunks.push_back(chunk);
+    // What is left of the old chunk serves its size class.
+    if (std::size_t const left = static_cast<std::size_t>(m_pEnd - m_pNext); left >= kGrain)
+      Free(m_pNext, left);
+    m_pNext = chunk;
+    m_pEnd = chunk + kChunkBytes;
+  }
+  void *entry = m_pNext;
+  m_pNext += bytes;
+  return entry;
+}
+
+void Orb_NameTable::Free(void *entry, std::size_t bytes) noexcept {
+  if (bytes > kClassLimit) {
+    m_Large.erase(entry);
+    ::operator delete(entry);
+    return;
+  }
+  void *&free = m_Free[bytes / kGrain];
+  *static_cast<void **>(entry) = free;
+  free = entry;
+}
+
+Orb_NameEntry *Orb_NameTable::Acquire(std::string_view name, bool share) {
+  if (share) {
+    auto const found = m_Shared.find(name);
+    if (found != m_Shared.end()) {
+      ++found->second->refs;
+      return found->second;
+    }
+  }
+  if (name.size() >= (std::size_t(1) << 31))
+    throw std::length_error("Orb_NameTable: name of 2 GiB or more");
   std::size_t const bytes = EntryBytes(name.size());
-  auto *entry = static_cast<Orb_NameEntry *>(Orb_SmallAllocate(bytes));
+  auto *entry = static_cast<Orb_NameEntry *>(Allocate(bytes));
   entry->refs = 1;
   entry->size = static_cast<std::uint32_t>(name.size());
+  entry->shared = share ? 1 : 0;
   std::memcpy(entry->text, name.data(), name.size());
   entry->text[name.size()] = '\0';
-  try {
-    m_Index.Insert(entry);
-  } catch (...) {
-    Orb_SmallRelease(entry, bytes);
-    throw;
+  if (share) {
+    try {
+      m_Shared.emplace(entry->GetNameString(), entry);
+    } catch (...) {
+      Free(entry, bytes);
+      throw;
+    }
   }
-  ++m_Count;
-  m_EntryBytes += bytes;
   return entry;
 }
 
 void Orb_NameTable::Release(Orb_NameEntry *entry) noexcept {
   if (--entry->refs > 0)
     return;
-  m_Index.Erase(entry);
-  --m_Count;
-  m_EntryBytes -= EntryBytes(entry->size);
-  Orb_SmallRelease(entry, EntryBytes(entry->size));
+  if (entry->shared)
+    m_Shared.erase(entry->GetNameString());
+  Free(entry, EntryBytes(entry->size));
 }
-
-std::size_t Orb_NameTable::Bytes() const { return m_EntryBytes + m_Index.Bytes(); }
