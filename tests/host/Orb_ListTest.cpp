@@ -193,9 +193,9 @@ TEST(OrbNameIndexTest, ChurnMatchesReference) {
 // A table of one group (seven slots, six usable) for five names: probes wrap
 // around, and erasures leave tombstones before names still there.
 TEST(OrbNameIndexTest, SmallestTableWrapsAndKeepsRefusing) {
-  std::vector<std::unique_ptr<Item>> items;
+  std::vector<std::unique_ptr<Item>> items(5);
   for (int i = 0; i < 5; ++i)
-    items.push_back(std::make_unique<Item>(i));
+    items[static_cast<std::size_t>(i)] = std::make_unique<Item>(i);
   Orb_NameIndex<Item> index;
   index.Rebuild(5, std::vector<Item *>());
   for (auto const &item : items)
