@@ -24,6 +24,7 @@
 #include <cstdint>
 #include <functional>
 #include <memory>
+#include <new>
 #include <string_view>
 #include <vector>
 
@@ -74,6 +75,7 @@ public:
   Orb_List() = default;
   Orb_List(Orb_List const &) = delete;
   Orb_List &operator=(Orb_List const &) = delete;
+  ~Orb_List() { Orb_SmallRelease(m_pRaw, m_Capacity * sizeof(T *)); }
 
   std::size_t Size() const { return m_Count; }
   // The element at index `i` (< Size()) in host order.
@@ -81,31 +83,34 @@ public:
     if (m_Start + i >= m_Clean)
       Squeeze(m_Start + i + 1);
     // Squeezing may have moved the front.
-    return m_Raw[m_Start + i];
+    return m_pRaw[m_Start + i];
   }
   // The Size() elements in host order, holes squeezed out.
   T *const *Data() const {
-    Squeeze(m_Raw.size());
-    return m_Raw.data() + m_Start;
+    Squeeze(m_Size);
+    return m_pRaw + m_Start;
   }
   Orb_Range<T, SlotOf> Range() const { return Orb_Range<T, SlotOf>(*this); }
 
   // Room for `more` elements beyond what the list holds, growing
   // geometrically so that adding one at a time stays linear.
   void Reserve(std::size_t more) {
-    if (m_Raw.size() + more > m_Raw.capacity())
-      m_Raw.reserve(std::max(m_Raw.size() + more, 2 * m_Raw.capacity()));
+    if (m_Size + more > m_Capacity)
+      Reallocate(std::max(m_Size + more, 2 * std::size_t(m_Capacity)));
   }
   // Room for exactly `more` elements beyond what the list holds, for a
   // reader that knows how many follow.
-  void ReserveExact(std::size_t more) { m_Raw.reserve(m_Raw.size() + more); }
+  void ReserveExact(std::size_t more) {
+    if (m_Size + more > m_Capacity)
+      Reallocate(m_Size + more);
+  }
   // Appends. Throws std::bad_alloc and changes nothing when out of memory.
   void Add(T *item) {
     // A first room of four saves the steps through one and two.
-    if (m_Raw.size() == m_Raw.capacity())
-      m_Raw.reserve(m_Raw.empty() ? 4 : 2 * m_Raw.capacity());
-    m_Raw.push_back(item);
-    auto const slot = static_cast<std::uint32_t>(m_Raw.size() - 1);
+    if (m_Size == m_Capacity)
+      Reallocate(m_Capacity == 0 ? 4 : 2 * std::size_t(m_Capacity));
+    std::uint32_t const slot = m_Size++;
+    m_pRaw[slot] = item;
     SlotOf()(item, this) = slot;
     if (m_Clean == slot && m_Scan == slot)
       m_Clean = m_Scan = slot + 1;
@@ -113,31 +118,42 @@ public:
   }
   // Removes an element of the list; O(1) amortised (see above). Never throws.
   void Remove(T *item) noexcept;
-  // Forgets every element without touching them.
-  void Clear() noexcept {
-    m_Raw.clear();
-    m_Start = m_Clean = m_Scan = m_Count = 0;
-  }
+  // Forgets every element without touching them; keeps the room.
+  void Clear() noexcept { m_Size = m_Start = m_Clean = m_Scan = m_Count = 0; }
   // Sorts the elements with `less`, stably.
   template <class Less> void StableSort(Less const &less) {
-    Squeeze(m_Raw.size());
-    std::stable_sort(m_Raw.begin() + m_Start, m_Raw.end(), less);
+    Squeeze(m_Size);
+    std::stable_sort(m_pRaw + m_Start, m_pRaw + m_Size, less);
     Renumber(m_Start);
   }
   // Approximate heap bytes the list holds.
-  std::size_t Bytes() const { return m_Raw.capacity() * sizeof(T *); }
+  std::size_t Bytes() const { return m_Capacity * sizeof(T *); }
 
 private:
+  // Moves the slots to an array of `capacity` (>= m_Size) slots.
+  void Reallocate(std::size_t capacity) {
+    if (capacity > UINT32_MAX)
+      throw std::bad_alloc();
+    auto **raw = static_cast<T **>(Orb_SmallAllocate(capacity * sizeof(T *)));
+    if (m_Size > 0)
+      std::copy(m_pRaw, m_pRaw + m_Size, raw);
+    Orb_SmallRelease(m_pRaw, m_Capacity * sizeof(T *));
+    m_pRaw = raw;
+    m_Capacity = static_cast<std::uint32_t>(capacity);
+  }
   // Moves elements down over the holes until raw index `upTo` is clean.
   void Squeeze(std::size_t upTo) const noexcept;
-  void Renumber(std::size_t from) const noexcept {
-    for (std::size_t i = from; i < m_Raw.size(); ++i)
-      SlotOf()(m_Raw[i], this) = static_cast<std::uint32_t>(i);
+  void Renumber(std::uint32_t from) const noexcept {
+    for (std::uint32_t i = from; i < m_Size; ++i)
+      SlotOf()(m_pRaw[i], this) = i;
   }
 
-  // m_Raw[m_Start, m_Clean): elements, no holes. [m_Clean, m_Scan): holes.
-  // [m_Scan, end): elements and holes not yet squeezed.
-  mutable std::vector<T *, Orb_SmallAllocator<T *>> m_Raw;
+  // m_pRaw[0, m_Size) of m_Capacity slots: [0, m_Start) holes, [m_Start,
+  // m_Clean) elements, no holes, [m_Clean, m_Scan) holes, [m_Scan, m_Size)
+  // elements and holes not yet squeezed. Holes are null.
+  T **m_pRaw = nullptr;
+  std::uint32_t m_Capacity = 0;
+  mutable std::uint32_t m_Size = 0;
   mutable std::uint32_t m_Start = 0;
   mutable std::uint32_t m_Clean = 0;
   mutable std::uint32_t m_Scan = 0;
@@ -146,9 +162,9 @@ private:
 
 template <class T, class SlotOf> void Orb_List<T, SlotOf>::Remove(T *item) noexcept {
   std::uint32_t const p = SlotOf()(item, this);
-  assert(p < m_Raw.size() && m_Raw[p] == item && "Orb_List::Remove: not an element");
+  assert(p < m_Size && m_pRaw[p] == item && "Orb_List::Remove: not an element");
   --m_Count;
-  m_Raw[p] = nullptr;
+  m_pRaw[p] = nullptr;
   if (m_Count == 0) {
     Clear();
     return;
@@ -163,142 +179,208 @@ template <class T, class SlotOf> void Orb_List<T, SlotOf>::Remove(T *item) noexc
     std::uint32_t const gap = m_Scan - m_Clean;
     if (gap > 0) {
       for (std::uint32_t j = m_Clean; j-- > p + 1;) {
-        T *moved = m_Raw[j];
-        m_Raw[j + gap] = moved;
+        T *moved = m_pRaw[j];
+        m_pRaw[j + gap] = moved;
         SlotOf()(moved, this) = j + gap;
       }
-      std::fill(m_Raw.begin() + p + 1, m_Raw.begin() + std::min(m_Clean, p + 1 + gap), nullptr);
+      std::fill(m_pRaw + p + 1, m_pRaw + std::min(m_Clean, p + 1 + gap), nullptr);
     }
     m_Clean = p;
     m_Scan = p + 1 + gap;
   }
   // Trailing holes go.
-  while (m_Raw.size() > m_Scan && !m_Raw.back())
-    m_Raw.pop_back();
-  if (m_Scan == m_Raw.size()) {
-    m_Raw.resize(m_Clean);
-    m_Scan = m_Clean;
-  }
+  while (m_Size > m_Scan && !m_pRaw[m_Size - 1])
+    --m_Size;
+  if (m_Scan == m_Size)
+    m_Size = m_Scan = m_Clean;
 }
 
 template <class T, class SlotOf>
 void Orb_List<T, SlotOf>::Squeeze(std::size_t upTo) const noexcept {
-  while (m_Clean < upTo && m_Scan < m_Raw.size()) {
-    T *item = m_Raw[m_Scan];
+  while (m_Clean < upTo && m_Scan < m_Size) {
+    T *item = m_pRaw[m_Scan];
     if (item) {
       if (m_Scan != m_Clean) {
-        m_Raw[m_Clean] = item;
-        m_Raw[m_Scan] = nullptr;
+        m_pRaw[m_Clean] = item;
+        m_pRaw[m_Scan] = nullptr;
         SlotOf()(item, this) = m_Clean;
       }
       ++m_Clean;
     }
     ++m_Scan;
   }
-  if (m_Scan == m_Raw.size() && m_Clean < m_Scan) {
-    m_Raw.resize(m_Clean);
-    m_Scan = m_Clean;
-  }
+  if (m_Scan == m_Size)
+    m_Size = m_Scan = m_Clean;
   // Holes gathered at the front go once they are half the list.
-  if (m_Start > 0 && m_Clean == m_Raw.size() && m_Start >= m_Raw.size() / 2) {
-    m_Raw.erase(m_Raw.begin(), m_Raw.begin() + m_Start);
+  if (m_Start > 0 && m_Clean == m_Size && m_Start >= m_Size / 2) {
+    std::copy(m_pRaw + m_Start, m_pRaw + m_Size, m_pRaw);
+    m_Size -= m_Start;
     m_Start = 0;
-    m_Clean = m_Scan = static_cast<std::uint32_t>(m_Raw.size());
+    m_Clean = m_Scan = m_Size;
     Renumber(0);
   }
 }
 
 // A name index over a named list: none while the list is small (a scan is
-// cheaper), built on the first lookup or insertion that finds the list
-// large, kept up to date from then on. Open addressing with linear probing
-// over element pointers, up to 7/8 full; each slot keeps 32 bits of its name's hash beside
-// it, so that a probe reads the element (a likely cache miss in a large
-// index) only when the hashes match.
+// cheaper), built when a lookup or an insertion finds the list large, kept
+// up to date from then on. Open addressing with linear probing, up to 7/8
+// full. Slots come seven to a 64-byte line: one byte of each slot's name hash
+// (its tag), then the seven element pointers. A probe reads tags only, and
+// the element (a likely cache miss in a large index) only when its tag
+// matches: 1 in 254 for another name. Erasure leaves a tombstone tag, which
+// probes pass over and insertions reuse; the next rebuild drops them.
 template <class T> class Orb_NameIndex {
 public:
   static constexpr std::size_t kScanLimit = 16;
 
-  T *Find(std::string_view name) const {
-    if (m_Slots.empty())
-      return nullptr;
-    std::size_t const hash = Hash(name);
-    auto const tag = static_cast<std::uint32_t>(hash);
-    std::size_t const mask = m_Slots.size() - 1;
-    for (std::size_t i = hash & mask;; i = (i + 1) & mask) {
-      T *item = m_Slots[i];
-      if (!item || (m_Tags[i] == tag && item->GetNameString() == name))
-        return item;
-    }
+  Orb_NameIndex() = default;
+  Orb_NameIndex(Orb_NameIndex const &) = delete;
+  Orb_NameIndex &operator=(Orb_NameIndex const &) = delete;
+  ~Orb_NameIndex() { Free(m_pTable); }
+
+  bool Built() const { return m_pTable != nullptr; }
+  T *Find(std::string_view name) const;
+  // Whether `more` insertions fit without a rebuild.
+  bool HasRoom(std::size_t more) const {
+    return m_pTable && m_pTable->used + more <= m_pTable->limit;
   }
   // Inserts unless an element of that name is there; returns that element,
-  // or null when inserted.
-  T *Insert(T *item) {
-    if ((m_Count + 1) * 8 > m_Slots.size() * 7)
-      Grow();
-    std::string_view const name = item->GetNameString();
-    std::size_t const hash = Hash(name);
-    auto const tag = static_cast<std::uint32_t>(hash);
-    std::size_t const mask = m_Slots.size() - 1;
-    for (std::size_t i = hash & mask;; i = (i + 1) & mask) {
-      T *&slot = m_Slots[i];
-      if (!slot) {
-        slot = item;
-        m_Tags[i] = tag;
-        ++m_Count;
-        return nullptr;
-      }
-      if (m_Tags[i] == tag && slot->GetNameString() == name)
-        return slot;
-    }
-  }
+  // or null when inserted. Needs HasRoom(1).
+  T *Insert(T *item);
   void Erase(T *item) noexcept;
+  // Indexes exactly `items` (of distinct names), with room for `count` names
+  // in all. Throws std::bad_alloc and changes nothing when out of memory.
+  template <class Items> void Rebuild(std::size_t count, Items const &items);
+  void Clear() noexcept {
+    Free(m_pTable);
+    m_pTable = nullptr;
+  }
   std::size_t Bytes() const {
-    return m_Slots.capacity() * sizeof(T *) + m_Tags.capacity() * sizeof(std::uint32_t);
+    return m_pTable ? sizeof(Table) + m_pTable->slots / kGroupSlots * sizeof(Group) : 0;
   }
 
 private:
-  static std::size_t Hash(std::string_view name) { return std::hash<std::string_view>()(name); }
-  void Grow() {
-    std::size_t const size = m_Slots.empty() ? 32 : m_Slots.size() * 2;
-    std::vector<T *> slots(size, nullptr);
-    std::vector<std::uint32_t> tags(size, 0);
-    std::size_t const mask = size - 1;
-    for (std::size_t j = 0; j < m_Slots.size(); ++j) {
-      if (!m_Slots[j])
-        continue;
-      // The tag holds the low 32 bits of the hash, all a mask of a table
-      // below 2^32 slots needs.
-      std::size_t i = m_Tags[j] & mask;
-      while (slots[i])
-        i = (i + 1) & mask;
-      slots[i] = m_Slots[j];
-      tags[i] = m_Tags[j];
+  static constexpr std::size_t kGroupSlots = 7;
+  static constexpr std::uint8_t kEmpty = 0;
+  static constexpr std::uint8_t kTombstone = 1;
+  struct alignas(64) Group {
+    std::uint8_t tags[kGroupSlots + 1]; // The last is padding.
+    T *items[kGroupSlots];
+  };
+  // One allocation: this header line, then the groups.
+  struct alignas(64) Table {
+    std::size_t slots;
+    std::size_t limit; // Most slots used (elements and tombstones).
+    std::size_t used;
+    std::size_t count;
+    Group *Groups() { return reinterpret_cast<Group *>(this + 1); }
+    std::uint8_t &TagAt(std::size_t i) { return Groups()[i / kGroupSlots].tags[i % kGroupSlots]; }
+    T *&ItemAt(std::size_t i) { return Groups()[i / kGroupSlots].items[i % kGroupSlots]; }
+    std::size_t Next(std::size_t i) const { return i + 1 == slots ? 0 : i + 1; }
+    // The home slot: the hash's low 32 bits scaled to the table.
+    std::size_t Home(std::size_t hash) const {
+      return static_cast<std::size_t>((std::uint64_t(std::uint32_t(hash)) * slots) >> 32);
     }
-    m_Slots.swap(slots);
-    m_Tags.swap(tags);
+  };
+  static_assert(sizeof(Group) == 64 && sizeof(Table) == 64, "one cache line each");
+
+  static std::size_t Hash(std::string_view name) { return std::hash<std::string_view>()(name); }
+  // The top byte of the hash, kept clear of kEmpty and kTombstone.
+  static std::uint8_t Tag(std::size_t hash) {
+    auto const top = static_cast<std::uint8_t>(hash >> (8 * sizeof(std::size_t) - 8));
+    return top > kTombstone ? top : static_cast<std::uint8_t>(top + 2);
+  }
+  static void Free(Table *table) noexcept {
+    if (table)
+      ::operator delete(table, std::align_val_t(alignof(Table)));
   }
 
-  std::vector<T *> m_Slots;
-  std::vector<std::uint32_t> m_Tags;
-  std::size_t m_Count = 0;
+  Table *m_pTable = nullptr;
 };
 
-template <class T> void Orb_NameIndex<T>::Erase(T *item) noexcept {
-  std::size_t const mask = m_Slots.size() - 1;
-  std::size_t i = Hash(item->GetNameString()) & mask;
-  while (m_Slots[i] != item) {
-    assert(m_Slots[i] && "Orb_NameIndex::Erase: not indexed");
-    i = (i + 1) & mask;
+template <class T> T *Orb_NameIndex<T>::Find(std::string_view name) const {
+  if (!m_pTable)
+    return nullptr;
+  std::size_t const hash = Hash(name);
+  std::uint8_t const tag = Tag(hash);
+  Table &table = *m_pTable;
+  for (std::size_t i = table.Home(hash);; i = table.Next(i)) {
+    std::uint8_t const seen = table.TagAt(i);
+    if (seen == kEmpty)
+      return nullptr;
+    if (seen == tag && table.ItemAt(i)->GetNameString() == name)
+      return table.ItemAt(i);
   }
-  // Backward shift: entries after the hole whose probe passes it move in.
-  for (std::size_t j = (i + 1) & mask; m_Slots[j]; j = (j + 1) & mask) {
-    std::size_t const home = m_Tags[j] & mask;
-    if (((j - home) & mask) >= ((j - i) & mask)) {
-      m_Slots[i] = m_Slots[j];
-      m_Tags[i] = m_Tags[j];
-      i = j;
+}
+
+template <class T> T *Orb_NameIndex<T>::Insert(T *item) {
+  assert(HasRoom(1) && "Orb_NameIndex::Insert: no room");
+  std::string_view const name = item->GetNameString();
+  std::size_t const hash = Hash(name);
+  std::uint8_t const tag = Tag(hash);
+  Table &table = *m_pTable;
+  std::size_t to = table.slots;
+  std::size_t i = table.Home(hash);
+  for (;; i = table.Next(i)) {
+    std::uint8_t const seen = table.TagAt(i);
+    if (seen == kEmpty)
+      break;
+    if (seen == kTombstone) {
+      if (to == table.slots)
+        to = i;
+    } else if (seen == tag && table.ItemAt(i)->GetNameString() == name) {
+      return table.ItemAt(i);
     }
   }
-  m_Slots[i] = nullptr;
-  --m_Count;
+  if (to == table.slots) {
+    to = i;
+    ++table.used;
+  }
+  table.TagAt(to) = tag;
+  table.ItemAt(to) = item;
+  ++table.count;
+  return nullptr;
+}
+
+template <class T> void Orb_NameIndex<T>::Erase(T *item) noexcept {
+  Table &table = *m_pTable;
+  std::size_t i = table.Home(Hash(item->GetNameString()));
+  while (table.ItemAt(i) != item) {
+    assert(table.TagAt(i) != kEmpty && "Orb_NameIndex::Erase: not indexed");
+    i = table.Next(i);
+  }
+  table.TagAt(i) = kTombstone;
+  table.ItemAt(i) = nullptr;
+  --table.count;
+  // Tombstones right before an empty slot end no probe: they empty.
+  if (table.TagAt(table.Next(i)) == kEmpty) {
+    while (table.TagAt(i) == kTombstone) {
+      table.TagAt(i) = kEmpty;
+      --table.used;
+      i = i == 0 ? table.slots - 1 : i - 1;
+    }
+  }
+}
+
+template <class T>
+template <class Items>
+void Orb_NameIndex<T>::Rebuild(std::size_t count, Items const &items) {
+  // Groups enough that `count` names fill at most 7/8 of the slots.
+  std::size_t const groups =
+      std::max<std::size_t>(1, (8 * std::max<std::size_t>(count, items.size()) + 48) / 49);
+  void *block =
+      ::operator new(sizeof(Table) + groups * sizeof(Group), std::align_val_t(alignof(Table)));
+  auto *table = new (block) Table{groups * kGroupSlots, groups * kGroupSlots * 7 / 8, 0, 0};
+  std::uninitialized_value_construct_n(table->Groups(), groups);
+  for (T *item : items) {
+    std::size_t const hash = Hash(item->GetNameString());
+    std::size_t i = table->Home(hash);
+    while (table->TagAt(i) != kEmpty)
+      i = table->Next(i);
+    table->TagAt(i) = Tag(hash);
+    table->ItemAt(i) = item;
+  }
+  table->used = table->count = items.size();
+  Free(m_pTable);
+  m_pTable = table;
 }

@@ -116,41 +116,40 @@ public:
   // changes nothing. One hash insertion for a large list.
   bool AddUnique(T *item);
   void Remove(T *item) noexcept {
-    if (m_pIndex)
-      m_pIndex->Erase(item);
+    if (m_Index.Built())
+      m_Index.Erase(item);
     m_List.Remove(item);
     if (m_List.Size() == 0)
-      m_pIndex.reset();
+      m_Index.Clear();
   }
   // Forgets every child without touching them.
   void Clear() noexcept {
     m_List.Clear();
-    m_pIndex.reset();
+    m_Index.Clear();
   }
-  void Reserve(std::size_t more) { m_List.Reserve(more); }
+  // Room for `more` children beyond those held, in the list and, when they
+  // make the list large, in the index: adding them rehashes nothing.
+  void Reserve(std::size_t more);
   template <class Less> void StableSort(Less const &less) { m_List.StableSort(less); }
 
 private:
   // Builds the index when the list has grown past a scan.
-  void IndexIfLarge() const;
+  void IndexIfLarge() const {
+    if (!m_Index.Built() && m_List.Size() > Orb_NameIndex<T>::kScanLimit)
+      m_Index.Rebuild(2 * m_List.Size(), m_List.Range());
+  }
 
   Orb_List<T, Orb_ChildSlot> m_List;
-  mutable std::unique_ptr<Orb_NameIndex<T>> m_pIndex;
+  mutable Orb_NameIndex<T> m_Index;
 };
 
-template <class T> void Orb_NamedList<T>::IndexIfLarge() const {
-  if (m_pIndex || m_List.Size() <= Orb_NameIndex<T>::kScanLimit)
-    return;
-  auto index = std::make_unique<Orb_NameIndex<T>>();
-  for (T *item : m_List.Range())
-    index->Insert(item);
-  m_pIndex = std::move(index);
-}
+static_assert(sizeof(Orb_List<Orb_Pin, Orb_ChildSlot>) == 32, "a pointer and six 32-bit counts");
+static_assert(sizeof(Orb_NamedList<Orb_Pin>) == 40, "a list and the index's table pointer");
 
 template <class T> T *Orb_NamedList<T>::Find(std::string_view name) const {
   IndexIfLarge();
-  if (m_pIndex)
-    return m_pIndex->Find(name);
+  if (m_Index.Built())
+    return m_Index.Find(name);
   for (T *item : m_List.Range())
     if (item->GetNameString() == name)
       return item;
@@ -159,21 +158,30 @@ template <class T> T *Orb_NamedList<T>::Find(std::string_view name) const {
 
 template <class T> bool Orb_NamedList<T>::AddUnique(T *item) {
   IndexIfLarge();
-  if (!m_pIndex) {
+  if (!m_Index.Built()) {
     if (Find(item->GetNameString()))
       return false;
     m_List.Add(item);
     return true;
   }
-  if (m_pIndex->Insert(item))
+  // Geometric growth keeps insertions amortised O(1).
+  if (!m_Index.HasRoom(1))
+    m_Index.Rebuild(2 * (m_List.Size() + 1), m_List.Range());
+  if (m_Index.Insert(item))
     return false;
   try {
     m_List.Add(item);
   } catch (...) {
-    m_pIndex->Erase(item);
+    m_Index.Erase(item);
     throw;
   }
   return true;
+}
+
+template <class T> void Orb_NamedList<T>::Reserve(std::size_t more) {
+  m_List.Reserve(more);
+  if (m_List.Size() + more > Orb_NameIndex<T>::kScanLimit && !m_Index.HasRoom(more))
+    m_Index.Rebuild(m_List.Size() + more, m_List.Range());
 }
 
 // Where a pin keeps its slot in the pin list of the signal it connects to,

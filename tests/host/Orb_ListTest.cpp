@@ -4,6 +4,7 @@
 
 #include <algorithm>
 #include <cstdint>
+#include <map>
 #include <memory>
 #include <random>
 #include <string>
@@ -138,26 +139,80 @@ TEST_F(OrbListTest, SortThenRemove) {
   ExpectSame("removed after sort");
 }
 
-// The name index finds, refuses duplicates and forgets erased names, also
-// across growth and backward-shift erasure.
-TEST(OrbNameIndexTest, FindInsertEraseAgainstReference) {
-  std::vector<std::unique_ptr<Item>> items;
+// Drives a name index as a named list does: rebuilt from the live
+// elements, with room for twice as many, when an insertion finds it full.
+struct IndexDriver {
+  Item *Insert(Item *item) {
+    if (!index.HasRoom(1))
+      index.Rebuild(2 * (live.size() + 1), live);
+    Item *taken = index.Insert(item);
+    if (!taken)
+      live.push_back(item);
+    return taken;
+  }
+  void Erase(Item *item) {
+    index.Erase(item);
+    live.erase(std::find(live.begin(), live.end(), item));
+  }
   Orb_NameIndex<Item> index;
-  for (int i = 0; i < 3000; ++i) {
-    items.push_back(std::make_unique<Item>(i));
-    ASSERT_EQ(index.Insert(items.back().get()), nullptr) << i;
+  std::vector<Item *> live;
+};
+
+// Finds, refusals and erasures against a reference, across rebuilds, with
+// tombstones piling up from erasures between insertions. A refusal must look
+// past tombstones for the name.
+TEST(OrbNameIndexTest, ChurnMatchesReference) {
+  std::mt19937 random(11);
+  std::vector<std::unique_ptr<Item>> items;
+  IndexDriver driver;
+  std::map<std::string, Item *> reference;
+  for (int step = 0; step < 20000; ++step) {
+    int const n = static_cast<int>(random() % 600);
+    std::string const name = "i" + std::to_string(n);
+    auto const found = reference.find(name);
+    if (random() % 3 == 0 && found != reference.end()) {
+      driver.Erase(found->second);
+      reference.erase(found);
+    } else {
+      items.push_back(std::make_unique<Item>(n));
+      Item *taken = driver.Insert(items.back().get());
+      ASSERT_EQ(taken, found == reference.end() ? nullptr : found->second) << "step " << step;
+      if (!taken)
+        reference[name] = items.back().get();
+    }
+    if (step % 1000 == 0)
+      for (int k = 0; k < 600; ++k) {
+        auto const it = reference.find("i" + std::to_string(k));
+        ASSERT_EQ(driver.index.Find("i" + std::to_string(k)),
+                  it == reference.end() ? nullptr : it->second)
+            << "step " << step << ", name " << k;
+      }
   }
-  Item duplicate(18);
-  EXPECT_EQ(index.Insert(&duplicate), items[18].get()) << "a taken name is refused";
-  for (int i = 0; i < 3000; i += 3)
+}
+
+// A table of one group (seven slots, six usable) for five names: probes wrap
+// around, and erasures leave tombstones before names still there.
+TEST(OrbNameIndexTest, SmallestTableWrapsAndKeepsRefusing) {
+  std::vector<std::unique_ptr<Item>> items(5);
+  for (int i = 0; i < 5; ++i)
+    items[static_cast<std::size_t>(i)] = std::make_unique<Item>(i);
+  Orb_NameIndex<Item> index;
+  index.Rebuild(5, std::vector<Item *>());
+  for (auto const &item : items)
+    ASSERT_EQ(index.Insert(item.get()), nullptr);
+  for (int i = 0; i < 5; i += 2)
     index.Erase(items[static_cast<std::size_t>(i)].get());
-  for (int i = 0; i < 3000; ++i) {
-    Item *expected = i % 3 == 0 ? nullptr : items[static_cast<std::size_t>(i)].get();
-    ASSERT_EQ(index.Find("i" + std::to_string(i)), expected) << i;
+  for (int i = 0; i < 5; ++i) {
+    Item again(i);
+    EXPECT_EQ(index.Insert(&again) != nullptr, i % 2 == 1) << i;
+    if (i % 2 == 0)
+      index.Erase(&again);
   }
-  EXPECT_EQ(index.Insert(&duplicate), nullptr) << "an erased name is free again";
-  EXPECT_EQ(index.Find("i18"), &duplicate);
-  EXPECT_EQ(index.Find("i19"), items[19].get());
+  EXPECT_EQ(index.Find("i99"), nullptr);
+  index.Rebuild(100, std::vector<Item *>{items[1].get(), items[3].get()});
+  EXPECT_TRUE(index.HasRoom(98)) << "a rebuild sizes for the count asked";
+  EXPECT_EQ(index.Find("i3"), items[3].get());
+  EXPECT_EQ(index.Find("i0"), nullptr);
 }
 
 } // namespace
