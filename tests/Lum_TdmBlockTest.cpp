@@ -466,18 +466,11 @@ protected:
 };
 
 // A model that logs its graft hooks and makes CallerBlocks.
-class CallerModel : public Lum_TdmModel {
+class CallerModel : public ClientModel<CallerBlock> {
 public:
-  CallerModel() : Lum_TdmModel("caller", "callerdb", "") {}
   void RegisterGraftEventHandlers() override { m_Hooks += "register,"; }
   void CleanupGraftProps() override { m_Hooks += "cleanup,"; }
   void UnregisterGraftEventHandlers() override { m_Hooks += "unregister,"; }
-  void SyncEventSpecializeBlockOnCreate(Orb_Block *block) override {
-    new CallerBlock(this, block, true);
-  }
-  void SyncEventSpecializeBlockOnLoad(Orb_Block *block) override {
-    new CallerBlock(this, block, false);
-  }
 
   std::string m_Hooks;
   int m_Inits = 0;

@@ -68,14 +68,6 @@ protected:
   }
 };
 
-class NoisyModel : public Lum_TdmModel {
-public:
-  using Lum_TdmModel::Lum_TdmModel;
-  void SyncEventSpecializeBlockOnCreate(Orb_Block *block) override {
-    new NoisyBlock(this, block, true);
-  }
-};
-
 // Type library LIBD (AND2 with pins A and B, and OR2) and a design whose top
 // block holds u1, stored as an instance of AND2.
 class TdmDbgTest : public ::testing::Test {
@@ -260,7 +252,7 @@ TEST_F(TdmDbgTest, CallbackDumpsCarryTheIndentation) {
 // Dbg runs the most derived DbgImpl; the class name is that of the DbgImpl
 // printing it, not the object's.
 TEST_F(TdmDbgTest, ClassNameIsThatOfTheRunningDbgImpl) {
-  TypedDesign design(std::make_unique<NoisyModel>("noisy", "noisy", ""));
+  TypedDesign design(std::make_unique<ClientModel<NoisyBlock>>());
   Lum_TdmBlock *top = design.m_pView->CreateTopBlock("top");
   Capture capture;
   top->Dbg();

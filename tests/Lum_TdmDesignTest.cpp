@@ -8,21 +8,6 @@ using namespace lumtest;
 
 namespace {
 
-// Subscribed before the library's model, it gives every new design a mark
-// of its own in the creation event.
-class PreMarkingModel : public Orb_ModelDerived {
-public:
-  PreMarkingModel(Orb_Model *host, char const *mark) : Orb_ModelDerived(host), m_Mark(mark) {
-    SetEventNotifyAll();
-  }
-  void SyncEventSpecializeDesignOnCreate(Orb_Design *design) override {
-    design->CreatePropertyString("TDS_DESIGN_TYPE", m_Mark);
-  }
-
-private:
-  char const *m_Mark;
-};
-
 class TdmDesignTest : public ::testing::Test {
 protected:
   TempDir m_Dir;
@@ -56,7 +41,10 @@ TEST_F(TdmDesignTest, NewDesignIsMarkedAndUnmarkedOneMarkedByCommit) {
 // one, and creating such a design reports nothing.
 TEST_F(TdmDesignTest, ExistingMarkIsNeverOverwritten) {
   Orb_Model host("h", "h", "", false);
-  PreMarkingModel first(&host, "TDS_DESIGN_TYPE_LIBRARY");
+  EarlierSubscriber first(&host);
+  first.m_OnDesign = [](Orb_Design *design) {
+    design->CreatePropertyString("TDS_DESIGN_TYPE", "TDS_DESIGN_TYPE_LIBRARY");
+  };
   Lum_TdmModel model(&host);
   Port_MsgCapture capture;
   Orb_Design *design = host.CreateDesignMgr("dm")->CreateDesign("d");

@@ -22,6 +22,7 @@
 #include <cstdlib>
 #include <filesystem>
 #include <fstream>
+#include <functional>
 #include <iterator>
 #include <memory>
 #include <string>
@@ -106,6 +107,35 @@ inline std::unique_ptr<Lum_TdmModel> OpenModel(std::string const &path) {
   model->Open(path.c_str());
   return model;
 }
+
+// A client model that builds blocks of class Block and views of class View,
+// for tests that override what those clients do.
+template <class Block, class View = Lum_TdmView> class ClientModel : public Lum_TdmModel {
+public:
+  explicit ClientModel(char const *name = "clients") : Lum_TdmModel(name, name, "") {}
+  void SyncEventSpecializeBlockOnCreate(Orb_Block *block) override { new Block(this, block, true); }
+  void SyncEventSpecializeBlockOnLoad(Orb_Block *block) override { new Block(this, block, false); }
+  void SyncEventSpecializeViewOnCreate(Orb_View *view) override { new View(this, view, true); }
+  void SyncEventSpecializeViewOnLoad(Orb_View *view) override { new View(this, view, false); }
+};
+
+// Subscribed to a host model before the library's client model, it sees each
+// new design and view first, in their creation events.
+class EarlierSubscriber : public Orb_ModelDerived {
+public:
+  explicit EarlierSubscriber(Orb_Model *host) : Orb_ModelDerived(host) { SetEventNotifyAll(); }
+  void SyncEventSpecializeDesignOnCreate(Orb_Design *design) override {
+    if (m_OnDesign)
+      m_OnDesign(design);
+  }
+  void SyncEventSpecializeViewOnCreate(Orb_View *view) override {
+    if (m_OnView)
+      m_OnView(view);
+  }
+
+  std::function<void(Orb_Design *)> m_OnDesign;
+  std::function<void(Orb_View *)> m_OnView;
+};
 
 // Saves the model to `path` and opens it in a fresh model.
 inline std::unique_ptr<Lum_TdmModel> SaveAndReopen(Lum_TdmModel &model, std::string const &path) {

@@ -31,24 +31,7 @@ protected:
   }
 };
 
-class HookedModel : public Lum_TdmModel {
-public:
-  using Lum_TdmModel::Lum_TdmModel;
-  void SyncEventSpecializeViewOnCreate(Orb_View *view) override {
-    new HookedView(this, view, true);
-  }
-  void SyncEventSpecializeViewOnLoad(Orb_View *view) override { new HookedView(this, view, false); }
-};
-
-// Subscribed before the library's model: puts a property on every new view
-// in the creation event.
-class PrePropertyModel : public Orb_ModelDerived {
-public:
-  explicit PrePropertyModel(Orb_Model *host) : Orb_ModelDerived(host) { SetEventNotifyAll(); }
-  void SyncEventSpecializeViewOnCreate(Orb_View *view) override {
-    view->CreatePropertyString("LUM_DONT_CREATE_UNUSED_PINS", "yes");
-  }
-};
+using HookedModel = ClientModel<Lum_TdmBlock, HookedView>;
 
 // The names of the libraries a view lists, in order.
 std::string LibNames(Lum_TdmView *view) {
@@ -73,7 +56,10 @@ protected:
 // even when it was put on the host view before the library saw it.
 TEST_F(TdmViewStampTest, NewViewIsStamped) {
   Orb_Model host("h", "h", "", false);
-  PrePropertyModel first(&host);
+  EarlierSubscriber first(&host);
+  first.m_OnView = [](Orb_View *view) {
+    view->CreatePropertyString("LUM_DONT_CREATE_UNUSED_PINS", "yes");
+  };
   Lum_TdmModel model(&host);
   Orb_View *hostView = host.CreateDesignMgr("dm")->CreateDesign("d")->CreateView("v");
   auto *view = static_cast<Lum_TdmView *>(model.GetClient(hostView));
@@ -197,7 +183,7 @@ class TdmViewLibraryTest : public ::testing::Test {
 protected:
   TdmViewLibraryTest()
       : m_LibA("LIBA", 1, 2), m_LibB("LIBB", 2, 0, "fast"), m_LibC("LIBC", 3, 4, "", "rev2"),
-        m_LibD("LIBD", 7, 11, "q1", "q2"), m_Design(std::make_unique<HookedModel>("m", "db", "")) {}
+        m_LibD("LIBD", 7, 11, "q1", "q2"), m_Design(std::make_unique<HookedModel>()) {}
 
   HookedView *View() { return static_cast<HookedView *>(m_Design.m_pView); }
   void SetLibs(std::vector<char const *> const &entries) {
@@ -207,7 +193,7 @@ protected:
   }
   // Reopens the design so that the view builds its list from the property.
   HookedView *Reopen() {
-    m_Reopened = std::make_unique<HookedModel>("r", "r", "");
+    m_Reopened = std::make_unique<HookedModel>();
     std::string const path = m_Dir.File("d.odb");
     m_Design.Model().Save(path.c_str());
     m_Reopened->Open(path.c_str());
@@ -429,14 +415,6 @@ public:
   std::array<std::uint64_t, 8> m_Counters{};
 };
 
-class FixedSizeModel : public Lum_TdmModel {
-public:
-  FixedSizeModel() : Lum_TdmModel("fixed", "fixed", "") {}
-  void SyncEventSpecializeViewOnCreate(Orb_View *view) override {
-    new FixedSizeView(this, view, true);
-  }
-};
-
 // A measurement as "total | blocks bytes/count | pins | networks | signals",
 // the counters starting from values it must reset.
 std::string Measure(Lum_TdmView const *view) {
@@ -519,7 +497,7 @@ TEST(TdmViewSizeTest, MeasurementReachesEveryObjectOnce) {
 // prints blocks, networks, signals and pins, each only when present, with
 // truncated shares and averages.
 TEST(TdmViewSizeTest, ReportPrintsThePresentKindsInOrder) {
-  TypedDesign design(std::make_unique<FixedSizeModel>());
+  TypedDesign design(std::make_unique<ClientModel<Lum_TdmBlock, FixedSizeView>>());
   auto *view = static_cast<FixedSizeView *>(design.m_pView);
   view->m_Counters = {100, 3, 1044, 6, 7, 1, 40, 2};
   EXPECT_EQ(Report(view), kReportRule +
