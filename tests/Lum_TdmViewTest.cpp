@@ -439,19 +439,22 @@ std::string const kReportRule =
 // Blocks of a class of 32 bytes, and of a derived class reporting 0 bytes
 // (whose share prints as 0 instead of dividing by the total).
 TEST(TdmViewSizeTest, BlocksOfOneClassSize) {
+  // The measurement and the report of three blocks of `bytes` each.
+  auto const expected = [](std::uint64_t bytes) {
+    std::string const total = std::to_string(3 * bytes);
+    return std::make_pair(total + " | " + total + "/3 | 0/0 | 0/0 | 0/0",
+                          kReportRule + "Design <top> View <netlist> consumes " + total +
+                              " bytes of memory\n  3 specialized objects\n    3 blocks consume " +
+                              total + " bytes of memory (" + (bytes ? "100" : "0") +
+                              "%)\n      Average block size is " + std::to_string(bytes) +
+                              " bytes\n" + kReportRule);
+  };
   for (std::uint64_t const bytes : {32u, 0u}) {
     TypedDesign design(std::make_unique<SizedModel>(bytes));
     Lum_TdmBlock *top = design.m_pView->CreateTopBlock("top");
     top->CreateBlock("a", 0);
     top->CreateBlock("b", 0);
-    std::string const total = std::to_string(3 * bytes);
-    EXPECT_EQ(Measure(design.m_pView), total + " | " + total + "/3 | 0/0 | 0/0 | 0/0");
-    EXPECT_EQ(Report(design.m_pView),
-              kReportRule + "Design <top> View <netlist> consumes " + total +
-                  " bytes of memory\n  3 specialized objects\n    3 blocks consume " + total +
-                  " bytes of memory (" + (bytes ? "100" : "0") +
-                  "%)\n      Average block size is " + std::to_string(bytes) + " bytes\n" +
-                  kReportRule);
+    EXPECT_EQ(std::make_pair(Measure(design.m_pView), Report(design.m_pView)), expected(bytes));
   }
 }
 
