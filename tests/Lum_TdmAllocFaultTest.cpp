@@ -94,13 +94,19 @@ using namespace lumtest;
 
 namespace {
 
+class TdmAllocFaultTest : public ::testing::Test {
+protected:
+  void SetUp() override {
+    if (!ReplacementInUse())
+      GTEST_SKIP() << "operator new is not this program's (a memory checker replaced it)";
+  }
+};
+
 // Every allocation of an open, in turn, fails: the open throws std::bad_alloc
 // or a Port::Exception with a message, and the model keeps exactly its own
 // objects, clients, companions and saved bytes, and then opens the design in
 // full. The last k is the first that the open survives.
-TEST(TdmAllocFaultTest, FailedAllocationAtEveryStepOfAnOpenLeavesTheModelAsItWas) {
-  if (!ReplacementInUse())
-    GTEST_SKIP() << "operator new is not this program's (a memory checker replaced it)";
+TEST_F(TdmAllocFaultTest, FailedAllocationAtEveryStepOfAnOpenLeavesTheModelAsItWas) {
   FaultDesign design;
   std::string expected;
   {
@@ -167,9 +173,7 @@ std::size_t Reachable(Orb_Model const &model) {
 // Building a design through the API with the k-th allocation failing throws
 // std::bad_alloc and leaves no object that the model counts but cannot
 // reach: an object the host made but could not file away is freed.
-TEST(TdmAllocFaultTest, FailedAllocationWhileCreatingLeavesNoStrayObject) {
-  if (!ReplacementInUse())
-    GTEST_SKIP() << "operator new is not this program's (a memory checker replaced it)";
+TEST_F(TdmAllocFaultTest, FailedAllocationWhileCreatingLeavesNoStrayObject) {
   for (unsigned long k = 1;; ++k) {
     SCOPED_TRACE("allocation " + std::to_string(k));
     Lum_TdmModel model("alloc", "allocdb", "");
@@ -186,10 +190,7 @@ TEST(TdmAllocFaultTest, FailedAllocationWhileCreatingLeavesNoStrayObject) {
       } catch (std::bad_alloc const &) {
       }
     }
-    std::size_t objects = 0;
-    for (unsigned kind = 0; kind < Orb_KindCount; ++kind)
-      objects += model.GetOrbModel()->GetObjectCount(static_cast<Orb_Kind>(kind));
-    ASSERT_EQ(objects, Reachable(*model.GetOrbModel()));
+    ASSERT_EQ(HostObjectCount(model.GetOrbModel()), Reachable(*model.GetOrbModel()));
     if (built)
       break;
   }
@@ -198,9 +199,7 @@ TEST(TdmAllocFaultTest, FailedAllocationWhileCreatingLeavesNoStrayObject) {
 // A save whose k-th allocation fails, for every k, throws std::bad_alloc or
 // Orb_Exception and leaves the previous database byte for byte, with no
 // temporary file beside it.
-TEST(TdmAllocFaultTest, FailedAllocationWhileSavingKeepsThePreviousDatabase) {
-  if (!ReplacementInUse())
-    GTEST_SKIP() << "operator new is not this program's (a memory checker replaced it)";
+TEST_F(TdmAllocFaultTest, FailedAllocationWhileSavingKeepsThePreviousDatabase) {
   TempDir dir;
   std::string const path = dir.File("d.odb");
   TypedDesign design;
@@ -229,20 +228,7 @@ TEST(TdmAllocFaultTest, FailedAllocationWhileSavingKeepsThePreviousDatabase) {
       break;
     ASSERT_EQ(FileBytes(path), previous);
   }
-  auto reopened = std::make_unique<Lum_TdmModel>("r", "r", "");
-  reopened->Open(path.c_str());
-  EXPECT_NE(FirstView(*reopened)->GetBlock()->GetBlockByName("u1"), nullptr);
-}
-
-// The binding of a block and its pins, in host order.
-std::string BindingOf(Lum_TdmBlock *block) {
-  std::string text = block->GetTypeBlock() ? block->GetTypeBlock()->GetUniqueTag().str() : "-";
-  for (std::size_t i = 0; i < block->GetPins().size(); ++i) {
-    Lum_TdmPin *pin = block->GetPin(i);
-    text += std::string(" ") + pin->GetName() + ">" +
-            (pin->GetTypePin() ? pin->GetTypePin()->GetName() : "-");
-  }
-  return text;
+  EXPECT_NE(FirstView(*OpenModel(path))->GetBlock()->GetBlockByName("u1"), nullptr);
 }
 
 int NoSync(int) { return 0; }
@@ -252,9 +238,7 @@ int NoSync(int) { return 0; }
 // the call throws std::bad_alloc or a library exception, a failed rebinding
 // leaves the block's binding and pins as they were, no object is left that
 // the model counts but cannot reach, and the design still saves and reopens.
-TEST(TdmAllocFaultTest, FailedAllocationInCallerOperationsKeepsTheDesignWhole) {
-  if (!ReplacementInUse())
-    GTEST_SKIP() << "operator new is not this program's (a memory checker replaced it)";
+TEST_F(TdmAllocFaultTest, FailedAllocationInCallerOperationsKeepsTheDesignWhole) {
   FaultDesign design;
   // Thousands of saves: durability is not what this test is about.
   Orb_FileOps fast = Orb_FileOps::Get();
@@ -281,7 +265,7 @@ TEST(TdmAllocFaultTest, FailedAllocationInCallerOperationsKeepsTheDesignWhole) {
       for (std::size_t i = 0; i < u4->GetPins().size(); ++i)
         map.SetPinMap(u4->GetPin(i), reg->GetPinByName(u4->GetPin(i)->GetName()));
       Lum_TdmBlock *rebound = operation == 0 ? u2 : u4;
-      std::string const before = BindingOf(rebound);
+      std::string const before = FaultDesign::Binding(rebound);
       bool done = false;
       bool failed = false;
       {
@@ -302,12 +286,9 @@ TEST(TdmAllocFaultTest, FailedAllocationInCallerOperationsKeepsTheDesignWhole) {
       }
       ASSERT_TRUE(done || failed) << "an exception without a message";
       if (failed && operation < 2) {
-        EXPECT_EQ(BindingOf(rebound), before) << "a failed rebinding changed the block";
+        EXPECT_EQ(FaultDesign::Binding(rebound), before) << "a failed rebinding changed the block";
       }
-      std::size_t objects = 0;
-      for (unsigned kind = 0; kind < Orb_KindCount; ++kind)
-        objects += model.GetOrbModel()->GetObjectCount(static_cast<Orb_Kind>(kind));
-      ASSERT_EQ(objects, Reachable(*model.GetOrbModel()));
+      ASSERT_EQ(HostObjectCount(model.GetOrbModel()), Reachable(*model.GetOrbModel()));
       view->CommitAll();
       model.Save(design.Scratch("caller.odb").c_str());
       Lum_TdmModel reopened("r", "r", "");

@@ -2,28 +2,11 @@
 
 #include "Lum_TdmTestSupport.h"
 
-#include "Lum_Exception.h"
-
 #include <gtest/gtest.h>
 
 using namespace lumtest;
 
 namespace {
-
-// Subscribed before the library's model, it gives every new design a mark
-// of its own in the creation event.
-class PreMarkingModel : public Orb_ModelDerived {
-public:
-  PreMarkingModel(Orb_Model *host, char const *mark) : Orb_ModelDerived(host), m_Mark(mark) {
-    SetEventNotifyAll();
-  }
-  void SyncEventSpecializeDesignOnCreate(Orb_Design *design) override {
-    design->CreatePropertyString("TDS_DESIGN_TYPE", m_Mark);
-  }
-
-private:
-  char const *m_Mark;
-};
 
 class TdmDesignTest : public ::testing::Test {
 protected:
@@ -31,22 +14,37 @@ protected:
 };
 
 // A new design is marked as a user design, and the mark survives a reopen.
-TEST_F(TdmDesignTest, NewDesignIsMarked) {
+// A loaded design without a mark is a user design; loading writes nothing,
+// the next commit of one of its views marks it, and the mark is stored.
+TEST_F(TdmDesignTest, NewDesignIsMarkedAndUnmarkedOneMarkedByCommit) {
   TypedDesign design;
   EXPECT_EQ(PropertyValue(design.m_pDesign, "TDS_DESIGN_TYPE"), "TDS_DESIGN_TYPE_USER");
   EXPECT_TRUE(design.m_pDesign->IsUserDesign());
-
   auto reopened = SaveAndReopen(design.Model(), m_Dir.File("d.odb"));
-  Lum_TdmDesign *loaded = FirstView(*reopened)->GetParent();
-  EXPECT_EQ(PropertyValue(loaded, "TDS_DESIGN_TYPE"), "TDS_DESIGN_TYPE_USER");
+  EXPECT_EQ(PropertyValue(FirstView(*reopened)->GetParent(), "TDS_DESIGN_TYPE"),
+            "TDS_DESIGN_TYPE_USER");
+
+  design.m_pDesign->DeleteProperty("TDS_DESIGN_TYPE");
+  reopened = SaveAndReopen(design.Model(), m_Dir.File("unmarked.odb"));
+  Lum_TdmView *view = FirstView(*reopened);
+  Lum_TdmDesign *loaded = view->GetParent();
+  EXPECT_EQ(PropertyValue(loaded, "TDS_DESIGN_TYPE"), "<absent>") << "loading writes nothing";
   EXPECT_TRUE(loaded->IsUserDesign());
+  view->CommitAll();
+  EXPECT_EQ(PropertyValue(loaded, "TDS_DESIGN_TYPE"), "TDS_DESIGN_TYPE_USER");
+  auto again = SaveAndReopen(*reopened, m_Dir.File("d2.odb"));
+  EXPECT_EQ(PropertyValue(FirstView(*again)->GetParent(), "TDS_DESIGN_TYPE"),
+            "TDS_DESIGN_TYPE_USER");
 }
 
 // A mark given before the library's creation event is kept, even a foreign
 // one, and creating such a design reports nothing.
 TEST_F(TdmDesignTest, ExistingMarkIsNeverOverwritten) {
   Orb_Model host("h", "h", "", false);
-  PreMarkingModel first(&host, "TDS_DESIGN_TYPE_LIBRARY");
+  EarlierSubscriber first(&host);
+  first.m_OnDesign = [](Orb_Design *design) {
+    design->CreatePropertyString("TDS_DESIGN_TYPE", "TDS_DESIGN_TYPE_LIBRARY");
+  };
   Lum_TdmModel model(&host);
   Port_MsgCapture capture;
   Orb_Design *design = host.CreateDesignMgr("dm")->CreateDesign("d");
@@ -57,91 +55,56 @@ TEST_F(TdmDesignTest, ExistingMarkIsNeverOverwritten) {
   EXPECT_FALSE(Lum_TdmDesign::IsUserDesign(*design));
 }
 
-// A loaded design without a mark is a user design; the next commit of one of
-// its views marks it, and the mark is stored.
-TEST_F(TdmDesignTest, UnmarkedDesignIsAcceptedAndMarkedByCommit) {
-  TypedDesign design;
-  design.m_pDesign->DeleteProperty("TDS_DESIGN_TYPE");
-  auto reopened = SaveAndReopen(design.Model(), m_Dir.File("d.odb"));
-  Lum_TdmView *view = FirstView(*reopened);
-  ASSERT_NE(view, nullptr);
-  Lum_TdmDesign *loaded = view->GetParent();
-  EXPECT_EQ(PropertyValue(loaded, "TDS_DESIGN_TYPE"), "<absent>") << "loading writes nothing";
-  EXPECT_TRUE(loaded->IsUserDesign());
-
-  view->CommitAll();
-  EXPECT_EQ(PropertyValue(loaded, "TDS_DESIGN_TYPE"), "TDS_DESIGN_TYPE_USER");
-  auto again = SaveAndReopen(*reopened, m_Dir.File("d2.odb"));
-  EXPECT_EQ(PropertyValue(FirstView(*again)->GetParent(), "TDS_DESIGN_TYPE"),
-            "TDS_DESIGN_TYPE_USER");
-}
-
-// A view of a design with a foreign mark is committed without its design.
-TEST_F(TdmDesignTest, CommitLeavesForeignDesignAlone) {
-  TypedDesign design;
-  design.m_pDesign->CreatePropertyString("TDS_DESIGN_TYPE", "OTHER");
-  design.m_pView->CommitAll();
-  EXPECT_EQ(PropertyValue(design.m_pDesign, "TDS_DESIGN_TYPE"), "OTHER");
-}
-
-class ForeignMarkTest : public ::testing::TestWithParam<char const *> {
-protected:
-  TempDir m_Dir;
-};
-
 // Any mark other than exactly "TDS_DESIGN_TYPE_USER" is refused on load, and
 // the refused open leaves no client and no host object behind.
-TEST_P(ForeignMarkTest, LoadRefusesForeignMark) {
-  std::string const path = m_Dir.File("d.odb");
-  {
-    TypedDesign design;
-    design.m_pView->CreateTopBlock("top")->CreatePin("p", Orb_Pin::PIN_INPUT);
-    design.m_pDesign->CreatePropertyString("TDS_DESIGN_TYPE", GetParam());
-    design.Model().Save(path.c_str());
+TEST_F(TdmDesignTest, LoadRefusesForeignMarks) {
+  for (char const *mark :
+       {"TDS_DESIGN_TYPE_LIBRARY", "", "tds_design_type_user", "TDS_DESIGN_TYPE_USER ",
+        " TDS_DESIGN_TYPE_USER", "TDS_DESIGN_TYPE_USERS"}) {
+    SCOPED_TRACE(std::string("mark <") + mark + ">");
+    std::string const path = m_Dir.File("d.odb");
+    {
+      TypedDesign design;
+      design.m_pView->CreateTopBlock("top")->CreatePin("p", Orb_Pin::PIN_INPUT);
+      design.m_pDesign->CreatePropertyString("TDS_DESIGN_TYPE", mark);
+      design.Model().Save(path.c_str());
+    }
+    Lum_TdmModel reopened("r", "r", "");
+    try {
+      reopened.Open(path.c_str());
+      ADD_FAILURE() << "the design was accepted";
+    } catch (Lum_ExceptionDesignLoad const &e) {
+      EXPECT_EQ(e.GetMessage(), "Attempt to specialize non-Tdm design.");
+      EXPECT_EQ(e.GetObjectName(), "top");
+      EXPECT_EQ(e.GetSubsystem(), "Lum");
+      EXPECT_EQ(e.GetFile(), "../s/Lum_TdmDesign");
+      EXPECT_FALSE(e.GetFlag());
+    }
+    EXPECT_EQ(reopened.GetClientCount(), 0u);
+    EXPECT_TRUE(reopened.GetOrbModel()->GetDesignMgrs().empty());
   }
-  Lum_TdmModel reopened("r", "r", "");
-  try {
-    reopened.Open(path.c_str());
-    FAIL() << "a design marked <" << GetParam() << "> was accepted";
-  } catch (Lum_ExceptionDesignLoad const &e) {
-    EXPECT_EQ(e.GetMessage(), "Attempt to specialize non-Tdm design.");
-    EXPECT_EQ(e.GetObjectName(), "top");
-    EXPECT_EQ(e.GetSubsystem(), "Lum");
-    EXPECT_EQ(e.GetFile(), "../s/Lum_TdmDesign");
-    EXPECT_FALSE(e.GetFlag());
-  }
-  EXPECT_EQ(reopened.GetClientCount(), 0u);
-  EXPECT_TRUE(reopened.GetOrbModel()->GetDesignMgrs().empty());
 }
 
-INSTANTIATE_TEST_SUITE_P(Marks, ForeignMarkTest,
-                         ::testing::Values("TDS_DESIGN_TYPE_LIBRARY", "", "tds_design_type_user",
-                                           "TDS_DESIGN_TYPE_USER ", " TDS_DESIGN_TYPE_USER",
-                                           "TDS_DESIGN_TYPE_USERS"));
-
-// The static tests read the host design directly and need no client.
+// The static tests read the host design directly and need no client; a type
+// block's design, made by the type-library component, is a type block
+// design and not a user design.
 TEST_F(TdmDesignTest, StaticTestsNeedNoClient) {
   Orb_Model host("h", "h", "", false);
   Orb_Design *design = host.CreateDesignMgr("dm")->CreateDesign("d");
-  EXPECT_TRUE(Lum_TdmDesign::IsUserDesign(*design));
-  EXPECT_FALSE(Lum_TdmDesign::IsTypeBlockDesign(*design));
-  design->CreatePropertyString("TDS_DESIGN_TYPE", "TDS_DESIGN_TYPE_LIBRARY");
-  EXPECT_FALSE(Lum_TdmDesign::IsUserDesign(*design));
-  EXPECT_TRUE(Lum_TdmDesign::IsTypeBlockDesign(*design));
-  design->CreatePropertyString("TDS_DESIGN_TYPE", "TDS_DESIGN_TYPE_USER");
-  EXPECT_TRUE(Lum_TdmDesign::IsUserDesign(*design));
-  EXPECT_FALSE(Lum_TdmDesign::IsTypeBlockDesign(*design));
-}
+  for (char const *mark : {"", "TDS_DESIGN_TYPE_LIBRARY", "TDS_DESIGN_TYPE_USER"}) {
+    if (*mark)
+      design->CreatePropertyString("TDS_DESIGN_TYPE", mark);
+    bool const library = std::string(mark) == "TDS_DESIGN_TYPE_LIBRARY";
+    EXPECT_EQ(Lum_TdmDesign::IsUserDesign(*design), !library) << mark;
+    EXPECT_EQ(Lum_TdmDesign::IsTypeBlockDesign(*design), library) << mark;
+  }
 
-// A type block's design, made by the type-library component, is a type
-// block design and not a user design.
-TEST_F(TdmDesignTest, TypeBlockDesignAsTheComponentSays) {
-  TestLibrary library("LIBD", 1, 0);
-  Lum_TlmBlock *typeBlock = library.AddTypeBlock("AND2", {"A", "B"});
-  Orb_Design const &design = *typeBlock->GetView()->GetParent()->GetOrbDesign();
-  EXPECT_EQ(Lum_TdmDesign::IsTypeBlockDesign(design), Lum_TlmDesign::IsTypeBlockDesign(design));
-  EXPECT_TRUE(Lum_TdmDesign::IsTypeBlockDesign(design));
-  EXPECT_FALSE(Lum_TdmDesign::IsUserDesign(design));
+  TestLibrary typeLibrary("LIBD", 1, 0);
+  Lum_TlmBlock *typeBlock = typeLibrary.AddTypeBlock("AND2", {"A", "B"});
+  Orb_Design const &typeDesign = *typeBlock->GetView()->GetParent()->GetOrbDesign();
+  EXPECT_TRUE(Lum_TdmDesign::IsTypeBlockDesign(typeDesign));
+  EXPECT_TRUE(Lum_TlmDesign::IsTypeBlockDesign(typeDesign));
+  EXPECT_FALSE(Lum_TdmDesign::IsUserDesign(typeDesign));
 }
 
 } // namespace

@@ -77,23 +77,28 @@ public:
     view->CreateTopBlock("t")->CreatePin("p", Orb_Pin::PIN_INPUT);
   }
 
+  // The binding of a block: its type block's tag, then each pin's name and
+  // type pin in host order ("-" for none).
+  static std::string Binding(Lum_TdmBlock *block) {
+    std::string text = block->GetTypeBlock() ? block->GetTypeBlock()->GetUniqueTag().str() : "-";
+    text += "(";
+    for (std::size_t p = 0; p < block->GetPins().size(); ++p) {
+      Lum_TdmPin *pin = block->GetPin(p);
+      text += std::string(p ? "," : "") + pin->GetName() + ">" +
+              (pin->GetTypePin() ? pin->GetTypePin()->GetName() : "-");
+    }
+    return text + ")";
+  }
+
   // The typing a successful open gives, block by block.
   static std::string Typing(Lum_TdmModel &model) {
-    Lum_TdmView *view =
-        model.GetDesignMgrByName("dm")->GetDesignByName("top")->GetViewByName("netlist");
+    Lum_TdmBlock *top = model.GetDesignMgrByName("dm")
+                            ->GetDesignByName("top")
+                            ->GetViewByName("netlist")
+                            ->GetBlock();
     std::string text;
-    Lum_TdmBlock *top = view->GetBlock();
-    for (std::size_t i = 0; i < top->GetBlocks().size(); ++i) {
-      Lum_TdmBlock *block = top->GetBlock(i);
-      text += std::string(block->GetName()) + "=" +
-              (block->GetTypeBlock() ? block->GetTypeBlock()->GetUniqueTag().str() : "-") + "(";
-      for (std::size_t p = 0; p < block->GetPins().size(); ++p) {
-        Lum_TdmPin *pin = block->GetPin(p);
-        text += std::string(p ? "," : "") + pin->GetName() + ">" +
-                (pin->GetTypePin() ? pin->GetTypePin()->GetName() : "-");
-      }
-      text += ") ";
-    }
+    for (std::size_t i = 0; i < top->GetBlocks().size(); ++i)
+      text += std::string(top->GetBlock(i)->GetName()) + "=" + Binding(top->GetBlock(i)) + " ";
     return text;
   }
 
@@ -125,8 +130,7 @@ inline std::ostream &operator<<(std::ostream &out, ModelState const &state) {
 inline ModelState StateOf(Lum_TdmModel &model, std::string const &savePath) {
   ModelState state;
   Orb_Model const *host = model.GetOrbModel();
-  for (unsigned k = 0; k < Orb_KindCount; ++k)
-    state.hostObjects += host->GetObjectCount(static_cast<Orb_Kind>(k));
+  state.hostObjects = HostObjectCount(host);
   state.clients = model.GetClientCount();
   state.hasLocalLibrary = host->GetCompanion(Lum_TlmNames::kLocalLibraryCompanion) != nullptr;
   model.Save(savePath.c_str());

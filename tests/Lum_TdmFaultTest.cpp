@@ -190,7 +190,8 @@ std::string Listing(std::string const &directory) {
 // Every write of a multi-buffer save, the sync, the close and the rename:
 // each failure throws Orb_Exception naming the file and the failed step,
 // leaves the previous database byte for byte and no temporary file; the
-// next save without faults succeeds.
+// next save without faults succeeds, and so does one whose writes take only
+// part of what they are given.
 TEST(TdmSaveFaultTest, FailedWriteSyncCloseOrRenameKeepsThePreviousDatabase) {
   TempDir dir;
   std::string const path = dir.File("d.odb");
@@ -209,19 +210,12 @@ TEST(TdmSaveFaultTest, FailedWriteSyncCloseOrRenameKeepsThePreviousDatabase) {
   ASSERT_GE(writes, 3) << "the save fits one buffer";
   std::filesystem::remove(dir.File("count.odb"));
 
-  std::vector<std::pair<std::string, SaveFault>> cases;
-  for (int n = 1; n <= writes; ++n) {
-    SaveFault fault;
-    fault.failWrite = n;
-    cases.emplace_back("cannot write", fault);
-  }
-  SaveFault sync, close, rename;
-  sync.failSync = true;
-  close.failClose = true;
-  rename.failRename = true;
-  cases.emplace_back("cannot flush", sync);
-  cases.emplace_back("cannot close", close);
-  cases.emplace_back("cannot rename", rename);
+  std::vector<std::pair<std::string, SaveFault>> cases{
+      {"cannot flush", SaveFault{0, true}},
+      {"cannot close", SaveFault{0, false, true}},
+      {"cannot rename", SaveFault{0, false, false, true}}};
+  for (int n = 1; n <= writes; ++n)
+    cases.emplace_back("cannot write", SaveFault{n});
 
   for (auto const &[step, fault] : cases) {
     SCOPED_TRACE(step + " (write " + std::to_string(fault.failWrite) + ")");
@@ -239,25 +233,15 @@ TEST(TdmSaveFaultTest, FailedWriteSyncCloseOrRenameKeepsThePreviousDatabase) {
   }
 
   design.Model().Save(path.c_str());
-  auto reopened = std::make_unique<Lum_TdmModel>("r", "r", "");
-  reopened->Open(path.c_str());
-  EXPECT_EQ(FirstView(*reopened)->GetBlock()->GetBlockByName("wide")->GetPins().size(), 4000u);
-}
-
-// Writes that take only part of what they are given still save every byte.
-TEST(TdmSaveFaultTest, ShortWritesSaveEverything) {
-  TempDir dir;
-  TypedDesign design;
-  design.m_pView->CreateTopBlock("top");
-  AddManyPins(design.Model(), 500);
-  design.Model().Save(dir.File("whole.odb").c_str());
-  SaveFault fault;
-  fault.maxChunk = 7;
+  EXPECT_EQ(FirstView(*OpenModel(path))->GetBlock()->GetBlockByName("wide")->GetPins().size(),
+            4000u);
+  SaveFault shortWrites;
+  shortWrites.maxChunk = 7;
   {
-    FaultyFileOps faulty(fault);
+    FaultyFileOps faulty(shortWrites);
     design.Model().Save(dir.File("short.odb").c_str());
   }
-  EXPECT_EQ(FileBytes(dir.File("short.odb")), FileBytes(dir.File("whole.odb")));
+  EXPECT_EQ(FileBytes(dir.File("short.odb")), FileBytes(path));
 }
 
 } // namespace

@@ -114,10 +114,6 @@ TEST_F(TdmModelTest, BothConstructorsSubscribe) {
   Lum_TdmModel own("name", "dbname", "path");
   EXPECT_TRUE(own.IsSubscribed());
   EXPECT_TRUE(own.OwnsOrbModel());
-  EXPECT_STREQ(own.GetOrbModel()->GetName(), "name");
-  EXPECT_STREQ(own.GetDbName(), "dbname");
-  EXPECT_STREQ(own.GetOrbModel()->GetPath(), "path");
-  EXPECT_FALSE(own.GetOrbModel()->IsReadOnly());
 
   Orb_Model host("h", "hdb", "", false);
   {

@@ -1,7 +1,8 @@
 #pragma once
 
 // Shared fixtures of the library's tests: temporary directories, a typed
-// design with one view, in-memory type libraries, and save-and-reopen.
+// design with one view, in-memory type libraries, save-and-reopen, and the
+// texts that tests compare.
 
 #include "Lum_TdmBlock.h"
 #include "Lum_TdmDesign.h"
@@ -12,6 +13,7 @@
 #include "Lum_TdmSignal.h"
 #include "Lum_TdmView.h"
 
+#include "Lum_Exception.h"
 #include "Lum_Tlm.h"
 #include "Port_MsgManData.h"
 
@@ -20,6 +22,7 @@
 #include <cstdlib>
 #include <filesystem>
 #include <fstream>
+#include <functional>
 #include <iterator>
 #include <memory>
 #include <string>
@@ -98,12 +101,74 @@ struct TypedDesign {
   Lum_TdmView *m_pView = nullptr;
 };
 
+// Opens the database at `path` in a fresh model.
+inline std::unique_ptr<Lum_TdmModel> OpenModel(std::string const &path) {
+  auto model = std::make_unique<Lum_TdmModel>("reopened", "reopened", path.c_str());
+  model->Open(path.c_str());
+  return model;
+}
+
+// A client model that builds blocks of class Block and views of class View,
+// for tests that override what those clients do.
+template <class Block, class View = Lum_TdmView> class ClientModel : public Lum_TdmModel {
+public:
+  explicit ClientModel(char const *name = "clients") : Lum_TdmModel(name, name, "") {}
+  void SyncEventSpecializeBlockOnCreate(Orb_Block *block) override { new Block(this, block, true); }
+  void SyncEventSpecializeBlockOnLoad(Orb_Block *block) override { new Block(this, block, false); }
+  void SyncEventSpecializeViewOnCreate(Orb_View *view) override { new View(this, view, true); }
+  void SyncEventSpecializeViewOnLoad(Orb_View *view) override { new View(this, view, false); }
+};
+
+// Subscribed to a host model before the library's client model, it sees each
+// new design and view first, in their creation events.
+class EarlierSubscriber : public Orb_ModelDerived {
+public:
+  explicit EarlierSubscriber(Orb_Model *host) : Orb_ModelDerived(host) { SetEventNotifyAll(); }
+  void SyncEventSpecializeDesignOnCreate(Orb_Design *design) override {
+    if (m_OnDesign)
+      m_OnDesign(design);
+  }
+  void SyncEventSpecializeViewOnCreate(Orb_View *view) override {
+    if (m_OnView)
+      m_OnView(view);
+  }
+
+  std::function<void(Orb_Design *)> m_OnDesign;
+  std::function<void(Orb_View *)> m_OnView;
+};
+
 // Saves the model to `path` and opens it in a fresh model.
 inline std::unique_ptr<Lum_TdmModel> SaveAndReopen(Lum_TdmModel &model, std::string const &path) {
   model.Save(path.c_str());
-  auto reopened = std::make_unique<Lum_TdmModel>("reopened", "reopened", path.c_str());
-  reopened->Open(path.c_str());
-  return reopened;
+  return OpenModel(path);
+}
+
+// The host objects of every kind that a host model counts.
+inline std::size_t HostObjectCount(Orb_Model const *host) {
+  std::size_t count = 0;
+  for (unsigned k = 0; k < Orb_KindCount; ++k)
+    count += host->GetObjectCount(static_cast<Orb_Kind>(k));
+  return count;
+}
+
+// What an action threw, as "class|object|message" for the library's
+// exceptions, or "no failure".
+template <class Action> std::string Failure(Action const &action) {
+  auto const text = [](char const *kind, Lum_Exception const &e) {
+    return kind + ("|" + e.GetObjectName()) + "|" + e.GetMessage();
+  };
+  try {
+    action();
+  } catch (Lum_ExceptionInvalidTypeBlock const &e) {
+    return text("InvalidTypeBlock", e);
+  } catch (Lum_ExceptionCorruptDatabase const &e) {
+    return text("CorruptDatabase", e);
+  } catch (Lum_ExceptionInvalidLibrary const &e) {
+    return text("InvalidLibrary", e);
+  } catch (Lum_ExceptionDesignLoad const &e) {
+    return text("DesignLoad", e);
+  }
+  return "no failure";
 }
 
 // The first view of the first design of the first design manager.
@@ -132,6 +197,14 @@ inline std::string ListValue(Orb_ClientObject const *object, char const *name) {
   for (std::string const &entry : property->GetStrings())
     joined += (joined.empty() ? "" : "|") + entry;
   return joined;
+}
+
+// Names of objects joined with ",", "null" standing for a null pointer.
+template <class Object> std::string Names(std::vector<Object *> const &objects) {
+  std::string text;
+  for (Object *object : objects)
+    text += (text.empty() ? "" : ",") + std::string(object ? object->GetName() : "null");
+  return text;
 }
 
 // The bytes of a file.

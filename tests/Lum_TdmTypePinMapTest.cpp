@@ -78,7 +78,8 @@ TEST_F(TdmTypePinMapTest, PinLookupMatchesTheWholeName) {
 }
 
 // Equality ignores insertion order and the default flag, compares type pins
-// by identity and sizes first; copies are equal and independent.
+// by identity and sizes first, and lets a stored null match a missing name;
+// copies are equal and independent.
 TEST_F(TdmTypePinMapTest, EqualityIsByEntriesOnly) {
   Lum_TdmTypePinMap left, right;
   left.SetDefaultMap(true);
@@ -105,11 +106,9 @@ TEST_F(TdmTypePinMapTest, EqualityIsByEntriesOnly) {
   right = larger;
   EXPECT_TRUE(right == larger);
   EXPECT_TRUE(right.IsDefaultMap());
-}
 
-// A name mapped to null on the left matches a missing name on the right,
-// but not the other way round.
-TEST_F(TdmTypePinMapTest, StoredNullMakesEqualityAsymmetric) {
+  // A name mapped to null on the left matches a missing name on the right,
+  // but not the other way round.
   Lum_TdmTypePinMap withNull, withOther;
   withNull.SetPinMap("A", nullptr);
   withNull.SetPinMap("B", m_pD1);
@@ -145,7 +144,8 @@ protected:
 };
 
 // Equal maps under one key share the stored copy, which is never the caller's
-// object and does not follow later changes to it.
+// object and does not follow later changes to it; the first map stored
+// under a key fixes the copy's default flag.
 TEST_F(TdmTypePinMapMgrTest, EqualMapsShareOneCopyPerKey) {
   Lum_TdmTypePinMap first = DataMap();
   Lum_TdmTypePinMap const *shared = m_Manager.GetTypePinMap("dff", &first);
@@ -165,50 +165,40 @@ TEST_F(TdmTypePinMapMgrTest, EqualMapsShareOneCopyPerKey) {
   Lum_TdmTypePinMap const *changed = m_Manager.GetTypePinMap("dff", &first);
   EXPECT_NE(changed, shared);
   EXPECT_EQ(changed->GetPinMapping(Port::StringBase<char>("CLOCK")), m_pClk);
-}
 
-// The first map stored under a key fixes the default flag of the shared copy.
-TEST_F(TdmTypePinMapMgrTest, FirstStoredFlagWins) {
+  // The first map stored under a key fixes the default flag of the copy.
   Lum_TdmTypePinMap const plain = DataMap(false);
   Lum_TdmTypePinMap const flagged = DataMap(true);
-  Lum_TdmTypePinMap const *shared = m_Manager.GetTypePinMap("dff", &plain);
-  EXPECT_EQ(m_Manager.GetTypePinMap("dff", &flagged), shared);
-  EXPECT_FALSE(shared->IsDefaultMap());
+  Lum_TdmTypePinMap const *plainFirst = m_Manager.GetTypePinMap("plain", &plain);
+  EXPECT_EQ(m_Manager.GetTypePinMap("plain", &flagged), plainFirst);
+  EXPECT_FALSE(plainFirst->IsDefaultMap());
 
   Lum_TdmTypePinMap const *flaggedFirst = m_Manager.GetTypePinMap("flagged", &flagged);
   EXPECT_TRUE(flaggedFirst->IsDefaultMap());
 }
 
 // The caller's map is compared on the left: one whose extra name maps to null
-// matches a stored map of the same size, while the reverse does not.
-TEST_F(TdmTypePinMapMgrTest, CallerMapIsOnTheLeft) {
+// matches a stored map of the same size, while the reverse does not. A new
+// key with an empty map stores one empty map; a null map is refused.
+TEST_F(TdmTypePinMapMgrTest, CallerMapIsOnTheLeftEmptyAndNullMaps) {
   Lum_TdmTypePinMap const stored = DataMap(); // DATA -> D0, OUT -> D1
   Lum_TdmTypePinMap withNull;                 // DATA -> D0, NC -> null
   withNull.SetPinMap(Port::StringBase<char>("DATA"), m_pD0);
   withNull.SetPinMap(Port::StringBase<char>("NC"), nullptr);
-
   Lum_TdmTypePinMap const *shared = m_Manager.GetTypePinMap("dff", &stored);
   EXPECT_EQ(m_Manager.GetTypePinMap("dff", &withNull), shared);
 
   Lum_TdmTypePinMap const *nullFirst = m_Manager.GetTypePinMap("nulls", &withNull);
   EXPECT_NE(m_Manager.GetTypePinMap("nulls", &stored), nullFirst);
-}
 
-// A new key with an empty map stores one empty map; a null map is refused.
-TEST_F(TdmTypePinMapMgrTest, EmptyAndNullMaps) {
   Lum_TdmTypePinMap const empty;
-  Lum_TdmTypePinMap const *stored = m_Manager.GetTypePinMap("empty", &empty);
-  ASSERT_NE(stored, nullptr);
-  EXPECT_EQ(stored->GetNumPins(), 0u);
-  EXPECT_EQ(m_Manager.GetTypePinMap("empty", &empty), stored);
+  Lum_TdmTypePinMap const *storedEmpty = m_Manager.GetTypePinMap("empty", &empty);
+  ASSERT_NE(storedEmpty, nullptr);
+  EXPECT_EQ(storedEmpty->GetNumPins(), 0u);
+  EXPECT_EQ(m_Manager.GetTypePinMap("empty", &empty), storedEmpty);
 
-  try {
-    m_Manager.GetTypePinMap("dff", nullptr);
-    FAIL() << "a null map was accepted";
-  } catch (Lum_ExceptionInvalidTypeBlock const &e) {
-    EXPECT_EQ(e.GetObjectName(), "dff");
-    EXPECT_EQ(e.GetMessage(), "Null type pin map specified in GetTypePinMap.");
-  }
+  EXPECT_EQ(Failure([&] { m_Manager.GetTypePinMap("dff", nullptr); }),
+            "InvalidTypeBlock|dff|Null type pin map specified in GetTypePinMap.");
 }
 
 } // namespace
