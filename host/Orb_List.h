@@ -26,6 +26,7 @@
 #include <memory>
 #include <new>
 #include <string_view>
+#include <utility>
 #include <vector>
 
 struct Orb_ChildSlot;
@@ -250,7 +251,15 @@ public:
   void Erase(T *item) noexcept;
   // Indexes exactly `items` (of distinct names), with room for `count` names
   // in all. Throws std::bad_alloc and changes nothing when out of memory.
-  template <class Items> void Rebuild(std::size_t count, Items const &items);
+  template <class Items> void Rebuild(std::size_t count, Items const &items) {
+    Build(count, items, false);
+  }
+  // Rebuild for items whose names are not known to differ: returns an item
+  // whose name an earlier item has, and then changes nothing; else indexes
+  // them and returns null.
+  template <class Items> T *RebuildChecked(std::size_t count, Items const &items) {
+    return Build(count, items, true);
+  }
   void Clear() noexcept {
     Free(m_pTable);
     m_pTable = nullptr;
@@ -261,6 +270,8 @@ public:
 
 private:
   static constexpr std::size_t kGroupSlots = 7;
+  // From this many items on, Build sorts them before filling the table.
+  static constexpr std::size_t kSortedFill = 4096;
   static constexpr std::uint8_t kEmpty = 0;
   static constexpr std::uint8_t kTombstone = 1;
   struct alignas(64) Group {
@@ -290,6 +301,14 @@ private:
     auto const top = static_cast<std::uint8_t>(hash >> (8 * sizeof(std::size_t) - 8));
     return top > kTombstone ? top : static_cast<std::uint8_t>(top + 2);
   }
+  template <class Items> T *Build(std::size_t count, Items const &items, bool check);
+  // Fills a fresh table with `n` items whose hashes are known, in the order
+  // given; returns a duplicate if `check` finds one.
+  struct Hashed {
+    std::size_t hash;
+    T *item;
+  };
+  static T *Fill(Table &table, Hashed const *hashed, std::size_t n, bool sorted, bool check);
   static void Free(Table *table) noexcept {
     if (table)
       ::operator delete(table, std::align_val_t(alignof(Table)));
@@ -364,23 +383,79 @@ template <class T> void Orb_NameIndex<T>::Erase(T *item) noexcept {
 
 template <class T>
 template <class Items>
-void Orb_NameIndex<T>::Rebuild(std::size_t count, Items const &items) {
+T *Orb_NameIndex<T>::Build(std::size_t count, Items const &items, bool check) {
+  std::size_t const n = items.size();
   // Groups enough that `count` names fill at most 7/8 of the slots.
-  std::size_t const groups =
-      std::max<std::size_t>(1, (8 * std::max<std::size_t>(count, items.size()) + 48) / 49);
+  std::size_t const groups = std::max<std::size_t>(1, (8 * std::max(count, n) + 48) / 49);
+  std::vector<Hashed> hashed;
+  hashed.reserve(n);
+  for (T *item : items)
+    hashed.push_back({Hash(item->GetNameString()), item});
+  // A large table is filled in the order of the home slots, so that it is
+  // written from front to back rather than at random: the home slot grows
+  // with the hash's low 32 bits, and a stable radix sort on them (three
+  // passes of 11 bits) keeps items of one name in their given order.
+  if (n >= kSortedFill) {
+    std::vector<Hashed> other(n);
+    for (unsigned shift = 0; shift < 33; shift += 11) {
+      std::vector<std::size_t> start(std::size_t(1) << 11, 0);
+      auto const digit = [shift](Hashed const &h) {
+        return (std::uint32_t(h.hash) >> shift) & ((1u << 11) - 1);
+      };
+      for (Hashed const &h : hashed)
+        ++start[digit(h)];
+      std::size_t sum = 0;
+      for (std::size_t &s : start)
+        sum += std::exchange(s, sum);
+      for (Hashed const &h : hashed)
+        other[start[digit(h)]++] = h;
+      hashed.swap(other);
+    }
+  }
   void *block =
       ::operator new(sizeof(Table) + groups * sizeof(Group), std::align_val_t(alignof(Table)));
   auto *table = new (block) Table{groups * kGroupSlots, groups * kGroupSlots * 7 / 8, 0, 0};
   std::uninitialized_value_construct_n(table->Groups(), groups);
-  for (T *item : items) {
-    std::size_t const hash = Hash(item->GetNameString());
-    std::size_t i = table->Home(hash);
-    while (table->TagAt(i) != kEmpty)
-      i = table->Next(i);
-    table->TagAt(i) = Tag(hash);
-    table->ItemAt(i) = item;
+  if (T *duplicate = Fill(*table, hashed.data(), n, n >= kSortedFill, check)) {
+    Free(table);
+    return duplicate;
   }
-  table->used = table->count = items.size();
+  table->used = table->count = n;
   Free(m_pTable);
   m_pTable = table;
+  return nullptr;
+}
+
+template <class T>
+T *Orb_NameIndex<T>::Fill(Table &table, Hashed const *hashed, std::size_t n, bool sorted,
+                          bool check) {
+  std::size_t cursor = 0; // Sorted: one past the last slot filled.
+  for (std::size_t k = 0; k < n; ++k) {
+    Hashed const &h = hashed[k];
+    std::size_t i = table.Home(h.hash);
+    if (sorted) {
+      // Items of one name share their sort key and keep their order.
+      auto const key = std::uint32_t(h.hash);
+      for (std::size_t j = k; check && j-- > 0 && std::uint32_t(hashed[j].hash) == key;)
+        if (hashed[j].hash == h.hash && hashed[j].item->GetNameString() == h.item->GetNameString())
+          return h.item;
+      // Homes come in order: the slots from the last home to the cursor are
+      // taken, those after it free. Past the end, probe on from the front.
+      i = std::max(i, cursor);
+      if (i < table.slots) {
+        cursor = i + 1;
+      } else {
+        for (i = 0; table.TagAt(i) != kEmpty;)
+          i = table.Next(i);
+      }
+    } else {
+      for (; table.TagAt(i) != kEmpty; i = table.Next(i))
+        if (check && table.TagAt(i) == Tag(h.hash) &&
+            table.ItemAt(i)->GetNameString() == h.item->GetNameString())
+          return h.item;
+    }
+    table.TagAt(i) = Tag(h.hash);
+    table.ItemAt(i) = h.item;
+  }
+  return nullptr;
 }

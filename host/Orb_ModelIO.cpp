@@ -127,6 +127,11 @@ private:
   // Puts a new object into its parent's container; a sibling of the same
   // name frees it and refuses the file.
   void Place(Orb_Persistent *object, char const *kind) const;
+  // Appends a block's new pin, signal or child block without looking at
+  // names; CheckNames refuses the file when the block's record ends if two
+  // children of one kind share a name.
+  template <class T> static void Append(Orb_NamedList<T> &list, T *child);
+  void CheckNames(Orb_Block *block) const;
   [[noreturn]] void Duplicate(char const *kind, std::string const &name,
                               Orb_Persistent const *parent) const;
 
@@ -568,15 +573,15 @@ void Orb_ModelIO::ReadBlock(Orb_Block *top) {
       if (code > Orb_Pin::PIN_BIDIRECTIONAL)
         m_pIn->Corrupt("unknown direction of pin " + Quote(name));
       auto const direction = static_cast<Orb_Pin::PIN_DIRECTION>(code);
-      auto *pin = model->Make<Orb_Pin>(model, block, std::move(name), direction);
-      Place(pin, "pin");
+      auto *pin = model->Make<Orb_Pin>(model, block, name, direction);
+      Append(block->m_Pins, pin);
       m_Pins.push_back(pin);
       holder = pin;
     } else if (tag == 'S') {
       std::string name = ReadName("signal");
       m_pIn->End();
-      auto *signal = model->Make<Orb_Signal>(model, block, std::move(name));
-      Place(signal, "signal");
+      auto *signal = model->Make<Orb_Signal>(model, block, name);
+      Append(block->m_Signals, signal);
       m_Signals.push_back(signal);
       holder = signal;
     } else if (tag == 'B') {
@@ -585,12 +590,13 @@ void Orb_ModelIO::ReadBlock(Orb_Block *top) {
       if (open.size() >= Orb_MaxBlockDepth)
         m_pIn->Corrupt("block " + Quote(name) + " nested deeper than " +
                        std::to_string(Orb_MaxBlockDepth) + " levels");
-      auto *child = model->Make<Orb_Block>(model, block, block->m_pView, std::move(name));
-      Place(child, "block");
+      auto *child = model->Make<Orb_Block>(model, block, block->m_pView, name);
+      Append(block->m_Blocks, child);
       open.push_back(child);
       holder = child;
     } else if (tag == 'E') {
       m_pIn->End();
+      CheckNames(block);
       open.pop_back();
       // Properties belong right after their object's record, not after its
       // children.
@@ -720,6 +726,25 @@ void Orb_ModelIO::Place(Orb_Persistent *object, char const *kind) const {
   Orb_Persistent const *parent = object->GetParentObject();
   model->Free(object);
   Duplicate(kind, name, parent);
+}
+
+template <class T> void Orb_ModelIO::Append(Orb_NamedList<T> &list, T *child) {
+  try {
+    list.Append(child);
+  } catch (...) {
+    // In no container: nothing else would ever free it.
+    child->GetModel()->Free(child);
+    throw;
+  }
+}
+
+void Orb_ModelIO::CheckNames(Orb_Block *block) const {
+  if (Orb_Pin const *pin = block->m_Pins.CheckNames())
+    Duplicate("pin", std::string(pin->GetNameString()), block);
+  if (Orb_Signal const *signal = block->m_Signals.CheckNames())
+    Duplicate("signal", std::string(signal->GetNameString()), block);
+  if (Orb_Block const *child = block->m_Blocks.CheckNames())
+    Duplicate("block", std::string(child->GetNameString()), block);
 }
 
 void Orb_ModelIO::Duplicate(char const *kind, std::string const &name,
