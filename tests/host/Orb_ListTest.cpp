@@ -215,4 +215,37 @@ TEST(OrbNameIndexTest, SmallestTableWrapsAndKeepsRefusing) {
   EXPECT_EQ(index.Find("i0"), nullptr);
 }
 
+// A checked rebuild, small (probed) and large (sorted by home slot, so the
+// tail wraps to the front), finds a repeated name wherever it lies and then
+// keeps the old index; without repeats every name is found, and inserting,
+// erasing and finding go on working in the table it made.
+TEST(OrbNameIndexTest, CheckedRebuildFindsRepeatsAndIndexesTheRest) {
+  for (int const n : {40, 5000, 70000}) {
+    SCOPED_TRACE(n);
+    std::vector<std::unique_ptr<Item>> items;
+    std::vector<Item *> all;
+    for (int i = 0; i < n; ++i) {
+      items.push_back(std::make_unique<Item>(i));
+      all.push_back(items.back().get());
+    }
+    Orb_NameIndex<Item> index;
+    for (int const at : {0, n / 2, n - 1}) {
+      std::vector<Item *> repeated = all;
+      Item again(at);
+      repeated.insert(repeated.begin() + (at == n - 1 ? n : at + 1), &again);
+      EXPECT_EQ(index.RebuildChecked(repeated.size(), repeated), &again) << at;
+      EXPECT_FALSE(index.Built());
+    }
+    ASSERT_EQ(index.RebuildChecked(all.size(), all), nullptr);
+    for (Item *item : all)
+      ASSERT_EQ(index.Find(item->name), item) << item->name;
+    EXPECT_EQ(index.Find("i" + std::to_string(n)), nullptr);
+    index.Erase(all[1]);
+    EXPECT_EQ(index.Find("i1"), nullptr);
+    EXPECT_EQ(index.Insert(all[1]), nullptr);
+    Item again(n - 1);
+    EXPECT_EQ(index.Insert(&again), all.back());
+  }
+}
+
 } // namespace
