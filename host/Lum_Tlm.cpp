@@ -18,7 +18,7 @@ char const kRevision[] = "$Revision: 1.1 $";
 
 std::string StringProperty(Orb_ClientObject const *object, char const *name) {
   Orb_Property const *property = object->GetPropertyByName(name);
-  return property && property->GetKind() == Orb_Property::STRING ? property->GetValue()
+  return property && property->GetKind() == Orb_Property::STRING ? std::string(property->GetValue())
                                                                  : std::string();
 }
 

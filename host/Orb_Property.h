@@ -3,8 +3,11 @@
 #include "Lum_PlatformApi.h"
 
 #include <cstddef>
+#include <cstdint>
+#include <cstring>
 #include <memory>
 #include <string>
+#include <string_view>
 #include <vector>
 
 namespace Port {
@@ -14,17 +17,24 @@ class Stream;
 // A named property of a host object: a string, a list of strings, or a list
 // of named string members.
 //
-// Values are arbitrary bytes. A NUL byte, which only the std::string setters
-// (SetStringValue, AppendString) can put in, is a byte like any other: it is
-// copied, saved and read back, and GetValue and GetStrings give every byte;
-// GetStringValue, a C string, ends at the first NUL. Names are C strings and
-// so never hold NUL; a design database with a NUL in any name is refused as
-// corrupt.
+// Values are arbitrary bytes. A NUL byte, which only the length-carrying
+// setters (SetStringValue, AppendString) can put in, is a byte like any
+// other: it is copied, saved and read back, and GetValue and GetStrings give
+// every byte; GetStringValue, a C string, ends at the first NUL. Names are C
+// strings and so never hold NUL; a design database with a NUL in any name is
+// refused as corrupt.
+//
+// Millions of objects carry a property, mostly one short string under a name
+// that many others share, so a property is kept to 24 bytes: the name is
+// stored once per distinct name in a process-wide table, counted by the
+// properties that use it and freed with the last; a value of up to
+// kSmallValue bytes is stored inside the property, a longer one in a block
+// of its own; the entries and members of lists hang off one pointer.
 class LUM_PLATFORM_API Orb_Property {
 public:
   enum Kind { STRING, STRING_LIST, LIST };
 
-  Orb_Property(Kind kind, std::string name, std::string value = std::string());
+  Orb_Property(Kind kind, char const *name, std::string_view value = std::string_view());
   Orb_Property(Orb_Property const &) = delete;
   Orb_Property &operator=(Orb_Property const &) = delete;
   ~Orb_Property();
@@ -34,49 +44,102 @@ public:
   static void *operator new(std::size_t size); // NOLINT(misc-new-delete-overloads)
   static void operator delete(void *pointer, std::size_t size) noexcept;
 
-  Kind GetKind() const { return m_Kind; }
-  char const *GetName() const { return m_Name.c_str(); }
+  Kind GetKind() const { return static_cast<Kind>(m_Kind & kKindMask); }
+  char const *GetName() const { return m_pName; }
 
   // String: the value, replaced in place by SetStringValue.
-  char const *GetStringValue() const { return m_Value.c_str(); }
-  std::string const &GetValue() const { return m_Value; }
-  void SetStringValue(std::string value) { m_Value = std::move(value); }
+  char const *GetStringValue() const { return HasLists() ? Far()->value.c_str() : Bytes(); }
+  std::string_view GetValue() const {
+    return HasLists() ? std::string_view(Far()->value) : std::string_view(Bytes(), m_Size);
+  }
+  void SetStringValue(std::string_view value);
 
   // String list: read, cleared and appended to in order.
   std::vector<std::string> const &GetStrings() const {
-    return m_pLists ? m_pLists->strings : NoLists().strings;
+    return HasLists() ? Far()->strings : NoLists().strings;
   }
   void ClearStrings() {
-    if (m_pLists)
-      m_pLists->strings.clear();
+    if (HasLists())
+      Far()->strings.clear();
   }
   void AppendString(std::string value) { Lists().strings.push_back(std::move(value)); }
 
   // List: appends a string member (names may repeat) and returns it.
   Orb_Property *CreatePropertyString(char const *name, char const *value);
   std::vector<std::unique_ptr<Orb_Property>> const &GetMembers() const {
-    return m_pLists ? m_pLists->members : NoLists().members;
+    return HasLists() ? Far()->members : NoLists().members;
   }
 
+  // Distinct property names in use in the process.
+  static std::size_t GetNameCount();
+
+  // Values up to this many bytes are stored in the property itself.
+  static constexpr std::size_t kSmallValue = 10;
+
 private:
-  Kind m_Kind;
-  std::string m_Name;
-  std::string m_Value;
-  // The entries of a string list or the members of a list; null for a
-  // string property, the common kind, which so costs one pointer for them.
+  friend class Orb_PropertyHolder;
+
+  // A property of the same name as `named`, sharing its stored name.
+  Orb_Property(Kind kind, Orb_Property const &named, std::string_view value);
+
+  // The entries of a string list or the members of a list; a value set on
+  // a property that has them lives here too. Null for a string property,
+  // the common kind, which so costs nothing for them.
   struct ListData {
+    std::string value;
     std::vector<std::string> strings;
     std::vector<std::unique_ptr<Orb_Property>> members;
   };
   static ListData const &NoLists();
   ListData &Lists();
-  std::unique_ptr<ListData> m_pLists;
+
+  static constexpr std::uint8_t kKindMask = 3;
+  static constexpr std::uint8_t kHasLists = 4;
+  // Where the pointer to a long value or to the list data sits in m_Bytes:
+  // the pointer-aligned end of the property.
+  static constexpr std::size_t kFar = 3;
+
+  bool HasLists() const { return (m_Kind & kHasLists) != 0; }
+  bool IsLong() const { return m_Size > kSmallValue; }
+  template <class T = ListData> T *Far() const {
+    void *pointer = nullptr;
+    std::memcpy(&pointer, m_Bytes + kFar, sizeof(void *));
+    return static_cast<T *>(pointer);
+  }
+  void SetFar(void *pointer) { std::memcpy(m_Bytes + kFar, &pointer, sizeof(void *)); }
+  char const *Bytes() const { return IsLong() ? Far<char>() : m_Bytes; }
+  void ReleaseValue() noexcept;
+
+  // The stored name, shared by every property of that name.
+  char const *m_pName;
+  // Value length while there is no list data.
+  std::uint32_t m_Size = 0;
+  // Kind, and kHasLists.
+  std::uint8_t m_Kind;
+  // A short value and its NUL; or, at kFar, the long value (m_Size + 1
+  // bytes, NUL-terminated) or the list data.
+  char m_Bytes[kSmallValue + 1] = {};
 };
 
 // The properties of one host object, in creation order. Names are unique:
 // creating a property of an existing name replaces it at its place.
 class LUM_PLATFORM_API Orb_PropertyHolder {
 public:
+  // The properties in order, valid until the next change of the holder.
+  class Range {
+  public:
+    Range(Orb_Property *const *begin, std::size_t size) : m_pBegin(begin), m_Size(size) {}
+    Orb_Property *const *begin() const { return m_pBegin; }
+    Orb_Property *const *end() const { return m_pBegin + m_Size; }
+    std::size_t size() const { return m_Size; }
+    bool empty() const { return m_Size == 0; }
+    Orb_Property *operator[](std::size_t index) const { return m_pBegin[index]; }
+
+  private:
+    Orb_Property *const *m_pBegin;
+    std::size_t m_Size;
+  };
+
   Orb_PropertyHolder() = default;
   Orb_PropertyHolder(Orb_PropertyHolder const &) = delete;
   Orb_PropertyHolder &operator=(Orb_PropertyHolder const &) = delete;
@@ -94,8 +157,8 @@ public:
   void DeleteProperty(char const *name);
   void DeleteProperty(Orb_Property *property);
 
-  std::vector<std::unique_ptr<Orb_Property>> const &GetProperties() const {
-    return m_pProperties ? *m_pProperties : NoProperties();
+  Range GetProperties() const {
+    return m_pArray ? Range(Entries(m_pArray), m_pArray->count) : Range(nullptr, 0);
   }
 
   // Prints every property through the debug printer, one per line (list
@@ -107,11 +170,21 @@ public:
   void CopyPropertiesFrom(Orb_PropertyHolder const &other);
 
 private:
-  using Properties = std::vector<std::unique_ptr<Orb_Property>>;
-  static Properties const &NoProperties();
+  // One small block: this header, then `capacity` property pointers of
+  // which the first `count` are in use.
+  struct Array {
+    std::uint32_t count;
+    std::uint32_t capacity;
+  };
+  static std::size_t ArrayBytes(std::size_t capacity) {
+    return sizeof(Array) + capacity * sizeof(void *);
+  }
+  static Orb_Property **Entries(Array *array) {
+    return reinterpret_cast<Orb_Property **>(array + 1);
+  }
   Orb_Property *Insert(std::unique_ptr<Orb_Property> property);
+  void Erase(std::size_t index) noexcept;
 
-  // Null while the object has no property: most objects have none, and a
-  // pointer costs a third of an empty vector.
-  std::unique_ptr<Properties> m_pProperties;
+  // Null while the object has no property: most objects have none.
+  Array *m_pArray = nullptr;
 };

@@ -165,7 +165,7 @@ void Lum_TdmBlock::ResolveTypeBlock() {
   Orb_Property const *stored = GetPropertyByName(kBlockTypeProperty);
   if (!stored)
     return;
-  std::string const &storedType = stored->GetValue();
+  std::string const storedType(stored->GetValue());
   Lum_TdmView const *view = GetView();
   Lum_TlmBlock const *typeBlock = view->FindTypeBlock(storedType);
   if (!typeBlock) {

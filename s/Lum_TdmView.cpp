@@ -45,7 +45,7 @@ std::vector<std::string> LibraryEntries(Orb_Property const *property) {
   if (property->GetKind() == Orb_Property::STRING_LIST)
     return property->GetStrings();
   if (property->GetKind() == Orb_Property::STRING)
-    return {property->GetValue()};
+    return {std::string(property->GetValue())};
   return {};
 }
 

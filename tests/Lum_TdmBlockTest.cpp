@@ -48,7 +48,8 @@ std::string Members(Orb_ClientObject const *object, char const *name) {
     return "<absent>";
   std::string text;
   for (auto const &member : property->GetMembers())
-    text += (text.empty() ? "" : "|") + std::string(member->GetName()) + "=" + member->GetValue();
+    text += (text.empty() ? "" : "|") + std::string(member->GetName()) + "=" +
+            std::string(member->GetValue());
   return text;
 }
 

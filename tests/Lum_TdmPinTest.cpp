@@ -15,11 +15,11 @@ namespace {
 std::string Properties(Orb_Persistent const *object) {
   std::string text;
   for (auto const &property : object->GetProperties()) {
-    text += std::string(property->GetName()) + "=" + property->GetValue() + ";";
+    text += std::string(property->GetName()) + "=" + std::string(property->GetValue()) + ";";
     for (auto const &entry : property->GetStrings())
       text += "[" + entry + "]";
     for (auto const &member : property->GetMembers())
-      text += "{" + std::string(member->GetName()) + "=" + member->GetValue() + "}";
+      text += "{" + std::string(member->GetName()) + "=" + std::string(member->GetValue()) + "}";
   }
   return text;
 }

@@ -166,11 +166,12 @@ inline std::string PropertiesOf(Orb_PropertyHolder const &holder) {
   for (auto const &property : holder.GetProperties()) {
     std::vector<std::string> items = property->GetStrings();
     for (auto const &member : property->GetMembers())
-      items.push_back(std::string(member->GetName()) + ":" + member->GetValue());
+      items.push_back(std::string(member->GetName()) + ":" + std::string(member->GetValue()));
     // By kind: STRING, STRING_LIST, LIST.
     char const *const opening[] = {"=", "[", "{"}, *const closing[] = {"", "]", "}"};
     properties.push_back(std::string(property->GetName()) + opening[property->GetKind()] +
-                         property->GetValue() + Joined(items, ",") + closing[property->GetKind()]);
+                         std::string(property->GetValue()) + Joined(items, ",") +
+                         closing[property->GetKind()]);
   }
   return Joined(properties, " ");
 }

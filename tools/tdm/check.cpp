@@ -139,7 +139,7 @@ std::vector<std::string> LibraryEntries(Orb_Property const *property) {
   if (property->GetKind() == Orb_Property::STRING_LIST)
     return property->GetStrings();
   if (property->GetKind() == Orb_Property::STRING)
-    return {property->GetValue()};
+    return {std::string(property->GetValue())};
   return {};
 }
 
@@ -173,7 +173,7 @@ private:
     Orb_Property const *mark = design->GetPropertyByName(kDesignTypeProperty);
     if (mark && std::strcmp(mark->GetStringValue(), kUserDesign) != 0) {
       // A refused design loads none of its views: they are not looked at.
-      m_Problems.Add(Kind::ForeignMark, Quoted(mark->GetValue()),
+      m_Problems.Add(Kind::ForeignMark, Quoted(std::string(mark->GetValue())),
                      [&] { return DesignPath(design); });
       return;
     }
@@ -232,7 +232,7 @@ private:
       kind = Kind::StampTooNew;
     else
       return true;
-    m_Problems.Add(kind, Quoted(stamp->GetValue()), [&] { return ViewPath(view); });
+    m_Problems.Add(kind, Quoted(std::string(stamp->GetValue())), [&] { return ViewPath(view); });
     return false;
   }
 
@@ -295,7 +295,7 @@ private:
 
   void CheckBlock(Orb_View *view, Orb_Block *block, std::vector<ListedLibrary> &libraries) {
     m_Progress.Count();
-    std::string const &storedType = block->GetPropertyByName(kBlockTypeProperty)->GetValue();
+    std::string const storedType(block->GetPropertyByName(kBlockTypeProperty)->GetValue());
     std::size_t const colon = storedType.find(':');
     std::string const libraryName = storedType.substr(0, colon);
     std::string const typeBlockName =
