@@ -175,6 +175,17 @@ Orb_Block::Orb_Block(Orb_Model *model, Orb_Persistent *parent, Orb_View *view,
                      std::string_view name)
     : Orb_Persistent(model, Orb_Kind::Block, parent, name), m_pView(view) {}
 
+Orb_Block::Inside &Orb_Block::MakeInside() {
+  if (!m_pInside)
+    m_pInside = std::make_unique<Inside>();
+  return *m_pInside;
+}
+
+Orb_Block::Inside const &Orb_Block::NoInside() {
+  static Inside const none;
+  return none;
+}
+
 Orb_Block *Orb_Block::GetParent() const {
   Orb_Persistent *parent = GetParentObject();
   return parent && parent->GetKind() == Orb_Kind::Block ? static_cast<Orb_Block *>(parent)
@@ -604,11 +615,13 @@ bool Orb_Model::Link(Orb_Persistent *object) {
       view->m_pTopBlock = static_cast<Orb_Block *>(object);
       return true;
     }
-    return static_cast<Orb_Block *>(parent)->m_Blocks.AddUnique(static_cast<Orb_Block *>(object));
+    return static_cast<Orb_Block *>(parent)->MakeInside().blocks.AddUnique(
+        static_cast<Orb_Block *>(object));
   case Orb_Kind::Pin:
     return static_cast<Orb_Block *>(parent)->m_Pins.AddUnique(static_cast<Orb_Pin *>(object));
   case Orb_Kind::Signal:
-    return static_cast<Orb_Block *>(parent)->m_Signals.AddUnique(static_cast<Orb_Signal *>(object));
+    return static_cast<Orb_Block *>(parent)->MakeInside().signals.AddUnique(
+        static_cast<Orb_Signal *>(object));
   case Orb_Kind::Network:
     return static_cast<Orb_View *>(parent)->m_Networks.AddUnique(
         static_cast<Orb_Network *>(object));
@@ -632,13 +645,13 @@ void Orb_Model::Unlink(Orb_Persistent *object) {
     if (parent->GetKind() == Orb_Kind::View)
       static_cast<Orb_View *>(parent)->m_pTopBlock = nullptr;
     else
-      static_cast<Orb_Block *>(parent)->m_Blocks.Remove(static_cast<Orb_Block *>(object));
+      static_cast<Orb_Block *>(parent)->m_pInside->blocks.Remove(static_cast<Orb_Block *>(object));
     break;
   case Orb_Kind::Pin:
     static_cast<Orb_Block *>(parent)->m_Pins.Remove(static_cast<Orb_Pin *>(object));
     break;
   case Orb_Kind::Signal:
-    static_cast<Orb_Block *>(parent)->m_Signals.Remove(static_cast<Orb_Signal *>(object));
+    static_cast<Orb_Block *>(parent)->m_pInside->signals.Remove(static_cast<Orb_Signal *>(object));
     break;
   case Orb_Kind::Network:
     static_cast<Orb_View *>(parent)->m_Networks.Remove(static_cast<Orb_Network *>(object));

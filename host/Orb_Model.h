@@ -322,14 +322,14 @@ public:
   Orb_Block *GetParent() const;
   Orb_View *GetView() const { return m_pView; }
 
-  Orb_Range<Orb_Block> GetBlocks() const { return m_Blocks.Items(); }
+  Orb_Range<Orb_Block> GetBlocks() const { return Inner().blocks.Items(); }
   Orb_Range<Orb_Pin> GetPins() const { return m_Pins.Items(); }
-  Orb_Range<Orb_Signal> GetSignals() const { return m_Signals.Items(); }
+  Orb_Range<Orb_Signal> GetSignals() const { return Inner().signals.Items(); }
   unsigned GetNumPins() const { return static_cast<unsigned>(m_Pins.Size()); }
 
-  Orb_Block *GetBlockByName(char const *name) const { return m_Blocks.Find(name); }
+  Orb_Block *GetBlockByName(char const *name) const { return Inner().blocks.Find(name); }
   Orb_Pin *GetPinByName(char const *name) const { return m_Pins.Find(name); }
-  Orb_Signal *GetSignalByName(char const *name) const { return m_Signals.Find(name); }
+  Orb_Signal *GetSignalByName(char const *name) const { return Inner().signals.Find(name); }
 
   // 1 for a view's top block, one more per parent block (walks the parents).
   unsigned GetDepth() const;
@@ -359,10 +359,20 @@ private:
   friend class Orb_ModelIO;
   friend class Orb_View;
   Orb_Block(Orb_Model *model, Orb_Persistent *parent, Orb_View *view, std::string_view name);
+  // What only a block with child blocks or signals needs. Most blocks of a
+  // netlist are leaves and go without it (a pointer instead of 80 bytes).
+  struct Inside {
+    Orb_NamedList<Orb_Block> blocks;
+    Orb_NamedList<Orb_Signal> signals;
+  };
+  Inside const &Inner() const { return m_pInside ? *m_pInside : NoInside(); }
+  // Made on first need and kept while the block lives, so that ranges over
+  // its lists stay valid. Throws std::bad_alloc.
+  Inside &MakeInside();
+  static Inside const &NoInside();
   Orb_View *m_pView;
-  Orb_NamedList<Orb_Block> m_Blocks;
   Orb_NamedList<Orb_Pin> m_Pins;
-  Orb_NamedList<Orb_Signal> m_Signals;
+  std::unique_ptr<Inside> m_pInside;
 };
 
 class LUM_PLATFORM_API Orb_View : public Orb_Persistent {

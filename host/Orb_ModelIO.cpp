@@ -130,7 +130,7 @@ private:
   // Appends a block's new pin, signal or child block without looking at
   // names; CheckNames refuses the file when the block's record ends if two
   // children of one kind share a name.
-  template <class T> static void Append(Orb_NamedList<T> &list, T *child);
+  template <class T, class List> static void Append(T *child, List const &list);
   void CheckNames(Orb_Block *block) const;
   [[noreturn]] void Duplicate(char const *kind, std::string const &name,
                               Orb_Persistent const *parent) const;
@@ -574,14 +574,16 @@ void Orb_ModelIO::ReadBlock(Orb_Block *top) {
         m_pIn->Corrupt("unknown direction of pin " + Quote(name));
       auto const direction = static_cast<Orb_Pin::PIN_DIRECTION>(code);
       auto *pin = model->Make<Orb_Pin>(model, block, name, direction);
-      Append(block->m_Pins, pin);
+      Append(
+          pin, [block]() -> auto & { return block->m_Pins; });
       m_Pins.push_back(pin);
       holder = pin;
     } else if (tag == 'S') {
       std::string name = ReadName("signal");
       m_pIn->End();
       auto *signal = model->Make<Orb_Signal>(model, block, name);
-      Append(block->m_Signals, signal);
+      Append(
+          signal, [block]() -> auto & { return block->MakeInside().signals; });
       m_Signals.push_back(signal);
       holder = signal;
     } else if (tag == 'B') {
@@ -591,7 +593,8 @@ void Orb_ModelIO::ReadBlock(Orb_Block *top) {
         m_pIn->Corrupt("block " + Quote(name) + " nested deeper than " +
                        std::to_string(Orb_MaxBlockDepth) + " levels");
       auto *child = model->Make<Orb_Block>(model, block, block->m_pView, name);
-      Append(block->m_Blocks, child);
+      Append(
+          child, [block]() -> auto & { return block->MakeInside().blocks; });
       open.push_back(child);
       holder = child;
     } else if (tag == 'E') {
@@ -728,9 +731,9 @@ void Orb_ModelIO::Place(Orb_Persistent *object, char const *kind) const {
   Duplicate(kind, name, parent);
 }
 
-template <class T> void Orb_ModelIO::Append(Orb_NamedList<T> &list, T *child) {
+template <class T, class List> void Orb_ModelIO::Append(T *child, List const &list) {
   try {
-    list.Append(child);
+    list().Append(child);
   } catch (...) {
     // In no container: nothing else would ever free it.
     child->GetModel()->Free(child);
@@ -741,9 +744,11 @@ template <class T> void Orb_ModelIO::Append(Orb_NamedList<T> &list, T *child) {
 void Orb_ModelIO::CheckNames(Orb_Block *block) const {
   if (Orb_Pin const *pin = block->m_Pins.CheckNames())
     Duplicate("pin", std::string(pin->GetNameString()), block);
-  if (Orb_Signal const *signal = block->m_Signals.CheckNames())
+  if (!block->m_pInside)
+    return;
+  if (Orb_Signal const *signal = block->m_pInside->signals.CheckNames())
     Duplicate("signal", std::string(signal->GetNameString()), block);
-  if (Orb_Block const *child = block->m_Blocks.CheckNames())
+  if (Orb_Block const *child = block->m_pInside->blocks.CheckNames())
     Duplicate("block", std::string(child->GetNameString()), block);
 }
 
