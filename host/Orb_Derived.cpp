@@ -219,17 +219,29 @@ void Orb_ClientObject::operator delete(void *pointer, std::size_t size) noexcept
 }
 
 Orb_ClientObject::Orb_ClientObject(Orb_Context *context, Orb_Persistent *object)
-    : m_pContext(context), m_pOrbObject(object) {
+    : m_pOrbObject(object) {
   assert(context && object && "a client needs a context and a host object");
   context->Register(this);
 }
 
-Orb_ClientObject::~Orb_ClientObject() { m_pContext->Unregister(this); }
+Orb_ClientObject::~Orb_ClientObject() {
+  if (Orb_Context *context = GetContext())
+    context->Unregister(this);
+}
+
+Orb_Context *Orb_ClientObject::GetContext() const {
+  // Registration checked that the object is of the context's model, and a
+  // context stays attached to its model while it holds clients.
+  for (Orb_ModelDerived *context : m_pOrbObject->GetModel()->GetContexts())
+    if (context->GetClient(m_pOrbObject) == this)
+      return context;
+  return nullptr;
+}
 
 void Orb_ClientObject::DebugDumpCallback(Port::Stream * /*stream*/, int /*indent*/) const {}
 
 Orb_ModelDerived *Orb_ClientObject::GetClientOrbModel() const {
-  return static_cast<Orb_ModelDerived *>(m_pContext);
+  return static_cast<Orb_ModelDerived *>(GetContext());
 }
 
 void Orb_ClientObject::DbgHost() const {

@@ -32,7 +32,10 @@ public:
   static void *operator new(std::size_t size); // NOLINT(misc-new-delete-overloads)
   static void operator delete(void *pointer, std::size_t size) noexcept;
 
-  Orb_Context *GetContext() const { return m_pContext; }
+  // The context that holds this client: of the contexts attached to the
+  // object's host model (usually one), the one whose bridge table has it.
+  // Found rather than kept, so that a client costs a pointer less.
+  Orb_Context *GetContext() const;
   Orb_ModelDerived *GetClientOrbModel() const;
   Orb_Persistent *GetOrbObject() const { return m_pOrbObject; }
 
@@ -60,7 +63,6 @@ protected:
   void DbgHost() const;
 
 private:
-  Orb_Context *m_pContext;
   Orb_Persistent *m_pOrbObject;
 };
 
