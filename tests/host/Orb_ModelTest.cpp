@@ -67,8 +67,9 @@ TEST_F(HostModelTest, ClientsComeWithCreationAndGoChildrenFirst) {
   EXPECT_TRUE(freed);
 }
 
-// An attached model destroys only its clients; a later one specializes afresh via OnLoad.
-TEST_F(HostModelTest, AttachedModelLeavesHostModelIntact) {
+// An attached model destroys only its clients. An unsubscribed one gets no clients from events:
+// GetClient never creates, Specialize loads once, and deletion empties the bridge.
+TEST_F(HostModelTest, AttachedModelsKeepTheirOwnClients) {
   EventLog attachedLog;
   auto attached = std::make_unique<RecModel>(&attachedLog, host);
   EXPECT_FALSE(attached->OwnsOrbModel());
@@ -79,34 +80,23 @@ TEST_F(HostModelTest, AttachedModelLeavesHostModelIntact) {
   EXPECT_EQ(cp->GetSignal(), s);
 
   attachedLog.clear();
-  RecModel again(&attachedLog, host);
-  EXPECT_EQ(again.GetClientCount(), 0u);
-  EXPECT_NE(again.Specialize(top), nullptr);
-  EXPECT_EQ(Joined(attachedLog), "load block top");
-}
-
-// Unsubscribed: GetClient never creates, Specialize loads once, deletion empties the bridge.
-TEST_F(HostModelTest, UnsubscribedContextSpecializesOnDemand) {
-  EventLog viewerLog;
-  RecModel viewer(&viewerLog, host, false);
+  RecModel viewer(&attachedLog, host, false);
   top->CreateSignal("late");
   EXPECT_EQ(viewer.GetClient(top), nullptr);
   EXPECT_EQ(viewer.Specialize(static_cast<Orb_Block *>(nullptr)), nullptr);
-
   auto *first = static_cast<RecTraits::Block *>(viewer.Specialize(top));
   EXPECT_EQ(viewer.Specialize(top), first);
   EXPECT_EQ(viewer.GetClient(top), first);
   EXPECT_NE(model->GetClient(top), first);
-  EXPECT_EQ(Joined(viewerLog), "load block top");
+  EXPECT_EQ(Joined(attachedLog), "load block top");
 
   delete first;
   EXPECT_EQ(viewer.GetBridgeHandle(Orb_Kind::Block)[top->GetBridgeId()], nullptr);
   auto *second = viewer.Specialize(top);
   EXPECT_EQ(viewer.GetBridgeHandle(Orb_Kind::Block)[top->GetBridgeId()], second);
-
-  viewerLog.clear();
+  attachedLog.clear();
   v->DeleteTopBlock();
-  EXPECT_EQ(Joined(viewerLog), "~block top");
+  EXPECT_EQ(Joined(attachedLog), "~block top");
   EXPECT_EQ(viewer.GetClientCount(), 0u);
 }
 
