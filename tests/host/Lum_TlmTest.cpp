@@ -121,27 +121,9 @@ TEST_F(TlmTest, BuiltLibraryIsComplete) {
   EXPECT_EQ(library->GetTypeBlocks().size(), 2u) << "AND2 and MUX only";
 }
 
-// Loads are counted; the last release unloads, and the next load reads the file again.
-TEST_F(TlmTest, LoadsFromFileAndUnloadsAtLastRelease) {
-  Lum_TlmCatalog::AddSearchDirectory(SaveGates("", 2).c_str());
-  Lum_TlmLibrary const *library = Lum_TlmLibrary::LoadLibrary("gates", m_Pic);
-  EXPECT_EQ(Lum_TlmLibrary::LoadLibrary("gates", m_Pic), library);
-  EXPECT_EQ(Lum_TlmCatalog::GetReferenceCount("gates"), 2u);
-  EXPECT_EQ(Version(library), "2.3");
-  EXPECT_EQ(Dump(library->GetTypeBlock("AND2")->GetOrbBlock()), kAnd2);
-  EXPECT_TRUE(library->GetTypeBlock("MUX")->HasHier("schematic"));
-
-  Lum_TlmLibrary::ReleaseLibrary(library);
-  EXPECT_TRUE(Lum_TlmCatalog::IsLoaded("gates"));
-  Lum_TlmLibrary::ReleaseLibrary(library);
-  EXPECT_FALSE(Lum_TlmCatalog::IsLoaded("gates"));
-  Lum_TlmLibrary::ReleaseLibrary(library); // no reference left: ignored
-  SaveGates("", 7);
-  EXPECT_EQ(LoadedVersion(m_Pic), "7.3") << "the file is read again";
-}
-
-// One name loads per personality from that personality's file, each counted on its own.
-TEST_F(TlmTest, OneNameLoadsPerPersonality) {
+// One name loads per personality from that personality's file, each counted on its own; the last
+// release unloads, and the next load reads the file again.
+TEST_F(TlmTest, LoadsPerPersonalityAndUnloadsAtLastRelease) {
   SaveGates("P1", 1);
   SaveGates("P2", 2);
   SaveGates("", 5);
@@ -151,6 +133,8 @@ TEST_F(TlmTest, OneNameLoadsPerPersonality) {
   Lum_TlmLibrary const *second = Lum_TlmLibrary::LoadLibrary("gates", p2);
   Lum_TlmLibrary const *plain = Lum_TlmLibrary::LoadLibrary("gates", p3);
   EXPECT_EQ(Version(first) + " " + Version(second) + " " + Version(plain), "1.3 2.3 5.3");
+  EXPECT_EQ(Dump(plain->GetTypeBlock("AND2")->GetOrbBlock()), kAnd2);
+  EXPECT_TRUE(plain->GetTypeBlock("MUX")->HasHier("schematic"));
   EXPECT_EQ(Lum_TlmLibrary::LoadLibrary("gates", m_Pic), first);
   EXPECT_EQ(Lum_TlmCatalog::GetReferenceCount("gates", m_Pic), 2u);
   EXPECT_EQ(Lum_TlmCatalog::GetReferenceCount("gates", p2), 1u);
@@ -163,6 +147,9 @@ TEST_F(TlmTest, OneNameLoadsPerPersonality) {
   for (Lum_TlmLibrary const *library : {first, first, plain})
     Lum_TlmLibrary::ReleaseLibrary(library);
   EXPECT_FALSE(Lum_TlmCatalog::IsLoaded("gates"));
+  Lum_TlmLibrary::ReleaseLibrary(plain); // no reference left: ignored
+  SaveGates("", 7);
+  EXPECT_EQ(LoadedVersion(PM_PIC("P3", "part", nullptr)), "7.3") << "the file is read again";
 }
 
 // A library file that cannot be read is an invalid library, named with the file and the fault.
