@@ -215,12 +215,13 @@ TEST_F(TlmTest, SearchPathOrderAndMissingLibraries) {
   std::string const searchPath = added + ":" + plain;
   EXPECT_EQ(Lum_TlmCatalog::GetSearchPath(), searchPath);
 
-  for (auto [name, where] : {std::pair<char const *, std::string>{"nosuch", searchPath},
-                             {"other", plain + "/other.tlm"}}) {
+  for (auto const &miss : {std::pair<char const *, std::string>{"nosuch", searchPath},
+                           {"other", plain + "/other.tlm"}}) {
+    char const *name = miss.first;
     Thrown const e =
         ThrownBy<Lum_ExceptionInvalidLibrary>([&] { Lum_TlmLibrary::LoadLibrary(name, m_Pic); });
     EXPECT_EQ(e.object, name);
-    EXPECT_THAT(e.message, HasSubstr(where));
+    EXPECT_THAT(e.message, HasSubstr(miss.second));
     EXPECT_FALSE(Lum_TlmCatalog::IsLoaded(name));
   }
 }

@@ -113,6 +113,7 @@ TEST(PropertyNameTest, StoredOnceAndFreedWithTheLastUse) {
 TEST(PropertyNameTest, SharedAcrossThreads) {
   std::size_t const before = Orb_Property::GetNameCount();
   std::vector<std::thread> threads;
+  threads.reserve(4);
   std::vector<int> wrong(4, 0);
   for (int t = 0; t < 4; ++t) {
     threads.emplace_back([t, &wrong] {
