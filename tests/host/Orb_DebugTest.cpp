@@ -109,13 +109,14 @@ TEST(PortScanTest, ConvertsWithinRange) {
     int result = 0;
     if (std::string(c.format) == "%d.%d") {
       result = Port::sscanf(c.text, "%d.%d", &a, &b);
+      first = static_cast<unsigned>(a);
       second = static_cast<unsigned>(b);
     } else if (std::string(c.format) == "%u.%u") {
       result = Port::sscanf(c.text, "%u.%u", &first, &second);
     } else {
       result = Port::sscanf(c.text, " %d %% x%u", &a, &second);
+      first = static_cast<unsigned>(a);
     }
-    first += static_cast<unsigned>(a);
     EXPECT_EQ(result, c.result);
     EXPECT_EQ(first, c.first);
     EXPECT_EQ(second, c.second);
