@@ -51,7 +51,6 @@ TEST_F(HostModelTest, ClientsComeWithCreationAndGoChildrenFirst) {
                          "create block top; create pin p; create signal s; "
                          "create block c; create pin cp; create network n");
   auto *topClient = static_cast<RecTraits::Block *>(model->GetClient(top));
-  EXPECT_EQ(topClient->GetClientOrbModel(), model.get());
   log.clear();
   auto *child = topClient->CreateBlock("viaClient", 0);
   EXPECT_EQ(child, model->GetClient(top->GetBlockByName("viaClient")));
