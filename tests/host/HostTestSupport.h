@@ -1,16 +1,24 @@
 #pragma once
 
 // Shared helpers of the host's own tests: a client model that records every
-// event it receives and every client it destroys, and a dump of host objects.
+// event it receives and every client it destroys, a dump of host objects,
+// file helpers and exception capture.
 
 #include "Orb_Debug.h"
+#include "Orb_Exception.h"
 #include "Orb_Templates.h"
 
+#include <gtest/gtest.h>
+
 #include <cstddef>
+#include <cstdio>
+#include <fstream>
 #include <functional>
+#include <iterator>
 #include <memory>
 #include <stdexcept>
 #include <string>
+#include <unistd.h>
 #include <vector>
 
 namespace HostTest {
@@ -229,6 +237,36 @@ inline std::string Dump(Orb_Model const &model) {
   for (Orb_DesignMgr const *designMgr : model.GetDesignMgrs())
     out += Dump(designMgr);
   return out;
+}
+
+inline std::string ReadBytes(std::string const &path) {
+  std::ifstream in(path, std::ios::binary);
+  return std::string(std::istreambuf_iterator<char>(in), std::istreambuf_iterator<char>());
+}
+
+// The model saved to a file of this process and opened into a fresh model.
+inline std::unique_ptr<Orb_Model> Reopened(Orb_Model const &model) {
+  std::string const path = ::testing::TempDir() + "HostTest." + std::to_string(::getpid()) + ".db";
+  model.Save(path.c_str());
+  auto reopened = std::make_unique<Orb_Model>("reopened", "db", "", false);
+  reopened->Open(path.c_str());
+  std::remove(path.c_str());
+  return reopened;
+}
+
+// The object name and message of the E that `action` throws; a test failure
+// when it throws nothing.
+struct Thrown {
+  std::string object, message;
+};
+template <class E = Orb_Exception, class Action> Thrown ThrownBy(Action &&action) {
+  try {
+    action();
+  } catch (E const &e) {
+    return {e.GetObjectName(), e.GetMessage()};
+  }
+  ADD_FAILURE() << "nothing thrown";
+  return {};
 }
 
 } // namespace HostTest

@@ -7,12 +7,12 @@
 #include "Orb_Exception.h"
 #include "host/HostTestSupport.h"
 
+#include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 #include <cstdlib>
 #include <filesystem>
 #include <fstream>
-#include <iterator>
 #include <memory>
 #include <stdexcept>
 #include <string>
@@ -21,7 +21,8 @@
 namespace {
 
 namespace fs = std::filesystem;
-using HostTest::Dump;
+using namespace HostTest;
+using ::testing::HasSubstr;
 
 char const *const kAnd2 = "block AND2\n pin A input\n pin B input\n pin Y output\n";
 
@@ -81,9 +82,6 @@ protected:
 TEST_F(TlmTest, BuiltLibraryIsComplete) {
   Lum_TlmModel model("m", "m", "", false);
   Lum_TlmLibrary *library = BuildGates(model);
-  EXPECT_EQ(Version(library), "2.3");
-  EXPECT_EQ(library->GetFirstQualifier().str() + "|" + library->GetSecondQualifier().str(),
-            "fast|");
   Lum_TlmBlock *and2 = library->GetTypeBlock("AND2");
   Lum_TlmBlock const *mux = library->GetTypeBlock("MUX");
   EXPECT_EQ(library->GetTypeBlocks(),
@@ -104,48 +102,25 @@ TEST_F(TlmTest, BuiltLibraryIsComplete) {
   EXPECT_TRUE(Lum_TlmDesign::IsTypeBlockDesign(*and2->GetOrbBlock()->GetView()->GetParent()));
 
   // Names that could not be stored and read back are refused, creating nothing.
-  std::size_t const before = HostTest::ObjectCount(*model.GetOrbModel());
+  std::size_t const before = ObjectCount(*model.GetOrbModel());
   for (char const *name : {"", "a b", "a:b"})
     EXPECT_THROW(model.CreateLibrary(name, 1, 0), Lum_ExceptionInvalidLibrary) << name;
   for (char const *name : {"", "x:y"})
     EXPECT_THROW(library->CreateTypeBlock(name), Lum_ExceptionInvalidTypeBlock) << name;
   EXPECT_THROW(library->CreateTypeBlock("AND2"), Orb_Exception);
-  EXPECT_EQ(HostTest::ObjectCount(*model.GetOrbModel()), before);
-}
+  EXPECT_EQ(ObjectCount(*model.GetOrbModel()), before);
 
-// A type view whose top block is named otherwise than its design (a damaged
-// file) holds no type block: binding to it would store a tag that no lookup
-// finds again.
-TEST_F(TlmTest, TypeBlockNamedOtherwiseThanItsDesignIsNone) {
-  Lum_TlmModel model("m", "m", "", false);
-  Lum_TlmLibrary *library = BuildGates(model);
+  // A type view whose top block is named otherwise than its design (a damaged file) holds no
+  // type block: binding to it would store a tag that no lookup finds again.
   library->CreateDesign("LOC")->CreateView("type")->CreateTopBlock("LNC");
   EXPECT_EQ(library->GetTypeBlock("LOC"), nullptr);
   EXPECT_EQ(library->GetTypeBlock("LNC"), nullptr);
   EXPECT_EQ(library->GetTypeBlocks().size(), 2u) << "AND2 and MUX only";
 }
 
-// Loads are counted; the last release unloads, and the next load reads the file again.
-TEST_F(TlmTest, LoadsFromFileAndUnloadsAtLastRelease) {
-  Lum_TlmCatalog::AddSearchDirectory(SaveGates("", 2).c_str());
-  Lum_TlmLibrary const *library = Lum_TlmLibrary::LoadLibrary("gates", m_Pic);
-  EXPECT_EQ(Lum_TlmLibrary::LoadLibrary("gates", m_Pic), library);
-  EXPECT_EQ(Lum_TlmCatalog::GetReferenceCount("gates"), 2u);
-  EXPECT_EQ(Version(library), "2.3");
-  EXPECT_EQ(Dump(library->GetTypeBlock("AND2")->GetOrbBlock()), kAnd2);
-  EXPECT_TRUE(library->GetTypeBlock("MUX")->HasHier("schematic"));
-
-  Lum_TlmLibrary::ReleaseLibrary(library);
-  EXPECT_TRUE(Lum_TlmCatalog::IsLoaded("gates"));
-  Lum_TlmLibrary::ReleaseLibrary(library);
-  EXPECT_FALSE(Lum_TlmCatalog::IsLoaded("gates"));
-  Lum_TlmLibrary::ReleaseLibrary(library); // no reference left: ignored
-  SaveGates("", 7);
-  EXPECT_EQ(LoadedVersion(m_Pic), "7.3") << "the file is read again";
-}
-
-// One name loads per personality from that personality's file, each counted on its own.
-TEST_F(TlmTest, OneNameLoadsPerPersonality) {
+// One name loads per personality from that personality's file, each counted on its own; the last
+// release unloads, and the next load reads the file again.
+TEST_F(TlmTest, LoadsPerPersonalityAndUnloadsAtLastRelease) {
   SaveGates("P1", 1);
   SaveGates("P2", 2);
   SaveGates("", 5);
@@ -155,6 +130,9 @@ TEST_F(TlmTest, OneNameLoadsPerPersonality) {
   Lum_TlmLibrary const *second = Lum_TlmLibrary::LoadLibrary("gates", p2);
   Lum_TlmLibrary const *plain = Lum_TlmLibrary::LoadLibrary("gates", p3);
   EXPECT_EQ(Version(first) + " " + Version(second) + " " + Version(plain), "1.3 2.3 5.3");
+  EXPECT_EQ(plain->GetFirstQualifier().str() + "|" + plain->GetSecondQualifier().str(), "fast|");
+  EXPECT_EQ(Dump(plain->GetTypeBlock("AND2")->GetOrbBlock()), kAnd2);
+  EXPECT_TRUE(plain->GetTypeBlock("MUX")->HasHier("schematic"));
   EXPECT_EQ(Lum_TlmLibrary::LoadLibrary("gates", m_Pic), first);
   EXPECT_EQ(Lum_TlmCatalog::GetReferenceCount("gates", m_Pic), 2u);
   EXPECT_EQ(Lum_TlmCatalog::GetReferenceCount("gates", p2), 1u);
@@ -167,6 +145,9 @@ TEST_F(TlmTest, OneNameLoadsPerPersonality) {
   for (Lum_TlmLibrary const *library : {first, first, plain})
     Lum_TlmLibrary::ReleaseLibrary(library);
   EXPECT_FALSE(Lum_TlmCatalog::IsLoaded("gates"));
+  Lum_TlmLibrary::ReleaseLibrary(plain); // no reference left: ignored
+  SaveGates("", 7);
+  EXPECT_EQ(LoadedVersion(PM_PIC("P3", "part", nullptr)), "7.3") << "the file is read again";
 }
 
 // A library file that cannot be read is an invalid library, named with the file and the fault.
@@ -174,11 +155,7 @@ TEST_F(TlmTest, UnreadableLibraryFileIsInvalidLibrary) {
   SaveGates("", 1);
   std::string const path = m_Dir + "/gates.tlm";
   Lum_TlmCatalog::AddSearchDirectory(m_Dir.c_str());
-  std::string bytes;
-  {
-    std::ifstream in(path, std::ios::binary);
-    bytes.assign(std::istreambuf_iterator<char>(in), std::istreambuf_iterator<char>());
-  }
+  std::string const bytes = ReadBytes(path);
   std::string corrupt = bytes;
   corrupt[corrupt.find("\nG ") + 1] = 'X';
   struct {
@@ -190,15 +167,13 @@ TEST_F(TlmTest, UnreadableLibraryFileIsInvalidLibrary) {
       {"not a library", "not a design database"},
   };
   for (auto const &c : cases) {
+    SCOPED_TRACE(c.fault);
     std::ofstream(path, std::ios::binary | std::ios::trunc) << c.content;
-    try {
-      Lum_TlmLibrary::LoadLibrary("gates", m_Pic);
-      ADD_FAILURE() << "loaded a broken file (" << c.fault << ")";
-    } catch (Lum_ExceptionInvalidLibrary const &e) {
-      EXPECT_EQ(e.GetObjectName(), "gates");
-      EXPECT_NE(e.GetMessage().find(path), std::string::npos) << e.what();
-      EXPECT_NE(e.GetMessage().find(c.fault), std::string::npos) << e.what();
-    }
+    Thrown const e =
+        ThrownBy<Lum_ExceptionInvalidLibrary>([&] { Lum_TlmLibrary::LoadLibrary("gates", m_Pic); });
+    EXPECT_EQ(e.object, "gates");
+    EXPECT_THAT(e.message, HasSubstr(path));
+    EXPECT_THAT(e.message, HasSubstr(c.fault));
     EXPECT_FALSE(Lum_TlmCatalog::IsLoaded("gates"));
   }
 }
@@ -216,13 +191,9 @@ TEST_F(TlmTest, LookupsNeverCrossModels) {
   EXPECT_EQ(Orb_BlockDerived::OrbResolve(&first, block), nullptr);
   EXPECT_EQ(Orb_BlockDerived::OrbResolve(&second, block), foreign);
   std::size_t const clients = first.GetClientCount();
-  try {
-    first.Specialize(block);
-    ADD_FAILURE() << "specialized another model's block";
-  } catch (Orb_Exception const &e) {
-    EXPECT_NE(e.GetMessage().find("<a>"), std::string::npos) << e.what();
-    EXPECT_NE(e.GetMessage().find("<b>"), std::string::npos) << e.what();
-  }
+  std::string const message = ThrownBy([&] { first.Specialize(block); }).message;
+  EXPECT_THAT(message, HasSubstr("<a>"));
+  EXPECT_THAT(message, HasSubstr("<b>"));
   EXPECT_THROW(std::make_unique<Lum_TlmBlock>(&first, block), Orb_Exception);
   EXPECT_EQ(first.GetClientCount(), clients);
   EXPECT_EQ(first.GetClient(own->GetOrbBlock()), own);
@@ -242,15 +213,13 @@ TEST_F(TlmTest, SearchPathOrderAndMissingLibraries) {
   std::string const searchPath = added + ":" + plain;
   EXPECT_EQ(Lum_TlmCatalog::GetSearchPath(), searchPath);
 
-  for (auto [name, where] : {std::pair<char const *, std::string>{"nosuch", searchPath},
-                             {"other", plain + "/other.tlm"}}) {
-    try {
-      Lum_TlmLibrary::LoadLibrary(name, m_Pic);
-      ADD_FAILURE() << "no exception for " << name;
-    } catch (Lum_ExceptionInvalidLibrary const &e) {
-      EXPECT_EQ(e.GetObjectName(), name);
-      EXPECT_NE(std::string(e.what()).find(where), std::string::npos) << e.what();
-    }
+  for (auto const &miss : {std::pair<char const *, std::string>{"nosuch", searchPath},
+                           {"other", plain + "/other.tlm"}}) {
+    char const *name = miss.first;
+    Thrown const e =
+        ThrownBy<Lum_ExceptionInvalidLibrary>([&] { Lum_TlmLibrary::LoadLibrary(name, m_Pic); });
+    EXPECT_EQ(e.object, name);
+    EXPECT_THAT(e.message, HasSubstr(miss.second));
     EXPECT_FALSE(Lum_TlmCatalog::IsLoaded(name));
   }
 }
@@ -301,9 +270,9 @@ TEST_F(TlmTest, MessagesCutLongNames) {
 }
 
 // Takes the design database's local library when a design loads, as block loading does.
-class TakingModel : public HostTest::RecModel {
+class TakingModel : public RecModel {
 public:
-  TakingModel(HostTest::EventLog *eventLog, Orb_Model *model) : RecModel(eventLog, model) {}
+  TakingModel(EventLog *eventLog, Orb_Model *model) : RecModel(eventLog, model) {}
   void SyncEventSpecializeDesignOnLoad(Orb_Design *o) override {
     Lum_TlmLibrary::GetLocalLibrary(GetOrbModel(), PM_PIC("P1", "part", nullptr));
     RecModel::SyncEventSpecializeDesignOnLoad(o);
@@ -313,10 +282,6 @@ public:
 // A refused open leaves the companions as they were, whichever local library the handler took;
 // a file with a local library does not open into a model that has one.
 TEST_F(TlmTest, RefusedOpenLeavesLocalLibraryAsBefore) {
-  auto readBytes = [](std::string const &path) {
-    std::ifstream in(path, std::ios::binary);
-    return std::string(std::istreambuf_iterator<char>(in), std::istreambuf_iterator<char>());
-  };
   std::string const withLocal = m_Dir + "/with_local.odb";
   std::string const plain = m_Dir + "/plain.odb";
   {
@@ -326,7 +291,7 @@ TEST_F(TlmTest, RefusedOpenLeavesLocalLibraryAsBefore) {
     Lum_TlmLibrary::GetLocalLibrary(&source, m_Pic)->CreateTypeBlock("CELL");
     source.Save(withLocal.c_str());
   }
-  HostTest::EventLog log;
+  EventLog log;
   for (std::string const &file : {withLocal, plain}) {
     SCOPED_TRACE(file);
     Orb_Model target("t", "t", "", false);
@@ -337,7 +302,7 @@ TEST_F(TlmTest, RefusedOpenLeavesLocalLibraryAsBefore) {
     EXPECT_THROW(target.Open(file.c_str()), std::runtime_error);
     EXPECT_EQ(target.GetCompanion(Lum_TlmNames::kLocalLibraryCompanion), nullptr);
     target.Save((m_Dir + "/after.odb").c_str());
-    EXPECT_EQ(readBytes(m_Dir + "/after.odb"), readBytes(m_Dir + "/before.odb"));
+    EXPECT_EQ(ReadBytes(m_Dir + "/after.odb"), ReadBytes(m_Dir + "/before.odb"));
   }
 
   // A local library that was waiting before the refused open waits again.
@@ -351,16 +316,11 @@ TEST_F(TlmTest, RefusedOpenLeavesLocalLibraryAsBefore) {
     EXPECT_THROW(target.Open(plain.c_str()), std::runtime_error);
   }
   target.Save((m_Dir + "/after.odb").c_str());
-  EXPECT_EQ(readBytes(m_Dir + "/after.odb"), readBytes(m_Dir + "/before.odb"));
+  EXPECT_EQ(ReadBytes(m_Dir + "/after.odb"), ReadBytes(m_Dir + "/before.odb"));
   EXPECT_NE(Lum_TlmLibrary::GetLocalLibrary(&target, m_Pic)->GetTypeBlock("CELL"), nullptr);
 
   // Now live: a second file with its own local library is refused, naming the file.
-  try {
-    target.Open(withLocal.c_str());
-    ADD_FAILURE() << "opened a second local library";
-  } catch (Orb_Exception const &e) {
-    EXPECT_NE(e.GetMessage().find(withLocal), std::string::npos) << e.what();
-  }
+  EXPECT_THAT(ThrownBy([&] { target.Open(withLocal.c_str()); }).message, HasSubstr(withLocal));
   EXPECT_TRUE(target.GetDesignMgrs().empty());
 }
 
@@ -370,27 +330,29 @@ TEST_F(TlmTest, TypeIdentifiersAndRegistry) {
   Lum_TlmLibrary *library = BuildGates(model);
   Lum_TlmBlock const *and2 = library->GetTypeBlock("AND2");
   Lum_TlmPin const *a = and2->GetPinByName("A");
-  EXPECT_TRUE(Lum_TlmBlockTypeID().RepresentsTypeBlock(nullptr));
-  EXPECT_FALSE(Lum_TlmBlockTypeID().RepresentsTypeBlock(and2));
-  Lum_TlmBlockTypeID const blockId("gates", "AND2");
-  EXPECT_TRUE(blockId.RepresentsTypeBlock(and2));
-  EXPECT_FALSE(blockId.RepresentsTypeBlock(library->GetTypeBlock("MUX")));
-  EXPECT_FALSE(blockId.RepresentsTypeBlock(nullptr));
-  EXPECT_FALSE(Lum_TlmBlockTypeID("other", "AND2").RepresentsTypeBlock(and2));
-  // Whole names only, both of them.
-  EXPECT_FALSE(Lum_TlmBlockTypeID("gates", "AND").RepresentsTypeBlock(and2));
-  EXPECT_FALSE(Lum_TlmBlockTypeID("gates", "AND22").RepresentsTypeBlock(and2));
-  EXPECT_FALSE(Lum_TlmBlockTypeID("gate", "AND2").RepresentsTypeBlock(and2));
-  EXPECT_FALSE(Lum_TlmBlockTypeID("gatesx", "AND2").RepresentsTypeBlock(and2));
-  EXPECT_TRUE(Lum_TlmPinTypeID().RepresentsTypePin(nullptr));
-  EXPECT_FALSE(Lum_TlmPinTypeID().RepresentsTypePin(a));
-  Lum_TlmPinTypeID const pinId("gates", "AND2", "A");
-  EXPECT_TRUE(pinId.RepresentsTypePin(a));
-  EXPECT_FALSE(pinId.RepresentsTypePin(nullptr));
-  EXPECT_FALSE(Lum_TlmPinTypeID("gates", "AND2", "B").RepresentsTypePin(a));
-  EXPECT_FALSE(Lum_TlmPinTypeID("gates", "MUX", "A").RepresentsTypePin(a));
-  EXPECT_FALSE(Lum_TlmPinTypeID("gates", "AND2", "").RepresentsTypePin(a));
-  EXPECT_FALSE(Lum_TlmPinTypeID("gate", "AND2", "A").RepresentsTypePin(a));
+  // Whole names only, all of them; a default identifier represents null alone.
+  std::pair<Lum_TlmBlockTypeID, bool> const blockIds[] = {{{}, false},
+                                                          {{"gates", "AND2"}, true},
+                                                          {{"other", "AND2"}, false},
+                                                          {{"gates", "AND"}, false},
+                                                          {{"gates", "AND22"}, false},
+                                                          {{"gate", "AND2"}, false},
+                                                          {{"gatesx", "AND2"}, false}};
+  for (std::size_t i = 0; i < std::size(blockIds); ++i) {
+    EXPECT_EQ(blockIds[i].first.RepresentsTypeBlock(and2), blockIds[i].second) << i;
+    EXPECT_EQ(blockIds[i].first.RepresentsTypeBlock(nullptr), i == 0) << i;
+  }
+  EXPECT_FALSE(blockIds[1].first.RepresentsTypeBlock(library->GetTypeBlock("MUX")));
+  std::pair<Lum_TlmPinTypeID, bool> const pinIds[] = {{{}, false},
+                                                      {{"gates", "AND2", "A"}, true},
+                                                      {{"gates", "AND2", "B"}, false},
+                                                      {{"gates", "MUX", "A"}, false},
+                                                      {{"gates", "AND2", ""}, false},
+                                                      {{"gate", "AND2", "A"}, false}};
+  for (std::size_t i = 0; i < std::size(pinIds); ++i) {
+    EXPECT_EQ(pinIds[i].first.RepresentsTypePin(a), pinIds[i].second) << i;
+    EXPECT_EQ(pinIds[i].first.RepresentsTypePin(nullptr), i == 0) << i;
+  }
 
   Lum_Tlm::TypeIDRegistry *registry = Lum_Tlm::pTypeIDRegistry;
   ASSERT_NE(registry, nullptr) << "the platform's own counter creates it";

@@ -38,106 +38,90 @@ template <class... Args> std::vector<std::string> Render(char const *format, Arg
   return {stream.GetText(), redirected.GetText(), text.c_str()};
 }
 
-// Each conversion reads exactly its argument and prints alike through every entry.
+// Each conversion reads exactly its argument and prints alike through every entry. Flags, width
+// and precision apply to every conversion and consume no argument of their own. An unknown or
+// unfinished conversion ends the formatting: the rest is text, and no argument is read.
 TEST(OrbDebugTest, Conversions) {
-  auto everywhere = [](char const *text) { return std::vector<std::string>(3, text); };
-  EXPECT_EQ(Render("100%% done"), everywhere("100% done"));
-  EXPECT_EQ(Render("<%s> %s", "abc", static_cast<char const *>(nullptr)),
-            everywhere("<abc> (null)"));
-  EXPECT_EQ(Render("%d %d %d %u", INT_MIN, INT_MAX, 0, UINT_MAX),
-            everywhere("-2147483648 2147483647 0 4294967295"));
-  EXPECT_EQ(Render("[%c]", 'A'), everywhere("[A]"));
-  EXPECT_EQ(Render("0x%x %x", static_cast<std::uintptr_t>(0xdeadbeefcafeULL),
-                   static_cast<std::uintptr_t>(0)),
-            everywhere("0xdeadbeefcafe 0"));
-  EXPECT_EQ(Render("%lU %lU %d", static_cast<std::uint64_t>(5000000000ULL), UINT64_MAX, 7),
-            everywhere("5000000000 18446744073709551615 7"));
-  // An unknown or unfinished conversion ends the formatting: the rest is text, no argument read.
-  EXPECT_EQ(Render("%d %q %5d|%s", 1, 7, "x"), everywhere("1 %q %5d|%s"));
-  EXPECT_EQ(Render("%s %ld %d", "a", 7L, 8), everywhere("a %ld %d"));
-  EXPECT_EQ(Render("%U %d", 8), everywhere("%U %d"));
-  EXPECT_EQ(Render("50%"), everywhere("50%"));
-  EXPECT_EQ(Render("%5.", 1), everywhere("%5."));
-  EXPECT_EQ(Render("%99999d|%s", 1, "x"), everywhere("%99999d|%s"));
+  std::pair<std::vector<std::string>, char const *> const cases[] = {
+      {Render("100%% done"), "100% done"},
+      {Render("<%s> %s", "abc", static_cast<char const *>(nullptr)), "<abc> (null)"},
+      {Render("%d %d %d %u", INT_MIN, INT_MAX, 0, UINT_MAX), "-2147483648 2147483647 0 4294967295"},
+      {Render("[%c]", 'A'), "[A]"},
+      {Render("0x%x %x", std::uintptr_t(0xdeadbeefcafeULL), std::uintptr_t(0)), "0xdeadbeefcafe 0"},
+      {Render("%lU %lU %d", std::uint64_t(5000000000ULL), UINT64_MAX, 7),
+       "5000000000 18446744073709551615 7"},
+      {Render("%d %q %5d|%s", 1, 7, "x"), "1 %q %5d|%s"},
+      {Render("%s %ld %d", "a", 7L, 8), "a %ld %d"},
+      {Render("%U %d", 8), "%U %d"},
+      {Render("50%"), "50%"},
+      {Render("%5.", 1), "%5."},
+      {Render("%99999d|%s", 1, "x"), "%99999d|%s"},
+      {Render("%5d|%s", 42, "next"), "   42|next"},
+      {Render("[%-5d][%05d][%+d][% d][%.3d][%-+6.2d]", 7, -42, 3, 3, 5, 9),
+       "[7    ][-0042][+3][ 3][005][+09   ]"},
+      {Render("[%08d][%3d][%.0d][%5.0d]", INT_MIN, -7, 0, 0), "[-2147483648][ -7][][     ]"},
+      {Render("[%-8s][%8s][%.3s][%5.2s][%.0s][%.9s]", "ab", "ab", "abcdef", "xyz", "q",
+              static_cast<char const *>(nullptr)),
+       "[ab      ][      ab][abc][   xy][][(null)]"},
+      {Render("[%3c][%-3c][%5%]", 'a', 'b'), "[  a][b  ][%]"},
+      {Render("[%08x][%#x][%#x][%-6x][%+u][%010u]", std::uintptr_t(0xbeef), std::uintptr_t(0xbeef),
+              std::uintptr_t(0), std::uintptr_t(0xa), 5u, UINT_MAX),
+       "[0000beef][0xbeef][0][a     ][5][4294967295]"},
+      {Render("[%22lU][%-3lU][%.4lU]", UINT64_MAX, std::uint64_t(1), std::uint64_t(7)),
+       "[  18446744073709551615][1  ][0007]"}};
+  for (auto const &[rendered, expected] : cases)
+    EXPECT_EQ(rendered, std::vector<std::string>(3, expected));
 }
 
-// Flags, width and precision apply to every conversion and consume no argument of their own.
-TEST(OrbDebugTest, FlagsWidthAndPrecision) {
-  auto everywhere = [](char const *text) { return std::vector<std::string>(3, text); };
-  EXPECT_EQ(Render("%5d|%s", 42, "next"), everywhere("   42|next"));
-  EXPECT_EQ(Render("[%-5d][%05d][%+d][% d][%.3d][%-+6.2d]", 7, -42, 3, 3, 5, 9),
-            everywhere("[7    ][-0042][+3][ 3][005][+09   ]"));
-  EXPECT_EQ(Render("[%08d][%3d][%.0d][%5.0d]", INT_MIN, -7, 0, 0),
-            everywhere("[-2147483648][ -7][][     ]"));
-  EXPECT_EQ(Render("[%-8s][%8s][%.3s][%5.2s][%.0s][%.9s]", "ab", "ab", "abcdef", "xyz", "q",
-                   static_cast<char const *>(nullptr)),
-            everywhere("[ab      ][      ab][abc][   xy][][(null)]"));
-  EXPECT_EQ(Render("[%3c][%-3c][%5%]", 'a', 'b'), everywhere("[  a][b  ][%]"));
-  EXPECT_EQ(Render("[%08x][%#x][%#x][%-6x][%+u][%010u]", std::uintptr_t(0xbeef),
-                   std::uintptr_t(0xbeef), std::uintptr_t(0), std::uintptr_t(0xa), 5u, UINT_MAX),
-            everywhere("[0000beef][0xbeef][0][a     ][5][4294967295]"));
-  EXPECT_EQ(Render("[%22lU][%-3lU][%.4lU]", UINT64_MAX, std::uint64_t(1), std::uint64_t(7)),
-            everywhere("[  18446744073709551615][1  ][0007]"));
-}
-
-struct ScanCase {
-  char const *text;
-  char const *format;
-  int result;          // what Port::sscanf returns
-  unsigned first = 0;  // the targets start as 0 and keep it when not assigned; read as
-  unsigned second = 0; // unsigned, so that a negative %d shows as its 32-bit value
-};
-
-std::ostream &operator<<(std::ostream &out, ScanCase const &c) {
-  return out << '"' << c.text << "\" with \"" << c.format << '"';
-}
-
-class PortScanTableTest : public ::testing::TestWithParam<ScanCase> {};
-
-// Each text converts as far as it can: a number out of range fails and stops the scan.
-TEST_P(PortScanTableTest, ConvertsWithinRange) {
-  ScanCase const c = GetParam();
-  unsigned first = 0;
-  unsigned second = 0;
-  int result = 0;
-  std::string const format = c.format;
-  if (format == "%d.%d") {
-    int a = 0;
-    int b = 0;
-    result = Port::sscanf(c.text, "%d.%d", &a, &b);
-    first = static_cast<unsigned>(a);
-    second = static_cast<unsigned>(b);
-  } else if (format == "%u.%u") {
-    result = Port::sscanf(c.text, "%u.%u", &first, &second);
-  } else {
-    int a = 0;
-    result = Port::sscanf(c.text, " %d %% x%u", &a, &second);
-    first = static_cast<unsigned>(a);
+// Each text converts as far as it can: a number out of range fails and stops the scan, and so
+// does a conversion the scanner does not know, before it reads that argument. The targets start
+// as 0; they are read as unsigned, so that a negative %d shows as its 32-bit value.
+TEST(PortScanTest, ConvertsWithinRange) {
+  struct {
+    char const *text, *format;
+    int result;
+    unsigned first = 0, second = 0;
+  } const cases[] = {{"3.1", "%d.%d", 2, 3, 1},
+                     {"3", "%d.%d", 1, 3, 0},
+                     {"", "%d.%d", EOF},
+                     {"  ", "%d.%d", EOF},
+                     {"abc", "%d.%d", 0},
+                     {"3,1", "%d.%d", 1, 3, 0},
+                     {" +7.-2x", "%d.%d", 2, 7, 0xFFFFFFFEu},
+                     {"-1.0", "%d.%d", 2, 0xFFFFFFFFu, 0},
+                     {"2147483647.-2147483648", "%d.%d", 2, 0x7FFFFFFFu, 0x80000000u},
+                     {"2147483648.1", "%d.%d", 0},
+                     {"4294967296.0", "%d.%d", 0},
+                     {"99999999999999999999.1", "%d.%d", 0},
+                     {"1.-2147483649", "%d.%d", 1, 1, 0},
+                     {"-.5", "%d.%d", 0},
+                     {"4294967295.0", "%u.%u", 2, 0xFFFFFFFFu, 0},
+                     {"4294967296.0", "%u.%u", 0},
+                     {"2.-1", "%u.%u", 2, 2, 0xFFFFFFFFu},
+                     {"1.99999999999999999999999", "%u.%u", 1, 1, 0},
+                     {" -5 %x9", " %d %% x%u", 2, 0xFFFFFFFBu, 9},
+                     {"-5%x9", " %d %% x%u", 2, 0xFFFFFFFBu, 9},
+                     {"-5 x9", " %d %% x%u", 1, 0xFFFFFFFBu, 0}};
+  for (auto const &c : cases) {
+    SCOPED_TRACE(std::string(c.text) + " with " + c.format);
+    int a = 0, b = 0;
+    unsigned first = 0, second = 0;
+    int result = 0;
+    if (std::string(c.format) == "%d.%d") {
+      result = Port::sscanf(c.text, "%d.%d", &a, &b);
+      first = static_cast<unsigned>(a);
+      second = static_cast<unsigned>(b);
+    } else if (std::string(c.format) == "%u.%u") {
+      result = Port::sscanf(c.text, "%u.%u", &first, &second);
+    } else {
+      result = Port::sscanf(c.text, " %d %% x%u", &a, &second);
+      first = static_cast<unsigned>(a);
+    }
+    EXPECT_EQ(result, c.result);
+    EXPECT_EQ(first, c.first);
+    EXPECT_EQ(second, c.second);
   }
-  EXPECT_EQ(result, c.result);
-  EXPECT_EQ(first, c.first);
-  EXPECT_EQ(second, c.second);
-}
 
-INSTANTIATE_TEST_SUITE_P(
-    Table, PortScanTableTest,
-    ::testing::Values(
-        ScanCase{"3.1", "%d.%d", 2, 3, 1}, ScanCase{"3", "%d.%d", 1, 3, 0},
-        ScanCase{"", "%d.%d", EOF}, ScanCase{"  ", "%d.%d", EOF}, ScanCase{"abc", "%d.%d", 0},
-        ScanCase{"3,1", "%d.%d", 1, 3, 0}, ScanCase{" +7.-2x", "%d.%d", 2, 7, 0xFFFFFFFEu},
-        ScanCase{"-1.0", "%d.%d", 2, 0xFFFFFFFFu, 0},
-        ScanCase{"2147483647.-2147483648", "%d.%d", 2, 0x7FFFFFFFu, 0x80000000u},
-        ScanCase{"2147483648.1", "%d.%d", 0}, ScanCase{"4294967296.0", "%d.%d", 0},
-        ScanCase{"99999999999999999999.1", "%d.%d", 0}, ScanCase{"1.-2147483649", "%d.%d", 1, 1, 0},
-        ScanCase{"-.5", "%d.%d", 0}, ScanCase{"4294967295.0", "%u.%u", 2, 0xFFFFFFFFu, 0},
-        ScanCase{"4294967296.0", "%u.%u", 0}, ScanCase{"2.-1", "%u.%u", 2, 2, 0xFFFFFFFFu},
-        ScanCase{"1.99999999999999999999999", "%u.%u", 1, 1, 0},
-        ScanCase{" -5 %x9", " %d %% x%u", 2, 0xFFFFFFFBu, 9},
-        ScanCase{"-5%x9", " %d %% x%u", 2, 0xFFFFFFFBu, 9},
-        ScanCase{"-5 x9", " %d %% x%u", 1, 0xFFFFFFFBu, 0}));
-
-// A conversion the scanner does not know stops it before it reads that argument.
-TEST(PortScanTest, UnknownConversionStops) {
   unsigned value = 0;
   char word[8] = "keep";
   EXPECT_EQ(Port::sscanf("8 word", "%u %7s", &value, word), 1);

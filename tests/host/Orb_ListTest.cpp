@@ -52,7 +52,7 @@ protected:
   std::vector<Item *> m_Expected;
 };
 
-// The patterns that must stay linear also keep host order at every step.
+// The removal patterns that must stay linear keep host order at every step.
 TEST_F(OrbListTest, RemovalPatternsKeepOrder) {
   Fill(200);
   // From the front, reading the front each time.
@@ -82,9 +82,17 @@ TEST_F(OrbListTest, RemovalPatternsKeepOrder) {
       --i;
     }
   ExpectSame("index walk removals");
-  // Appending after removals, then removing everything.
+  // Appending after removals; a stable sort renumbers the slots, so removals after it find their
+  // elements; then removing everything.
   Fill(20);
   ExpectSame("appends after removals");
+  auto const byNameDesc = [](Item const *a, Item const *b) { return a->name > b->name; };
+  m_List.StableSort(byNameDesc);
+  std::stable_sort(m_Expected.begin(), m_Expected.end(), byNameDesc);
+  ExpectSame("sorted");
+  Remove(m_Expected[5]);
+  Remove(m_Expected[0]);
+  ExpectSame("removed after sort");
   while (m_List.Size() > 0)
     Remove(m_List.At(m_List.Size() / 2));
   ExpectSame("emptied");
@@ -124,19 +132,6 @@ TEST_F(OrbListTest, ChurnKeepsMemoryFlat) {
   }
   ExpectSame("after churn");
   EXPECT_LE(m_List.Bytes(), 4 * before);
-}
-
-// Stable sort renumbers the slots: removals after it find their elements.
-TEST_F(OrbListTest, SortThenRemove) {
-  Fill(30);
-  Remove(m_Expected[3]);
-  auto const byNameDesc = [](Item const *a, Item const *b) { return a->name > b->name; };
-  m_List.StableSort(byNameDesc);
-  std::stable_sort(m_Expected.begin(), m_Expected.end(), byNameDesc);
-  ExpectSame("sorted");
-  Remove(m_Expected[5]);
-  Remove(m_Expected[0]);
-  ExpectSame("removed after sort");
 }
 
 // Drives a name index as a named list does: rebuilt from the live

@@ -5,7 +5,6 @@
 #include <gtest/gtest.h>
 
 #include <cstring>
-#include <memory>
 #include <string>
 #include <thread>
 #include <vector>
@@ -15,9 +14,8 @@ namespace {
 using namespace HostTest;
 using namespace std::string_literals;
 
-// Every change between empty, short (kept in the property), exactly the
-// short limit, just over it, and long values with NUL bytes, including a
-// value taken from the property's own bytes.
+// Every change between empty, short (kept in the property), exactly the short limit, just over it,
+// and long values with NUL bytes, including a value taken from the property's own bytes.
 TEST(PropertyValueTest, EveryLengthChangeKeepsEveryByte) {
   std::string const limit(Orb_Property::kSmallValue, 'x');
   std::vector<std::string> const values = {
@@ -30,7 +28,6 @@ TEST(PropertyValueTest, EveryLengthChangeKeepsEveryByte) {
       property.SetStringValue(to);
       EXPECT_EQ(property.GetValue(), to);
       EXPECT_STREQ(property.GetStringValue(), to.c_str());
-      // From its own bytes: whole, and without the first byte.
       property.SetStringValue(property.GetValue());
       EXPECT_EQ(property.GetValue(), to);
       if (!to.empty()) {
@@ -41,10 +38,11 @@ TEST(PropertyValueTest, EveryLengthChangeKeepsEveryByte) {
   }
 }
 
-// A value set before or after list entries stays beside them, as does a
-// string property given entries; members keep order and repeated names.
-TEST(PropertyValueTest, ValuesAndListsLiveSideBySide) {
-  Orb_PropertyHolder holder;
+// A value set before or after list entries stays beside them, as does a string property given
+// entries; members keep order and repeated names. Same-named properties are replaced in place on
+// create and copy (NUL bytes included); deleting another holder's property does nothing.
+TEST(PropertyValueTest, ValuesListsAndReplacementsInPlace) {
+  Orb_PropertyHolder holder, other;
   Orb_Property *text = holder.CreatePropertyString("S", "a long value, kept");
   text->AppendString("e\0"s);
   Orb_Property *strings = holder.CreatePropertyStringList("L");
@@ -58,10 +56,19 @@ TEST(PropertyValueTest, ValuesAndListsLiveSideBySide) {
   strings->ClearStrings();
   EXPECT_EQ(strings->GetValue(), "v");
   EXPECT_TRUE(strings->GetStrings().empty());
+
+  holder.CreatePropertyStringList("S")->AppendString("x");
+  holder.DeleteProperty(other.CreatePropertyString("M", "other"));
+  holder.DeleteProperty("L");
+  other.CreatePropertyList("O")->CreatePropertyString("k", "v")->SetStringValue("v\0w"s);
+  other.CreatePropertyString("N", "")->SetStringValue("\0n"s);
+  holder.CopyPropertiesFrom(other);
+  holder.CopyPropertiesFrom(holder);
+  EXPECT_EQ(PropertiesOf(holder), "S[x] M=other O{k:v\0w} N=\0n"s);
 }
 
-// Deleting down to nothing leaves an empty holder that works as new, and
-// order survives growth and deletes in the middle.
+// Deleting down to nothing leaves an empty holder that works as new, and order survives growth
+// and deletes in the middle.
 TEST(PropertyHolderTest, GrowsAndEmptiesInOrder) {
   Orb_PropertyHolder holder;
   for (int round = 0; round < 2; ++round) {
@@ -79,8 +86,8 @@ TEST(PropertyHolderTest, GrowsAndEmptiesInOrder) {
   }
 }
 
-// A name is stored once however many properties, copies and list members
-// use it, and goes with the last of them.
+// A name is stored once however many properties, copies and list members use it, and goes with
+// the last of them.
 TEST(PropertyNameTest, StoredOnceAndFreedWithTheLastUse) {
   std::size_t const before = Orb_Property::GetNameCount();
   {
@@ -101,8 +108,8 @@ TEST(PropertyNameTest, StoredOnceAndFreedWithTheLastUse) {
   EXPECT_EQ(Orb_Property::GetNameCount(), before);
 }
 
-// Threads creating and dropping properties of the same few names leave
-// no name behind and never mix names up.
+// Threads creating and dropping properties of the same few names leave no name behind and never
+// mix names up.
 TEST(PropertyNameTest, SharedAcrossThreads) {
   std::size_t const before = Orb_Property::GetNameCount();
   std::vector<std::thread> threads;
