@@ -71,9 +71,7 @@ TEST_F(TdmDesignTest, LoadRefusesForeignMarks) {
     } catch (Lum_ExceptionDesignLoad const &e) {
       EXPECT_EQ(e.GetMessage(), "Attempt to specialize non-Tdm design.");
       EXPECT_EQ(e.GetObjectName(), "top");
-      EXPECT_EQ(e.GetSubsystem(), "Lum");
       EXPECT_EQ(e.GetFile(), "../s/Lum_TdmDesign");
-      EXPECT_FALSE(e.GetFlag());
     }
     EXPECT_EQ(reopened.GetClientCount(), 0u);
     EXPECT_TRUE(reopened.GetOrbModel()->GetDesignMgrs().empty());
