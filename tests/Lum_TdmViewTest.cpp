@@ -156,7 +156,6 @@ TEST_F(TdmViewStampTest, LoadClassifiesTheStamp) {
                                     : "New design that requires newer software.");
       EXPECT_EQ(e.GetObjectName(), "dm");
       EXPECT_EQ(e.GetFile(), "../s/Lum_TdmView");
-      EXPECT_FALSE(e.GetFlag());
     }
     ASSERT_EQ(capture.GetReports().size(), 1u);
     Port_MsgReport const &report = capture.GetReports().front();
