@@ -600,6 +600,7 @@ TEST_F(TdmCallerTest, GraftedChildrenBindAfreshAndSurviveReopen) {
 // the hierarchy, and where it came from, which a commit keeps.
 TEST_F(TdmCallerTest, UntypedCopy) {
   Lum_TdmBlock *u = m_pTop->CreateUntypedBlock("u", m_pReg);
+  EXPECT_EQ(u->GetTypeBlock(), nullptr);
   EXPECT_EQ(PinText(u), "D0!,D1!,CLK!,Q!");
   EXPECT_EQ(u->GetPinByName("Q")->GetDirection(), Orb_Pin::PIN_OUTPUT);
   EXPECT_EQ(PropertyValue(u->GetPinByName("D0"), "LOC"), "P1");
