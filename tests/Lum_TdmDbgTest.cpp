@@ -96,22 +96,19 @@ protected:
   Lum_TlmBlock *m_pAnd2 = nullptr;
 };
 
-// A block shows its type block's address and name (an untyped one is shown
-// below with the derived class); a pin shows its type pin's address only.
+// A block shows its type block's address and name, a pin its type pin's
+// address; the frame around is checked once, with the design manager.
 TEST_F(TdmDbgTest, BlockAndPinShowTheirTypes) {
   auto model = ReopenedTypedDesign();
   Lum_TdmBlock *u1 = FirstView(*model)->GetBlock()->GetBlockByName("u1");
   ASSERT_EQ(u1->GetTypeBlock(), m_pAnd2);
   Capture capture;
   u1->Dbg();
-  EXPECT_EQ(capture.Take(), R + "Data for class <Lum_TdmBlock>:\n" +
-                                "(Lum_TlmBlock *) m_pTypeBlock = <" + Hex(m_pAnd2) + ">, (AND2)\n" +
-                                R + "Orb data:\nblock <u1>\n" + "  TDS_BLOCK_TYPE = <LIBD:AND2>\n" +
-                                R);
+  EXPECT_THAT(capture.Take(), HasSubstr("<Lum_TdmBlock>:\n(Lum_TlmBlock *) m_pTypeBlock = <" +
+                                        Hex(m_pAnd2) + ">, (AND2)\n" + R));
   u1->GetPinByName("B")->Dbg();
-  EXPECT_EQ(capture.Take(), R + "Data for class <Lum_TdmPin>:\n" + "(Lum_TlmPin *) m_TypePin = <" +
-                                Hex(m_pAnd2->GetPinByName("B")) + ">\n" + R +
-                                "Orb data:\npin <B>\n" + R);
+  EXPECT_THAT(capture.Take(), HasSubstr("<Lum_TdmPin>:\n(Lum_TlmPin *) m_TypePin = <" +
+                                        Hex(m_pAnd2->GetPinByName("B")) + ">\n" + R));
 }
 
 // The model, design manager, signal and network print no lines of their own;
