@@ -1,7 +1,5 @@
-// Typed blocks: binding from the stored type on load, pin reconciliation, the
-// pin name order, the block's commit and the commit walk; the caller's
-// operations: creating children from type blocks, rebinding, typed queries
-// and pin manifestation.
+// Typed blocks: binding and pin reconciliation on load, pin order, commits;
+// typed children, rebinding, typed queries and pin manifestation.
 
 #include "Lum_TdmTestSupport.h"
 
@@ -132,11 +130,9 @@ StoredBlock const kMappedReg{"LIBT:REG",
 // ---------------------------------------------------------------------------
 // Round trip
 
-// A loaded block binds to its stored type, maps DATA0 and DATA1, creates the
-// pins it lacks with their directions and sorts; its commit writes exactly
-// its type and its two mapped pins; a second commit changes nothing; a
-// reopen finds everything bound. With LUM_DONT_CREATE_UNUSED_PINS nothing is
-// created and the pins keep their stored order.
+// A loaded block binds, maps, creates the pins it lacks and sorts; its commit
+// writes its type and mapped pins, once. LUM_DONT_CREATE_UNUSED_PINS keeps
+// the stored pins as they are.
 TEST_F(TdmBlockTest, TypedDesignSurvivesSaveAndReopen) {
   auto model = OpenModel(WriteDesign(kMappedReg));
   Lum_TdmBlock *u1 = U1(*model);
@@ -342,9 +338,8 @@ TEST_F(TdmBlockTest, SecondClientModelBindsToo) {
 }
 
 // The view, its networks, its block tree depth first (pins, signals, then
-// children), then its user design; objects whose clients were discarded get
-// new ones, built by the model, and are committed in their places. A design
-// with a foreign mark is not committed, and keeps its mark.
+// children), then its user design; discarded clients are rebuilt in place. A
+// design with a foreign mark is not committed, and keeps its mark.
 TEST(TdmCommitOrderTest, CommitWalksInOrderRebuildingDiscardedClients) {
   TypedDesign design(std::make_unique<RecordingModel>("m", "db", ""));
   auto &model = static_cast<RecordingModel &>(design.Model());
@@ -556,11 +551,9 @@ TEST_F(TdmCallerTest, FailedGraftUnregisters) {
   EXPECT_EQ(PinText(m_pTop->GetBlock(0)), "D0,D1,CLK,Q");
 }
 
-// After a typed graft nothing under the child has a client until it is
-// reached again; the grafted a1 then binds from its copied type. The caller
-// wires the new children outside; both sides and the binding survive commit,
-// save and reopen. Two children of one type block get separate inner
-// networks.
+// After a typed graft nothing under the child has a client until reached;
+// a1 then binds from its copied type. Wiring and binding survive a reopen,
+// and two children of one type block get separate inner networks.
 TEST_F(TdmCallerTest, GraftedChildrenBindAfreshAndSurviveReopen) {
   Lum_TdmBlock *u = m_pTop->CreateTypedBlock("u1", m_pReg, true, true);
   Lum_TdmModel &model = Model();
@@ -735,10 +728,8 @@ TEST_F(TdmRebindTest, FailuresChangeNothing) {
   }
 }
 
-// A rebinding through a map reaches the store at the next commit and comes
-// back from a reopen; so does one through the stored map alone. An
-// unconnected pin that the type block lacks passes the check and ends
-// without a type pin.
+// Rebindings, with a map or without, survive commit and reopen; an
+// unconnected pin that the type block lacks ends without a type pin.
 TEST_F(TdmRebindTest, RebindingSurvivesReopen) {
   Lum_TdmBlock *v = AndChild("v");
   v->SetTypeBlock(m_pTgt, Map({{"A", m_pTgt->GetPinByName("A")},
