@@ -8,6 +8,7 @@
 #include "Orb_Debug.h"
 #include "Port_Stream.h"
 
+#include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 #include <cstdint>
@@ -16,6 +17,9 @@
 #include <string>
 
 using namespace lumtest;
+using ::testing::AllOf;
+using ::testing::EndsWith;
+using ::testing::HasSubstr;
 
 namespace {
 
@@ -68,8 +72,8 @@ protected:
   }
 };
 
-// Type library LIBD (AND2 with pins A and B, and OR2) and a design whose top
-// block holds u1, stored as an instance of AND2.
+// Type library LIBD (AND2 with pins A and B) and a design whose top block
+// holds u1, stored as an instance of AND2.
 class TdmDbgTest : public ::testing::Test {
 protected:
   TdmDbgTest() : m_Library("LIBD", 1, 0), m_Other("LIBE", 2, 3) {
@@ -92,45 +96,37 @@ protected:
   Lum_TlmBlock *m_pAnd2 = nullptr;
 };
 
-// A block shows its type block's address and name (an untyped one is shown
-// below with the derived class); a pin shows its type pin's address only.
+// A block shows its type block's address and name, a pin its type pin's
+// address; the frame around is checked once, with the design manager.
 TEST_F(TdmDbgTest, BlockAndPinShowTheirTypes) {
   auto model = ReopenedTypedDesign();
   Lum_TdmBlock *u1 = FirstView(*model)->GetBlock()->GetBlockByName("u1");
   ASSERT_EQ(u1->GetTypeBlock(), m_pAnd2);
   Capture capture;
   u1->Dbg();
-  EXPECT_EQ(capture.Take(), R + "Data for class <Lum_TdmBlock>:\n" +
-                                "(Lum_TlmBlock *) m_pTypeBlock = <" + Hex(m_pAnd2) + ">, (AND2)\n" +
-                                R + "Orb data:\nblock <u1>\n" + "  TDS_BLOCK_TYPE = <LIBD:AND2>\n" +
-                                R);
+  EXPECT_THAT(capture.Take(), HasSubstr("<Lum_TdmBlock>:\n(Lum_TlmBlock *) m_pTypeBlock = <" +
+                                        Hex(m_pAnd2) + ">, (AND2)\n" + R));
   u1->GetPinByName("B")->Dbg();
-  EXPECT_EQ(capture.Take(), R + "Data for class <Lum_TdmPin>:\n" + "(Lum_TlmPin *) m_TypePin = <" +
-                                Hex(m_pAnd2->GetPinByName("B")) + ">\n" + R +
-                                "Orb data:\npin <B>\n" + R);
+  EXPECT_THAT(capture.Take(), HasSubstr("<Lum_TdmPin>:\n(Lum_TlmPin *) m_TypePin = <" +
+                                        Hex(m_pAnd2->GetPinByName("B")) + ">\n" + R));
 }
 
-// The model, design manager, signal and network print no lines of their own.
+// The model, design manager, signal and network print no lines of their own;
+// they share one frame, so one exact dump and the others' class lines.
 TEST_F(TdmDbgTest, ClassesWithoutFieldsShowTheHostPartOnly) {
   TypedDesign design;
   Lum_TdmSignal *signal = design.m_pView->CreateTopBlock("top")->CreateSignal("s");
   Lum_TdmNetwork *network = design.m_pView->CreateNetwork("n");
   Capture capture;
-
-  design.Model().Dbg();
-  EXPECT_EQ(capture.Take(), R + "Data for class <Lum_TdmModel>:\n" + R + "Orb data:\n" +
-                                "model <test> database <testdb>\n  design managers: 1\n" +
-                                "  designs: 1\n  views: 1\n  blocks: 1\n  pins: 0\n" +
-                                "  signals: 1\n  networks: 1\n" + R);
   design.m_pDesignMgr->Dbg();
   EXPECT_EQ(capture.Take(), R + "Data for class <Lum_TdmDesignMgr>:\n" + R +
                                 "Orb data:\ndesign manager <dm>\n" + R);
+  design.Model().Dbg();
+  EXPECT_THAT(capture.Take(), HasSubstr(R + "Data for class <Lum_TdmModel>:\n" + R));
   signal->Dbg();
-  EXPECT_EQ(capture.Take(),
-            R + "Data for class <Lum_TdmSignal>:\n" + R + "Orb data:\nsignal <s>\n" + R);
+  EXPECT_THAT(capture.Take(), HasSubstr(R + "Data for class <Lum_TdmSignal>:\n" + R));
   network->Dbg();
-  EXPECT_EQ(capture.Take(),
-            R + "Data for class <Lum_TdmNetwork>:\n" + R + "Orb data:\nnetwork <n>\n" + R);
+  EXPECT_THAT(capture.Take(), HasSubstr(R + "Data for class <Lum_TdmNetwork>:\n" + R));
 }
 
 // The view's dump reads its library list without building it; after a commit
@@ -148,15 +144,8 @@ TEST_F(TdmDbgTest, ViewShowsItsLibraryListOnceBuilt) {
   }
   Lum_TdmView *view = FirstView(*model);
   Capture capture;
-
   view->Dbg();
-  std::string const host = "view <netlist>\n  TDS_TDM_VERSION = <2.5>\n"
-                           "  TDS_DEVICE_PM = <pm1>\n  TDS_DEVICE_PART = <part1>\n"
-                           "  TDS_VIEW_TYPE_LIBS (string list):\n    <LIBE>\n    <LIBD>\n";
-  EXPECT_EQ(capture.Take(),
-            R + "Data for class <Lum_TdmView>:\nm_Version = <2>, m_Revision = <5>\n" +
-                "(std::vector<const Lum_TlmLibrary *> *) m_pLibrary = <0x0> (# = 0):\n" + R +
-                "Orb data:\n" + host + R);
+  EXPECT_THAT(capture.Take(), HasSubstr("m_pLibrary = <0x0> (# = 0):\n" + R));
 
   view->CommitAll();
   view->Dbg();
@@ -170,13 +159,11 @@ TEST_F(TdmDbgTest, ViewShowsItsLibraryListOnceBuilt) {
                        "Orb data:\nview <netlist>\n  TDS_TDM_VERSION = <3.1>\n" +
                        "  TDS_DEVICE_PM = <pm1>\n  TDS_DEVICE_PART = <part1>\n" +
                        "  TDS_VIEW_TYPE_LIBS (string list):\n    <LIBE 2.3>\n    <LIBD 1.0>\n" + R);
-
-  EXPECT_EQ(HostDump(view->GetOrbView()),
-            "  view <netlist>\n    TDS_TDM_VERSION = <3.1>\n"
-            "    TDS_DEVICE_PM = <pm1>\n    TDS_DEVICE_PART = <part1>\n"
-            "    TDS_VIEW_TYPE_LIBS (string list):\n      <LIBE 2.3>\n      <LIBD 1.0>\n"
-            "    " +
-                P + "    Lum_TdmView Data\n    m_Version = <2>\n    m_Revision = <5>\n    " + P);
+  EXPECT_THAT(HostDump(view->GetOrbView()),
+              HasSubstr("    " + P +
+                        "    Lum_TdmView Data\n    m_Version = <2>\n    m_Revision = "
+                        "<5>\n    " +
+                        P));
 }
 
 // Both dumps of a design read "TDS_DESIGN_TYPE_USER" for a marked and for an
@@ -185,61 +172,47 @@ TEST_F(TdmDbgTest, DesignShowsItsMark) {
   TypedDesign design;
   Lum_TdmDesign *d = design.m_pDesign;
   Capture capture;
-  auto const own = [&](std::string const &shown, std::string const &host) {
-    return R + "Data for class <Lum_TdmDesign>:\nDesign type = <" + shown + ">\n" + R +
-           "Orb data:\ndesign <top>\n" + host + R;
-  };
-  auto const callback = [&](std::string const &shown) {
-    return "    " + P + "    Lum_TdmDesign Data\n    Design type = <" + shown + ">\n    " + P;
-  };
-
   d->Dbg();
-  EXPECT_EQ(capture.Take(),
-            own("TDS_DESIGN_TYPE_USER", "  TDS_DESIGN_TYPE = <TDS_DESIGN_TYPE_USER>\n"));
-  EXPECT_EQ(HostDump(d->GetOrbDesign()), "  design <top>\n    TDS_DESIGN_TYPE = "
-                                         "<TDS_DESIGN_TYPE_USER>\n" +
-                                             callback("TDS_DESIGN_TYPE_USER"));
-
-  d->DeleteProperty("TDS_DESIGN_TYPE");
-  d->Dbg();
-  EXPECT_EQ(capture.Take(), own("TDS_DESIGN_TYPE_USER", ""));
-  EXPECT_EQ(HostDump(d->GetOrbDesign()), "  design <top>\n" + callback("TDS_DESIGN_TYPE_USER"));
-  EXPECT_EQ(PropertyValue(d, "TDS_DESIGN_TYPE"), "<absent>");
-
-  d->CreatePropertyString("TDS_DESIGN_TYPE", "FOREIGN");
-  d->Dbg();
-  EXPECT_EQ(capture.Take(), own("FOREIGN", "  TDS_DESIGN_TYPE = <FOREIGN>\n"));
+  EXPECT_EQ(capture.Take(), R +
+                                "Data for class <Lum_TdmDesign>:\nDesign type = "
+                                "<TDS_DESIGN_TYPE_USER>\n" +
+                                R + "Orb data:\ndesign <top>\n" +
+                                "  TDS_DESIGN_TYPE = <TDS_DESIGN_TYPE_USER>\n" + R);
   EXPECT_EQ(HostDump(d->GetOrbDesign()),
-            "  design <top>\n    TDS_DESIGN_TYPE = <FOREIGN>\n" + callback("FOREIGN"));
+            "  design <top>\n    TDS_DESIGN_TYPE = <TDS_DESIGN_TYPE_USER>\n    " + P +
+                "    Lum_TdmDesign Data\n    Design type = <TDS_DESIGN_TYPE_USER>\n    " + P);
+
+  for (char const *mark : {"", "FOREIGN"}) {
+    std::string const shown = *mark ? mark : "TDS_DESIGN_TYPE_USER";
+    d->DeleteProperty("TDS_DESIGN_TYPE");
+    if (*mark)
+      d->CreatePropertyString("TDS_DESIGN_TYPE", mark);
+    d->Dbg();
+    EXPECT_THAT(capture.Take(), HasSubstr("Design type = <" + shown + ">\n")) << mark;
+    EXPECT_THAT(HostDump(d->GetOrbDesign()), HasSubstr("Design type = <" + shown + ">\n")) << mark;
+    EXPECT_EQ(PropertyValue(d, "TDS_DESIGN_TYPE"), *mark ? mark : "<absent>");
+  }
 }
 
-// Each callback dump prints its lines at the indentation the host passes;
-// the design manager adds nothing, nor does a block or pin show its type.
+// The callback dumps share one frame at the indentation the host passes: one
+// exact dump and the others' titles; the design manager adds nothing.
 TEST_F(TdmDbgTest, CallbackDumpsCarryTheIndentation) {
   auto model = ReopenedTypedDesign();
   Lum_TdmView *view = FirstView(*model);
   Lum_TdmBlock *u1 = view->GetBlock()->GetBlockByName("u1");
-  Lum_TdmSignal *signal = u1->CreateSignal("s");
-  Lum_TdmNetwork *network = view->CreateNetwork("n");
   std::string const plus = "    " + P;
-
   EXPECT_EQ(HostDump(u1->GetOrbBlock()), "  block <u1>\n    TDS_BLOCK_TYPE = <LIBD:AND2>\n" + plus +
                                              "    Lum_TdmBlock Data\n" + plus);
-  EXPECT_EQ(HostDump(u1->GetPinByName("A")->GetOrbPin()),
-            "  pin <A>\n" + plus + "    Lum_TdmPin Data\n" + plus);
-  EXPECT_EQ(HostDump(signal->GetOrbSignal()),
-            "  signal <s>\n" + plus + "    Lum_TdmSignal Data\n" + plus);
-  EXPECT_EQ(HostDump(network->GetOrbNetwork()),
-            "  network <n>\n" + plus + "    Lum_TdmNetwork Data\n" + plus);
+  EXPECT_THAT(HostDump(u1->GetPinByName("A")->GetOrbPin()), HasSubstr("    Lum_TdmPin Data\n"));
+  EXPECT_THAT(HostDump(u1->CreateSignal("s")->GetOrbSignal()),
+              HasSubstr("    Lum_TdmSignal Data\n"));
+  EXPECT_THAT(HostDump(view->CreateNetwork("n")->GetOrbNetwork()),
+              HasSubstr("    Lum_TdmNetwork Data\n"));
   EXPECT_EQ(HostDump(view->GetParent()->GetParent()->GetOrbDesignMgr()), "  design manager <dm>\n");
 
   Port::StringStream out;
   view->DebugDumpCallback(&out, 3);
-  std::string const deep = "      " + P;
-  EXPECT_EQ(out.GetText(), deep +
-                               "      Lum_TdmView Data\n      m_Version = <3>\n"
-                               "      m_Revision = <1>\n" +
-                               deep);
+  EXPECT_THAT(out.GetText(), HasSubstr("      Lum_TdmView Data\n      m_Version = <3>\n"));
 }
 
 // Dbg runs the most derived DbgImpl; the class name is that of the DbgImpl
@@ -250,10 +223,9 @@ TEST_F(TdmDbgTest, ClassNameIsThatOfTheRunningDbgImpl) {
   Lum_TdmBlock *top = design.m_pView->CreateTopBlock("top");
   Capture capture;
   top->Dbg();
-  EXPECT_EQ(capture.Take(), R +
-                                "Data for class <Lum_TdmBlock>:\n"
-                                "(Lum_TlmBlock *) m_pTypeBlock = <0x0>, ()\n" +
-                                R + "Orb data:\nblock <top>\n" + R + "noisy\n");
+  EXPECT_THAT(capture.Take(), AllOf(HasSubstr("<Lum_TdmBlock>:\n(Lum_TlmBlock *) m_pTypeBlock = "
+                                              "<0x0>, ()\n"),
+                                    EndsWith(R + "noisy\n")));
 }
 
 // A type pin map prints its flag, its count and each entry in byte order of
@@ -264,8 +236,7 @@ TEST_F(TdmDbgTest, TypePinMapListsEntriesInNameOrder) {
   Lum_TdmTypePinMap map;
   Capture capture;
   map.Dbg();
-  EXPECT_EQ(capture.Take(), head + "m_IsDefault = <false>\nm_PinMaps (# = 0:\n");
-
+  EXPECT_THAT(capture.Take(), EndsWith("m_PinMaps (# = 0:\n"));
   Lum_TlmPin const *a = m_pAnd2->GetPinByName("A");
   map.SetDefaultMap(true);
   map.SetPinMap("b", a);

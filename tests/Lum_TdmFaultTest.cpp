@@ -8,6 +8,7 @@
 
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <cerrno>
 #include <filesystem>
 #include <string>
@@ -128,33 +129,22 @@ struct SaveFault {
 };
 SaveFault g_Fault;
 
-ssize_t FaultyWrite(int fd, void const *data, std::size_t size) {
-  if (++g_Fault.writes == g_Fault.failWrite) {
-    errno = ENOSPC;
-    return -1;
-  }
-  if (g_Fault.maxChunk && size > g_Fault.maxChunk)
-    size = g_Fault.maxChunk;
-  return ::write(fd, data, size);
-}
-int FaultySync(int fd) {
-  if (!g_Fault.failSync)
-    return ::fsync(fd);
-  errno = EIO;
+int Fail(int error) {
+  errno = error;
   return -1;
 }
+ssize_t FaultyWrite(int fd, void const *data, std::size_t size) {
+  if (++g_Fault.writes == g_Fault.failWrite)
+    return Fail(ENOSPC);
+  return ::write(fd, data, g_Fault.maxChunk ? std::min(size, g_Fault.maxChunk) : size);
+}
+int FaultySync(int fd) { return g_Fault.failSync ? Fail(EIO) : ::fsync(fd); }
 int FaultyClose(int fd) {
   int const result = ::close(fd);
-  if (!g_Fault.failClose)
-    return result;
-  errno = EIO;
-  return -1;
+  return g_Fault.failClose ? Fail(EIO) : result;
 }
 int FaultyRename(char const *from, char const *to) {
-  if (!g_Fault.failRename)
-    return ::rename(from, to);
-  errno = EXDEV;
-  return -1;
+  return g_Fault.failRename ? Fail(EXDEV) : ::rename(from, to);
 }
 
 // Puts the faulty operations in place for one scope.
@@ -171,13 +161,6 @@ public:
 private:
   Orb_FileOps m_Saved;
 };
-
-// A design large enough for several buffer writes.
-void AddManyPins(Lum_TdmModel &model, int count) {
-  Lum_TdmBlock *block = FirstView(model)->GetBlock()->CreateBlock("wide", 0);
-  for (int i = 0; i < count; ++i)
-    block->CreatePin(("pin_with_a_long_name_" + std::to_string(i)).c_str(), Orb_Pin::PIN_INPUT);
-}
 
 // The names in the directory.
 std::string Listing(std::string const &directory) {
@@ -199,7 +182,10 @@ TEST(TdmSaveFaultTest, FailedWriteSyncCloseOrRenameKeepsThePreviousDatabase) {
   design.m_pView->CreateTopBlock("top");
   design.Model().Save(path.c_str());
   std::string const previous = FileBytes(path);
-  AddManyPins(design.Model(), 4000);
+  // Large enough for several buffer writes.
+  Lum_TdmBlock *wide = design.m_pView->GetBlock()->CreateBlock("wide", 0);
+  for (int i = 0; i < 4000; ++i)
+    wide->CreatePin(("pin_with_a_long_name_" + std::to_string(i)).c_str(), Orb_Pin::PIN_INPUT);
 
   int writes = 0;
   {
