@@ -310,6 +310,17 @@ std::unique_ptr<Orb_Model> Orb_ModelCompanion::ReleaseTakenModel() { return null
 // ---------------------------------------------------------------------------
 // Model
 
+// What a million-block design pays per object; and every kind fits a pool page.
+static_assert(sizeof(void *) != 8 || sizeof(Orb_Persistent) == 40, "properties, name, parent, ids");
+static_assert(sizeof(void *) != 8 || sizeof(Orb_Pin) == 64, "base and two sides");
+static_assert(sizeof(void *) != 8 || sizeof(Orb_Signal) == 80, "base, network, pin list");
+static_assert(sizeof(void *) != 8 || sizeof(Orb_Block) == 96, "base, view, pins, inside");
+static_assert(sizeof(Orb_View) <= Orb_ObjectPool::kMaxSlotSize &&
+                  sizeof(Orb_Design) <= Orb_ObjectPool::kMaxSlotSize &&
+                  sizeof(Orb_DesignMgr) <= Orb_ObjectPool::kMaxSlotSize &&
+                  sizeof(Orb_Network) <= Orb_ObjectPool::kMaxSlotSize,
+              "a host object fits a pool page");
+
 Orb_Model::Orb_Model(char const *name, char const *dbName, char const *path, bool readOnly)
     : m_Name(name ? name : ""), m_DbName(dbName ? dbName : ""), m_Path(path ? path : ""),
       m_ReadOnly(readOnly) {
