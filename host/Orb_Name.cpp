@@ -57,22 +57,21 @@ Orb_NameEntry *Orb_NameTable::Acquire(std::string_view name, bool share) {
   if (share) {
     auto const found = m_Shared.find(name);
     if (found != m_Shared.end()) {
-      ++found->second->refs;
-      return found->second;
+      ++found->second.holders;
+      return found->second.entry;
     }
   }
   if (name.size() >= (std::size_t(1) << 31))
     throw std::length_error("Orb_NameTable: name of 2 GiB or more");
   std::size_t const bytes = EntryBytes(name.size());
   auto *entry = static_cast<Orb_NameEntry *>(Allocate(bytes));
-  entry->refs = 1;
   entry->size = static_cast<std::uint32_t>(name.size());
   entry->shared = share ? 1 : 0;
   std::memcpy(entry->text, name.data(), name.size());
   entry->text[name.size()] = '\0';
   if (share) {
     try {
-      m_Shared.emplace(entry->GetNameString(), entry);
+      m_Shared.emplace(entry->GetNameString(), Shared{entry, 1});
     } catch (...) {
       Free(entry, bytes);
       throw;
@@ -82,9 +81,11 @@ Orb_NameEntry *Orb_NameTable::Acquire(std::string_view name, bool share) {
 }
 
 void Orb_NameTable::Release(Orb_NameEntry *entry) noexcept {
-  if (--entry->refs > 0)
-    return;
-  if (entry->shared)
-    m_Shared.erase(entry->GetNameString());
+  if (entry->shared) {
+    auto const found = m_Shared.find(entry->GetNameString());
+    if (--found->second.holders > 0)
+      return;
+    m_Shared.erase(found);
+  }
   Free(entry, EntryBytes(entry->size));
 }

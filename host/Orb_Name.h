@@ -19,10 +19,9 @@
 #include <unordered_set>
 #include <vector>
 
-// One stored name: a count of the objects holding it (1 for an unshared
-// one), its length and its bytes with a terminating NUL.
+// One stored name: its length, whether it is shared, and its bytes with a
+// terminating NUL. A shared entry's holders are counted in the table.
 struct Orb_NameEntry {
-  std::uint32_t refs;
   std::uint32_t size : 31;
   std::uint32_t shared : 1;
   char text[1]; // NOLINT(modernize-avoid-c-arrays): the bytes run on past the struct
@@ -59,8 +58,13 @@ private:
   void *Allocate(std::size_t bytes);
   void Free(void *entry, std::size_t bytes) noexcept;
 
-  // The shared entries by their text (which the key views; entries never move).
-  std::unordered_map<std::string_view, Orb_NameEntry *> m_Shared;
+  // The shared entries and their holder counts, by their text (which the
+  // key views; entries never move).
+  struct Shared {
+    Orb_NameEntry *entry;
+    std::size_t holders;
+  };
+  std::unordered_map<std::string_view, Shared> m_Shared;
   // Free entries by size class (bytes / kGrain), each holding the next.
   std::vector<void *> m_Free = std::vector<void *>(kClassLimit / kGrain + 1, nullptr);
   std::vector<void *> m_Chunks;
