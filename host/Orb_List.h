@@ -76,7 +76,7 @@ public:
   Orb_List() = default;
   Orb_List(Orb_List const &) = delete;
   Orb_List &operator=(Orb_List const &) = delete;
-  ~Orb_List() { Orb_SmallRelease(m_pRaw, m_Capacity * sizeof(T *)); }
+  ~Orb_List() { ReleaseRaw(); }
 
   std::size_t Size() const { return m_Count; }
   // The element at index `i` (< Size()) in host order.
@@ -84,12 +84,12 @@ public:
     if (m_Start + i >= m_Clean)
       Squeeze(m_Start + i + 1);
     // Squeezing may have moved the front.
-    return m_pRaw[m_Start + i];
+    return Slots()[m_Start + i];
   }
   // The Size() elements in host order, holes squeezed out.
   T *const *Data() const {
     Squeeze(m_Size);
-    return m_pRaw + m_Start;
+    return Slots() + m_Start;
   }
   Orb_Range<T, SlotOf> Range() const { return Orb_Range<T, SlotOf>(*this); }
 
@@ -111,7 +111,7 @@ public:
     if (m_Size == m_Capacity)
       Reallocate(m_Capacity == 0 ? 4 : 2 * std::size_t(m_Capacity));
     std::uint32_t const slot = m_Size++;
-    m_pRaw[slot] = item;
+    Slots()[slot] = item;
     SlotOf()(item, this) = slot;
     if (m_Clean == slot && m_Scan == slot)
       m_Clean = m_Scan = slot + 1;
@@ -124,21 +124,32 @@ public:
   // Sorts the elements with `less`, stably.
   template <class Less> void StableSort(Less const &less) {
     Squeeze(m_Size);
-    std::stable_sort(m_pRaw + m_Start, m_pRaw + m_Size, less);
+    std::stable_sort(Slots() + m_Start, Slots() + m_Size, less);
     Renumber(m_Start);
   }
   // Approximate heap bytes the list holds.
-  std::size_t Bytes() const { return m_Capacity * sizeof(T *); }
+  std::size_t Bytes() const { return m_Capacity > 1 ? m_Capacity * sizeof(T *) : 0; }
 
 private:
-  // Moves the slots to an array of `capacity` (>= m_Size) slots.
+  // The slots: the one kept in place while the room is one element at most
+  // (a signal with one pin needs no array), else the array.
+  T **Slots() const { return m_Capacity <= 1 ? const_cast<T **>(&m_pOne) : m_pRaw; }
+  void ReleaseRaw() noexcept {
+    if (m_Capacity > 1)
+      Orb_SmallRelease(m_pRaw, m_Capacity * sizeof(T *));
+  }
+  // Moves the slots to room for `capacity` (>= m_Size) slots.
   void Reallocate(std::size_t capacity) {
     if (capacity > UINT32_MAX)
       throw std::bad_alloc();
+    if (capacity <= 1 && m_Capacity <= 1) {
+      m_Capacity = static_cast<std::uint32_t>(capacity);
+      return;
+    }
     auto **raw = static_cast<T **>(Orb_SmallAllocate(capacity * sizeof(T *)));
     if (m_Size > 0)
-      std::copy(m_pRaw, m_pRaw + m_Size, raw);
-    Orb_SmallRelease(m_pRaw, m_Capacity * sizeof(T *));
+      std::copy(Slots(), Slots() + m_Size, raw);
+    ReleaseRaw();
     m_pRaw = raw;
     m_Capacity = static_cast<std::uint32_t>(capacity);
   }
@@ -146,13 +157,16 @@ private:
   void Squeeze(std::size_t upTo) const noexcept;
   void Renumber(std::uint32_t from) const noexcept {
     for (std::uint32_t i = from; i < m_Size; ++i)
-      SlotOf()(m_pRaw[i], this) = i;
+      SlotOf()(Slots()[i], this) = i;
   }
 
-  // m_pRaw[0, m_Size) of m_Capacity slots: [0, m_Start) holes, [m_Start,
+  // Slots()[0, m_Size) of m_Capacity slots: [0, m_Start) holes, [m_Start,
   // m_Clean) elements, no holes, [m_Clean, m_Scan) holes, [m_Scan, m_Size)
   // elements and holes not yet squeezed. Holes are null.
-  T **m_pRaw = nullptr;
+  union {
+    T **m_pRaw;
+    T *m_pOne = nullptr;
+  };
   std::uint32_t m_Capacity = 0;
   mutable std::uint32_t m_Size = 0;
   mutable std::uint32_t m_Start = 0;
@@ -163,9 +177,10 @@ private:
 
 template <class T, class SlotOf> void Orb_List<T, SlotOf>::Remove(T *item) noexcept {
   std::uint32_t const p = SlotOf()(item, this);
-  assert(p < m_Size && m_pRaw[p] == item && "Orb_List::Remove: not an element");
+  T **const raw = Slots();
+  assert(p < m_Size && raw[p] == item && "Orb_List::Remove: not an element");
   --m_Count;
-  m_pRaw[p] = nullptr;
+  raw[p] = nullptr;
   if (m_Count == 0) {
     Clear();
     return;
@@ -180,17 +195,17 @@ template <class T, class SlotOf> void Orb_List<T, SlotOf>::Remove(T *item) noexc
     std::uint32_t const gap = m_Scan - m_Clean;
     if (gap > 0) {
       for (std::uint32_t j = m_Clean; j-- > p + 1;) {
-        T *moved = m_pRaw[j];
-        m_pRaw[j + gap] = moved;
+        T *moved = raw[j];
+        raw[j + gap] = moved;
         SlotOf()(moved, this) = j + gap;
       }
-      std::fill(m_pRaw + p + 1, m_pRaw + std::min(m_Clean, p + 1 + gap), nullptr);
+      std::fill(raw + p + 1, raw + std::min(m_Clean, p + 1 + gap), nullptr);
     }
     m_Clean = p;
     m_Scan = p + 1 + gap;
   }
   // Trailing holes go.
-  while (m_Size > m_Scan && !m_pRaw[m_Size - 1])
+  while (m_Size > m_Scan && !raw[m_Size - 1])
     --m_Size;
   if (m_Scan == m_Size)
     m_Size = m_Scan = m_Clean;
@@ -198,12 +213,13 @@ template <class T, class SlotOf> void Orb_List<T, SlotOf>::Remove(T *item) noexc
 
 template <class T, class SlotOf>
 void Orb_List<T, SlotOf>::Squeeze(std::size_t upTo) const noexcept {
+  T **const raw = Slots();
   while (m_Clean < upTo && m_Scan < m_Size) {
-    T *item = m_pRaw[m_Scan];
+    T *item = raw[m_Scan];
     if (item) {
       if (m_Scan != m_Clean) {
-        m_pRaw[m_Clean] = item;
-        m_pRaw[m_Scan] = nullptr;
+        raw[m_Clean] = item;
+        raw[m_Scan] = nullptr;
         SlotOf()(item, this) = m_Clean;
       }
       ++m_Clean;
@@ -214,7 +230,7 @@ void Orb_List<T, SlotOf>::Squeeze(std::size_t upTo) const noexcept {
     m_Size = m_Scan = m_Clean;
   // Holes gathered at the front go once they are half the list.
   if (m_Start > 0 && m_Clean == m_Size && m_Start >= m_Size / 2) {
-    std::copy(m_pRaw + m_Start, m_pRaw + m_Size, m_pRaw);
+    std::copy(raw + m_Start, raw + m_Size, raw);
     m_Size -= m_Start;
     m_Start = 0;
     m_Clean = m_Scan = m_Size;

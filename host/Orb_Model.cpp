@@ -182,7 +182,7 @@ Orb_Block::Inside &Orb_Block::MakeInside() {
 }
 
 Orb_Block::Inside const &Orb_Block::NoInside() {
-  static Inside const none;
+  static Inside const none{};
   return none;
 }
 

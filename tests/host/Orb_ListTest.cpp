@@ -134,6 +134,25 @@ TEST_F(OrbListTest, ChurnKeepsMemoryFlat) {
   EXPECT_LE(m_List.Bytes(), 4 * before);
 }
 
+// Room for one keeps the element in the list itself; growing past it moves
+// the element to an array, in order, with its slot.
+TEST(OrbListInlineTest, OneInPlaceThenGrows) {
+  Item a(0), b(1), c(2);
+  List list;
+  list.Reserve(1);
+  list.Add(&a);
+  EXPECT_EQ(list.Bytes(), 0u);
+  EXPECT_EQ(list.Range()[0], &a);
+  list.Remove(&a);
+  EXPECT_TRUE(list.Range().empty());
+  list.Add(&b);
+  list.Add(&a);
+  list.Add(&c);
+  list.Remove(&a);
+  EXPECT_EQ(list.Range(), (std::vector<Item *>{&b, &c}));
+  EXPECT_EQ(c.slot, 1u);
+}
+
 // Drives a name index as a named list does: rebuilt from the live
 // elements, with room for twice as many, when an insertion finds it full.
 struct IndexDriver {
