@@ -90,7 +90,8 @@ char const *Orb_PinDirectionName(Orb_Pin::PIN_DIRECTION direction) {
 
 Orb_Persistent::Orb_Persistent(Orb_Model *model, Orb_Kind kind, Orb_Persistent *parent,
                                std::string_view name)
-    : m_pParent(parent), m_Kind(static_cast<std::uint8_t>(kind)) {
+    : m_pParent(parent), m_Kind(static_cast<std::uint8_t>(kind)), m_LongName(false), m_Dying(false),
+      m_DeleteFired(false) {
   m_LongName = m_Name.Set(model->m_Names, name, kind == Orb_Kind::Pin);
 }
 
@@ -311,10 +312,11 @@ std::unique_ptr<Orb_Model> Orb_ModelCompanion::ReleaseTakenModel() { return null
 // Model
 
 // What a million-block design pays per object; and every kind fits a pool page.
-static_assert(sizeof(void *) != 8 || sizeof(Orb_Persistent) == 40, "properties, name, parent, ids");
-static_assert(sizeof(void *) != 8 || sizeof(Orb_Pin) == 64, "base and two sides");
+static_assert(sizeof(void *) != 8 || sizeof(Orb_Persistent) == 32,
+              "properties, name, parent, slot");
+static_assert(sizeof(void *) != 8 || sizeof(Orb_Pin) == 56, "base and two sides");
 static_assert(sizeof(void *) != 8 || sizeof(Orb_Signal) == 80, "base, network, pin list");
-static_assert(sizeof(void *) != 8 || sizeof(Orb_Block) == 96, "base, view, pins, inside");
+static_assert(sizeof(void *) != 8 || sizeof(Orb_Block) == 88, "base, view, pins, inside");
 static_assert(sizeof(Orb_View) <= Orb_ObjectPool::kMaxSlotSize &&
                   sizeof(Orb_Design) <= Orb_ObjectPool::kMaxSlotSize &&
                   sizeof(Orb_DesignMgr) <= Orb_ObjectPool::kMaxSlotSize &&
@@ -433,7 +435,6 @@ std::size_t Orb_Model::GetObjectCount(Orb_Kind kind) const {
 
 void Orb_Model::Destroy(Orb_Persistent *object) noexcept {
   auto const k = static_cast<unsigned>(object->GetKind());
-  unsigned const id = object->m_BridgeId;
   // The whole table goes with the model.
   if (object->m_LongName && !m_TearingDown)
     m_Names.Release(object->m_Name.entry);
@@ -462,7 +463,7 @@ void Orb_Model::Destroy(Orb_Persistent *object) noexcept {
   }
   --m_ObjectCount[k];
   if (!m_TearingDown)
-    m_Pools[k].Release(object, id);
+    m_Pools[k].Release(object);
 }
 
 template <class T> T *Orb_Model::Announce(T *object) {
@@ -733,6 +734,8 @@ void Orb_ObjectPool::SetSlotSize(std::size_t size, void *owner) {
   // Host objects hold pointers and integers: pointer alignment is enough.
   std::size_t const align = alignof(void *);
   m_SlotSize = (std::max(size, sizeof(FreeSlot)) + align - 1) / align * align;
+  m_Reciprocal =
+      static_cast<std::uint32_t>(((std::uint64_t(1) << 32) + m_SlotSize - 1) / m_SlotSize);
   m_pOwner = owner;
 }
 
@@ -750,29 +753,26 @@ void Orb_ObjectPool::NextPage() {
       m_NextChunkPages *= 2;
   }
   unsigned char *page = m_pPageEnd;
-  *reinterpret_cast<void **>(page) = m_pOwner;
+  new (page) PageHeader{m_pOwner, m_NextId, m_Reciprocal};
   m_pNext = page + kPageHeader;
   m_pPageEnd = page + kPageBytes;
 }
 
-void *Orb_ObjectPool::Allocate(unsigned &id) {
+void *Orb_ObjectPool::Allocate() {
   if (m_pFree) {
     FreeSlot *slot = m_pFree;
     m_pFree = slot->next;
-    id = slot->id;
     return slot;
   }
   if (static_cast<std::size_t>(m_pPageEnd - m_pNext) < m_SlotSize)
     NextPage();
   void *slot = m_pNext;
   m_pNext += m_SlotSize;
-  id = m_NextId++;
+  ++m_NextId;
   return slot;
 }
 
-void Orb_ObjectPool::Release(void *slot, unsigned id) noexcept {
-  m_pFree = new (slot) FreeSlot{m_pFree, id};
-}
+void Orb_ObjectPool::Release(void *slot) noexcept { m_pFree = new (slot) FreeSlot{m_pFree}; }
 
 namespace {
 

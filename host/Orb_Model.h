@@ -60,7 +60,8 @@ public:
   Orb_Kind GetKind() const { return static_cast<Orb_Kind>(m_Kind); }
   Orb_Model *GetModel() const { return Orb_ObjectPool::ModelOf<Orb_Model>(this); }
   Orb_Persistent *GetParentObject() const { return m_pParent; }
-  unsigned GetBridgeId() const { return m_BridgeId; }
+  // Dense per kind and model: the slot's number in the model's pool.
+  unsigned GetBridgeId() const { return Orb_ObjectPool::IdOf(this); }
   // Whether a deletion under way holds the object: its delete events have
   // fired or are about to, and it is freed when that deletion ends.
   bool IsBeingDeleted() const { return m_Dying; }
@@ -80,14 +81,13 @@ private:
   friend struct Orb_ChildSlot;
   Orb_Name m_Name;
   Orb_Persistent *m_pParent;
-  unsigned m_BridgeId = 0;
   // The object's slot in its parent's container (Orb_List).
   std::uint32_t m_Slot = 0;
   std::uint8_t m_Kind;
-  bool m_LongName = false;
-  bool m_Dying = false;
-  bool m_DeleteFired = false;
-  // The rest of the last word is free for a derived class's small fields.
+  bool m_LongName : 1;
+  bool m_Dying : 1;
+  bool m_DeleteFired : 1;
+  // The last two bytes are free for a derived class's small fields.
 };
 
 // Where a host object keeps its slot in its parent's container.
@@ -222,7 +222,7 @@ public:
 
   enum PIN_DIRECTION { PIN_INPUT, PIN_OUTPUT, PIN_BIDIRECTIONAL };
 
-  PIN_DIRECTION GetDirection() const { return m_Direction; }
+  PIN_DIRECTION GetDirection() const { return static_cast<PIN_DIRECTION>(m_Direction); }
   Orb_Block *GetParent() const;
   // The outer connection: a signal of the parent block of the pin's block, or
   // null. A top block's pin has none.
@@ -246,8 +246,8 @@ private:
   // signals' pin lists in step.
   void Link(Orb_Signal *&side, Orb_Signal *signal);
   void Unlink(Orb_Signal *&side) noexcept;
-  // In the base's last word.
-  PIN_DIRECTION m_Direction;
+  // In the base's last bytes.
+  std::uint8_t m_Direction;
   Orb_Signal *m_pSignal = nullptr;
   Orb_Signal *m_pInnerSignal = nullptr;
   // Slots in the pin lists of the two signals.
@@ -278,7 +278,7 @@ private:
   friend struct Orb_ConnectionSlot;
   friend struct Orb_NetworkSlot;
   Orb_Signal(Orb_Model *model, Orb_Block *parent, std::string_view name);
-  // The signal's slot in its network's list (in the base's last word).
+  // The signal's slot in its network's list.
   std::uint32_t m_NetworkSlot = 0;
   Orb_Network *m_pNetwork = nullptr;
   Orb_List<Orb_Pin, Orb_ConnectionSlot> m_Pins;
@@ -668,16 +668,14 @@ private:
 
 template <class T, class... Args> T *Orb_Model::Make(Args &&...args) {
   auto const k = static_cast<unsigned>(T::kKind);
-  unsigned id = 0;
-  void *memory = m_Pools[k].Allocate(id);
+  void *memory = m_Pools[k].Allocate();
   T *object = nullptr;
   try {
     object = new (memory) T(std::forward<Args>(args)...);
   } catch (...) {
-    m_Pools[k].Release(memory, id);
+    m_Pools[k].Release(memory);
     throw;
   }
-  object->m_BridgeId = id;
   ++m_ObjectCount[k];
   return object;
 }

@@ -7,8 +7,9 @@
 // create/delete churn and deleting needs no bookkeeping beyond one link.
 //
 // Chunks are made of aligned pages, and each page starts with its pool's
-// owner (the model): an object finds its model from its own address, so no
-// object spends a pointer on it.
+// owner (the model) and the number of its first slot: an object finds its
+// model and its own number from its address, so no object spends bytes on
+// them.
 
 #include "Lum_PlatformApi.h"
 
@@ -19,7 +20,13 @@
 class LUM_PLATFORM_API Orb_ObjectPool {
 public:
   static constexpr std::size_t kPageBytes = 4096;
-  static constexpr std::size_t kPageHeader = sizeof(void *);
+  // The owner, the first slot's number and the reciprocal of the slot size.
+  struct PageHeader {
+    void *owner;
+    std::uint32_t firstId;
+    std::uint32_t reciprocal;
+  };
+  static constexpr std::size_t kPageHeader = sizeof(PageHeader);
   static constexpr std::size_t kMaxSlotSize = kPageBytes - kPageHeader;
 
   Orb_ObjectPool() = default;
@@ -30,32 +37,43 @@ public:
   // Sets the slot size (at most kMaxSlotSize) and the owner that every slot
   // reports, before the first Allocate.
   void SetSlotSize(std::size_t size, void *owner);
-  // Memory for one object and its number. Throws std::bad_alloc.
-  void *Allocate(unsigned &id);
+  // Memory for one object. Throws std::bad_alloc.
+  void *Allocate();
   // Gives a slot back for reuse; its object must be destroyed already.
-  void Release(void *slot, unsigned id) noexcept;
-  // Every number handed out so far is below this.
+  void Release(void *slot) noexcept;
+  // Every slot number handed out so far is below this.
   unsigned IdLimit() const { return m_NextId; }
   // Bytes held in chunks.
   std::size_t Bytes() const { return m_Bytes; }
 
-  // The owner of the pool that holds the object at `slot` (any address
-  // inside a slot will do).
+  // The owner of the pool that holds the object at `slot`.
   template <class Owner> static Owner *ModelOf(void const *slot) {
-    auto const page = reinterpret_cast<std::uintptr_t>(slot) & ~(kPageBytes - 1);
-    return *reinterpret_cast<Owner *const *>(page); // NOLINT(performance-no-int-to-ptr)
+    return static_cast<Owner *>(Header(slot).owner);
+  }
+  // The number of the slot at `slot` in its pool: dense from 0, and the same
+  // for the next object that reuses the slot.
+  static unsigned IdOf(void const *slot) {
+    PageHeader const &header = Header(slot);
+    auto const offset = reinterpret_cast<std::uintptr_t>(slot) % kPageBytes - kPageHeader;
+    // offset is a multiple of the slot size below a page: exact.
+    return header.firstId +
+           static_cast<unsigned>((std::uint64_t(offset) * header.reciprocal) >> 32);
   }
 
 private:
-  // A released slot holds the next released slot and its own number.
+  static PageHeader const &Header(void const *slot) {
+    auto const page = reinterpret_cast<std::uintptr_t>(slot) & ~(kPageBytes - 1);
+    return *reinterpret_cast<PageHeader const *>(page); // NOLINT(performance-no-int-to-ptr)
+  }
+  // A released slot holds the next released slot.
   struct FreeSlot {
     FreeSlot *next;
-    unsigned id;
   };
   // Starts the next page, taking a new chunk when the current one is used up.
   void NextPage();
 
   std::size_t m_SlotSize = sizeof(FreeSlot);
+  std::uint32_t m_Reciprocal = 0;
   void *m_pOwner = nullptr;
   std::vector<void *> m_Chunks;
   unsigned char *m_pNext = nullptr;
