@@ -91,7 +91,7 @@ char const *Orb_PinDirectionName(Orb_Pin::PIN_DIRECTION direction) {
 Orb_Persistent::Orb_Persistent(Orb_Model *model, Orb_Kind kind, Orb_Persistent *parent,
                                std::string_view name)
     : m_pParent(parent), m_Kind(static_cast<std::uint8_t>(kind)), m_LongName(false), m_Dying(false),
-      m_DeleteFired(false) {
+      m_DeleteFired(false), m_InNetwork(false) {
   m_LongName = m_Name.Set(model->m_Names, name, kind == Orb_Kind::Pin);
 }
 
@@ -148,28 +148,42 @@ Orb_Signal::Orb_Signal(Orb_Model *model, Orb_Block *parent, std::string_view nam
 
 Orb_Block *Orb_Signal::GetParent() const { return static_cast<Orb_Block *>(GetParentObject()); }
 
+Orb_Network *Orb_Signal::GetNetwork() const {
+  if (!m_InNetwork)
+    return nullptr;
+  return GetParent()->GetView()->m_Memberships.find(this)->second.network;
+}
+
 Orb_Network::Orb_Network(Orb_Model *model, Orb_View *parent, std::string_view name)
     : Orb_Persistent(model, Orb_Kind::Network, parent, name) {}
 
 Orb_View *Orb_Network::GetParent() const { return static_cast<Orb_View *>(GetParentObject()); }
 
 void Orb_Network::AddSignal(Orb_Signal *signal) {
-  if (!signal || signal->m_pNetwork == this)
+  if (!signal || signal->GetNetwork() == this)
     return;
   if (signal->GetParent()->GetView() != GetParent())
     throw Orb_Exception(kSource, __LINE__, signal->GetName(),
                         "A network can only hold signals of its own view.");
-  if (signal->m_pNetwork)
-    signal->m_pNetwork->RemoveSignal(signal);
-  m_Signals.Add(signal);
-  signal->m_pNetwork = this;
+  if (Orb_Network *previous = signal->GetNetwork())
+    previous->RemoveSignal(signal);
+  auto &memberships = GetParent()->m_Memberships;
+  auto const entry = memberships.emplace(signal, Orb_View::Membership{this, 0}).first;
+  try {
+    m_Signals.Add(signal);
+  } catch (...) {
+    memberships.erase(entry);
+    throw;
+  }
+  signal->m_InNetwork = true;
 }
 
 void Orb_Network::RemoveSignal(Orb_Signal *signal) {
-  if (!signal || signal->m_pNetwork != this)
+  if (!signal || signal->GetNetwork() != this)
     return;
   m_Signals.Remove(signal);
-  signal->m_pNetwork = nullptr;
+  GetParent()->m_Memberships.erase(signal);
+  signal->m_InNetwork = false;
 }
 
 Orb_Block::Orb_Block(Orb_Model *model, Orb_Persistent *parent, Orb_View *view,
@@ -315,7 +329,7 @@ std::unique_ptr<Orb_Model> Orb_ModelCompanion::ReleaseTakenModel() { return null
 static_assert(sizeof(void *) != 8 || sizeof(Orb_Persistent) == 32,
               "properties, name, parent, slot");
 static_assert(sizeof(void *) != 8 || sizeof(Orb_Pin) == 56, "base and two sides");
-static_assert(sizeof(void *) != 8 || sizeof(Orb_Signal) == 80, "base, network, pin list");
+static_assert(sizeof(void *) != 8 || sizeof(Orb_Signal) == 64, "base and pin list");
 static_assert(sizeof(void *) != 8 || sizeof(Orb_Block) == 88, "base, view, pins, inside");
 static_assert(sizeof(Orb_View) <= Orb_ObjectPool::kMaxSlotSize &&
                   sizeof(Orb_Design) <= Orb_ObjectPool::kMaxSlotSize &&
@@ -688,14 +702,17 @@ void Orb_Model::Free(Orb_Persistent *object, bool keepLinks) noexcept {
       auto *signal = static_cast<Orb_Signal *>(object);
       for (Orb_Pin *pin : signal->m_Pins.Range())
         (pin->GetParent() == signal->GetParent() ? pin->m_pInnerSignal : pin->m_pSignal) = nullptr;
-      if (signal->m_pNetwork)
-        signal->m_pNetwork->RemoveSignal(signal);
+      if (Orb_Network *network = signal->GetNetwork())
+        network->RemoveSignal(signal);
       break;
     }
     case Orb_Kind::Network: {
       auto *network = static_cast<Orb_Network *>(object);
-      for (Orb_Signal *signal : network->m_Signals.Range())
-        signal->m_pNetwork = nullptr;
+      auto &memberships = network->GetParent()->m_Memberships;
+      for (Orb_Signal *signal : network->m_Signals.Range()) {
+        memberships.erase(signal);
+        signal->m_InNetwork = false;
+      }
       break;
     }
     default:

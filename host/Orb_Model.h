@@ -78,6 +78,8 @@ protected:
 
 private:
   friend class Orb_Model;
+  friend class Orb_Network;
+  friend class Orb_Signal;
   friend struct Orb_ChildSlot;
   Orb_Name m_Name;
   Orb_Persistent *m_pParent;
@@ -87,6 +89,8 @@ private:
   bool m_LongName : 1;
   bool m_Dying : 1;
   bool m_DeleteFired : 1;
+  // A signal's: it belongs to a network (its view keeps the membership).
+  bool m_InNetwork : 1;
   // The last two bytes are free for a derived class's small fields.
 };
 
@@ -263,7 +267,7 @@ public:
 
   Orb_Block *GetParent() const;
   // The network the signal belongs to, or null.
-  Orb_Network *GetNetwork() const { return m_pNetwork; }
+  Orb_Network *GetNetwork() const;
   // Pins connected to the signal from either side, in connection order: pins
   // of its own block (their inner connection) and pins of its block's child
   // blocks (their outer one).
@@ -278,19 +282,12 @@ private:
   friend struct Orb_ConnectionSlot;
   friend struct Orb_NetworkSlot;
   Orb_Signal(Orb_Model *model, Orb_Block *parent, std::string_view name);
-  // The signal's slot in its network's list.
-  std::uint32_t m_NetworkSlot = 0;
-  Orb_Network *m_pNetwork = nullptr;
   Orb_List<Orb_Pin, Orb_ConnectionSlot> m_Pins;
 };
 
 inline std::uint32_t &Orb_ConnectionSlot::operator()(Orb_Pin *pin, void const *list) const {
   return pin->m_pInnerSignal && list == &pin->m_pInnerSignal->m_Pins ? pin->m_InnerSlot
                                                                      : pin->m_OuterSlot;
-}
-
-inline std::uint32_t &Orb_NetworkSlot::operator()(Orb_Signal *signal, void const * /*list*/) const {
-  return signal->m_NetworkSlot;
 }
 
 class LUM_PLATFORM_API Orb_Network : public Orb_Persistent {
@@ -395,10 +392,25 @@ private:
   friend class Orb_Model;
   friend class Orb_ModelIO;
   friend class Orb_Design;
+  friend class Orb_Network;
+  friend class Orb_Signal;
+  friend struct Orb_NetworkSlot;
   Orb_View(Orb_Model *model, Orb_Design *parent, std::string_view name);
   Orb_Block *m_pTopBlock = nullptr;
   Orb_NamedList<Orb_Network> m_Networks;
+  // The network of each of the view's signals that belongs to one, and the
+  // signal's slot in the network's list. Most signals belong to none, so a
+  // signal keeps only a bit (Orb_Signal::GetNetwork).
+  struct Membership {
+    Orb_Network *network;
+    std::uint32_t slot;
+  };
+  std::unordered_map<Orb_Signal const *, Membership> m_Memberships;
 };
+
+inline std::uint32_t &Orb_NetworkSlot::operator()(Orb_Signal *signal, void const * /*list*/) const {
+  return signal->GetParent()->GetView()->m_Memberships.find(signal)->second.slot;
+}
 
 class LUM_PLATFORM_API Orb_Design : public Orb_Persistent {
 public:

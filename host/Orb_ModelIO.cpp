@@ -638,8 +638,9 @@ Orb_Network *Orb_ModelIO::ReadNetwork(Orb_View *view) {
   auto *network = view->GetModel()->Make<Orb_Network>(view->GetModel(), view, std::move(name));
   Place(network, "network");
   std::uint64_t const count = m_pIn->Num();
-  network->m_Signals.ReserveExact(
-      static_cast<std::size_t>(std::min<std::uint64_t>(count, m_Signals.size())));
+  auto const members = static_cast<std::size_t>(std::min<std::uint64_t>(count, m_Signals.size()));
+  network->m_Signals.ReserveExact(members);
+  view->m_Memberships.reserve(view->m_Memberships.size() + members);
   for (std::uint64_t n = count; n > 0; --n) {
     Orb_Signal *signal = SignalAt(m_pIn->Num());
     if (signal->GetNetwork())

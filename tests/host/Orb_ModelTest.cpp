@@ -391,6 +391,17 @@ TEST_F(HostModelTest, ConnectionsLeaveInOrder) {
   EXPECT_EQ(Names(n->GetSignals()), "t0 t2 t4");
   EXPECT_EQ(q->GetInnerSignal(), nullptr);
   EXPECT_EQ(pins[0]->GetSignal(), nullptr);
+  // Moving a signal to another network, deleting a network and reusing a
+  // deleted signal's slot leave no membership behind.
+  Orb_Network *n2 = v->CreateNetwork("n2");
+  n2->AddSignal(top->GetSignalByName("t0"));
+  EXPECT_EQ(top->GetSignalByName("t0")->GetNetwork(), n2);
+  EXPECT_EQ(Names(n->GetSignals()), "t2 t4");
+  v->DeleteNetwork(n);
+  EXPECT_EQ(top->GetSignalByName("t2")->GetNetwork(), nullptr);
+  EXPECT_EQ(top->CreateSignal("fresh")->GetNetwork(), nullptr);
+  n2->AddSignal(top->GetSignalByName("t2"));
+  EXPECT_EQ(Names(n2->GetSignals()), "t0 t2");
 }
 
 // Pin names over 7 bytes are stored once per model: two pins of that name share it, lookups and
