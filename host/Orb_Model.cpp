@@ -91,7 +91,7 @@ char const *Orb_PinDirectionName(Orb_Pin::PIN_DIRECTION direction) {
 Orb_Persistent::Orb_Persistent(Orb_Model *model, Orb_Kind kind, Orb_Persistent *parent,
                                std::string_view name)
     : m_pParent(parent), m_Kind(static_cast<std::uint8_t>(kind)), m_LongName(false), m_Dying(false),
-      m_DeleteFired(false), m_InNetwork(false) {
+      m_DeleteFired(false), m_InNetwork(false), m_HasInner(false) {
   m_LongName = m_Name.Set(model->m_Names, name, kind == Orb_Kind::Pin);
 }
 
@@ -111,7 +111,7 @@ void Orb_Pin::Connect(Orb_Signal *signal) {
                    : "a top block's pin connects only inside.";
     throw Orb_Exception(kSource, __LINE__, GetName(), message.c_str());
   }
-  Link(m_pSignal, signal);
+  Link(false, signal);
 }
 
 void Orb_Pin::ConnectInner(Orb_Signal *signal) {
@@ -121,26 +121,56 @@ void Orb_Pin::ConnectInner(Orb_Signal *signal) {
                          PathOf(signal) + ">: the pin connects inside only to signals of block <" +
                          PathOf(GetParent()) + ">.")
                             .c_str());
-  Link(m_pInnerSignal, signal);
+  Link(true, signal);
 }
 
-void Orb_Pin::Link(Orb_Signal *&side, Orb_Signal *signal) {
-  if (signal == side)
+Orb_PinLink *Orb_Pin::InnerLink() const {
+  if (!m_HasInner)
+    return nullptr;
+  return &GetParent()->GetView()->m_InnerLinks.find(this)->second;
+}
+
+Orb_Signal *Orb_Pin::GetInnerSignal() const {
+  Orb_PinLink const *link = InnerLink();
+  return link ? link->signal : nullptr;
+}
+
+void Orb_Pin::Link(bool inner, Orb_Signal *signal) {
+  if (signal == (inner ? GetInnerSignal() : m_pSignal))
     return;
+  if (!signal) {
+    Unlink(inner);
+    return;
+  }
   // Room first, so that running out of memory changes nothing.
-  if (signal)
-    signal->m_Pins.Reserve(1);
-  Unlink(side);
-  side = signal;
-  if (signal)
-    signal->m_Pins.Add(this);
+  signal->m_Pins.Reserve(1);
+  if (!inner) {
+    Unlink(false);
+    m_pSignal = signal;
+  } else if (Orb_PinLink *link = InnerLink()) {
+    link->signal->m_Pins.Remove(this);
+    link->signal = signal;
+  } else {
+    GetParent()->GetView()->m_InnerLinks.emplace(this, Orb_PinLink{signal, 0});
+    m_HasInner = true;
+  }
+  signal->m_Pins.Add(this);
 }
 
-void Orb_Pin::Unlink(Orb_Signal *&side) noexcept {
-  if (!side)
-    return;
-  side->m_Pins.Remove(this);
-  side = nullptr;
+void Orb_Pin::Unlink(bool inner) noexcept {
+  Orb_Signal *signal = inner ? GetInnerSignal() : m_pSignal;
+  if (signal)
+    signal->m_Pins.Remove(this);
+  Forget(inner);
+}
+
+void Orb_Pin::Forget(bool inner) noexcept {
+  if (!inner) {
+    m_pSignal = nullptr;
+  } else if (m_HasInner) {
+    GetParent()->GetView()->m_InnerLinks.erase(this);
+    m_HasInner = false;
+  }
 }
 
 Orb_Signal::Orb_Signal(Orb_Model *model, Orb_Block *parent, std::string_view name)
@@ -328,7 +358,7 @@ std::unique_ptr<Orb_Model> Orb_ModelCompanion::ReleaseTakenModel() { return null
 // What a million-block design pays per object; and every kind fits a pool page.
 static_assert(sizeof(void *) != 8 || sizeof(Orb_Persistent) == 32,
               "properties, name, parent, slot");
-static_assert(sizeof(void *) != 8 || sizeof(Orb_Pin) == 56, "base and two sides");
+static_assert(sizeof(void *) != 8 || sizeof(Orb_Pin) == 48, "base and the outer side");
 static_assert(sizeof(void *) != 8 || sizeof(Orb_Signal) == 64, "base and pin list");
 static_assert(sizeof(void *) != 8 || sizeof(Orb_Block) == 88, "base, view, pins, inside");
 static_assert(sizeof(Orb_View) <= Orb_ObjectPool::kMaxSlotSize &&
@@ -694,14 +724,14 @@ void Orb_Model::Free(Orb_Persistent *object, bool keepLinks) noexcept {
     switch (object->GetKind()) {
     case Orb_Kind::Pin: {
       auto *pin = static_cast<Orb_Pin *>(object);
-      pin->Unlink(pin->m_pSignal);
-      pin->Unlink(pin->m_pInnerSignal);
+      pin->Unlink(false);
+      pin->Unlink(true);
       break;
     }
     case Orb_Kind::Signal: {
       auto *signal = static_cast<Orb_Signal *>(object);
       for (Orb_Pin *pin : signal->m_Pins.Range())
-        (pin->GetParent() == signal->GetParent() ? pin->m_pInnerSignal : pin->m_pSignal) = nullptr;
+        pin->Forget(pin->GetParent() == signal->GetParent());
       if (Orb_Network *network = signal->GetNetwork())
         network->RemoveSignal(signal);
       break;

@@ -79,8 +79,10 @@ protected:
 private:
   friend class Orb_Model;
   friend class Orb_Network;
+  friend class Orb_Pin;
   friend class Orb_Signal;
   friend struct Orb_ChildSlot;
+  friend struct Orb_ConnectionSlot;
   Orb_Name m_Name;
   Orb_Persistent *m_pParent;
   // The object's slot in its parent's container (Orb_List).
@@ -91,6 +93,8 @@ private:
   bool m_DeleteFired : 1;
   // A signal's: it belongs to a network (its view keeps the membership).
   bool m_InNetwork : 1;
+  // A pin's: it has an inner connection (its view keeps it).
+  bool m_HasInner : 1;
   // The last two bytes are free for a derived class's small fields.
 };
 
@@ -220,6 +224,12 @@ struct Orb_NetworkSlot {
   std::uint32_t &operator()(Orb_Signal *signal, void const *list) const;
 };
 
+// A pin's inner connection and the pin's slot in that signal's pin list.
+struct Orb_PinLink {
+  Orb_Signal *signal;
+  std::uint32_t slot;
+};
+
 class LUM_PLATFORM_API Orb_Pin : public Orb_Persistent {
 public:
   static constexpr Orb_Kind kKind = Orb_Kind::Pin;
@@ -232,7 +242,7 @@ public:
   // null. A top block's pin has none.
   Orb_Signal *GetSignal() const { return m_pSignal; }
   // The inner connection: a signal of the pin's own block, or null.
-  Orb_Signal *GetInnerSignal() const { return m_pInnerSignal; }
+  Orb_Signal *GetInnerSignal() const;
   // Set the outer or the inner connection, replacing the previous one; null
   // disconnects that side. A signal of any other block (for Connect on a top
   // block's pin, any signal) throws Orb_Exception naming the pin and the
@@ -246,17 +256,21 @@ private:
   friend class Orb_Block;
   friend struct Orb_ConnectionSlot;
   Orb_Pin(Orb_Model *model, Orb_Block *parent, std::string_view name, PIN_DIRECTION direction);
-  // Points `side` (m_pSignal or m_pInnerSignal) at `signal`, keeping the
-  // signals' pin lists in step.
-  void Link(Orb_Signal *&side, Orb_Signal *signal);
-  void Unlink(Orb_Signal *&side) noexcept;
+  // Points the outer or inner side at `signal` (null: disconnects it),
+  // keeping the signals' pin lists in step. Throws std::bad_alloc and then
+  // changes nothing.
+  void Link(bool inner, Orb_Signal *signal);
+  void Unlink(bool inner) noexcept;
+  // Forgets one side without touching its signal, which is going.
+  void Forget(bool inner) noexcept;
+  // The inner connection's record in the view, or null.
+  Orb_PinLink *InnerLink() const;
   // In the base's last bytes.
   std::uint8_t m_Direction;
-  Orb_Signal *m_pSignal = nullptr;
-  Orb_Signal *m_pInnerSignal = nullptr;
-  // Slots in the pin lists of the two signals.
+  // The outer connection and the slot in its signal's pin list. The inner
+  // one lives in the view: most pins (those of leaf blocks) have none.
   std::uint32_t m_OuterSlot = 0;
-  std::uint32_t m_InnerSlot = 0;
+  Orb_Signal *m_pSignal = nullptr;
 };
 
 LUM_PLATFORM_API char const *Orb_PinDirectionName(Orb_Pin::PIN_DIRECTION direction);
@@ -286,8 +300,12 @@ private:
 };
 
 inline std::uint32_t &Orb_ConnectionSlot::operator()(Orb_Pin *pin, void const *list) const {
-  return pin->m_pInnerSignal && list == &pin->m_pInnerSignal->m_Pins ? pin->m_InnerSlot
-                                                                     : pin->m_OuterSlot;
+  if (pin->m_HasInner) {
+    Orb_PinLink *link = pin->InnerLink();
+    if (link->signal && list == &link->signal->m_Pins)
+      return link->slot;
+  }
+  return pin->m_OuterSlot;
 }
 
 class LUM_PLATFORM_API Orb_Network : public Orb_Persistent {
@@ -393,6 +411,7 @@ private:
   friend class Orb_ModelIO;
   friend class Orb_Design;
   friend class Orb_Network;
+  friend class Orb_Pin;
   friend class Orb_Signal;
   friend struct Orb_NetworkSlot;
   Orb_View(Orb_Model *model, Orb_Design *parent, std::string_view name);
@@ -406,6 +425,8 @@ private:
     std::uint32_t slot;
   };
   std::unordered_map<Orb_Signal const *, Membership> m_Memberships;
+  // The inner connections of the view's pins that have one.
+  std::unordered_map<Orb_Pin const *, Orb_PinLink> m_InnerLinks;
 };
 
 inline std::uint32_t &Orb_NetworkSlot::operator()(Orb_Signal *signal, void const * /*list*/) const {

@@ -628,7 +628,7 @@ void Orb_ModelIO::ReadConnections() {
     if (inner ? pin->GetInnerSignal() : pin->GetSignal())
       m_pIn->Corrupt("pin " + Quote(pin->GetNameString()) + " is connected twice " +
                      (inner ? "inside" : "outside"));
-    pin->Link(inner ? pin->m_pInnerSignal : pin->m_pSignal, signal);
+    pin->Link(inner, signal);
   }
   m_pIn->End();
 }

@@ -402,6 +402,15 @@ TEST_F(HostModelTest, ConnectionsLeaveInOrder) {
   EXPECT_EQ(top->CreateSignal("fresh")->GetNetwork(), nullptr);
   n2->AddSignal(top->GetSignalByName("t2"));
   EXPECT_EQ(Names(n2->GetSignals()), "t0 t2");
+  // An inner connection moved from one signal to another, and a pin made in
+  // a deleted pin's slot, which starts unconnected.
+  q->ConnectInner(top->GetSignalByName("t0"));
+  q->ConnectInner(top->GetSignalByName("t2"));
+  EXPECT_EQ(Names(top->GetSignalByName("t0")->GetPins()), "");
+  EXPECT_EQ(Names(top->GetSignalByName("t2")->GetPins()), "q");
+  top->DeletePin(q);
+  EXPECT_EQ(Names(top->GetSignalByName("t2")->GetPins()), "");
+  EXPECT_EQ(top->CreatePin("q2", Orb_Pin::PIN_INPUT)->GetInnerSignal(), nullptr);
 }
 
 // Pin names over 7 bytes are stored once per model: two pins of that name share it, lookups and
