@@ -13,6 +13,7 @@
 #include <mutex>
 #include <new>
 #include <string>
+#include <tuple>
 
 namespace {
 
@@ -91,8 +92,41 @@ char const *Orb_PinDirectionName(Orb_Pin::PIN_DIRECTION direction) {
 Orb_Persistent::Orb_Persistent(Orb_Model *model, Orb_Kind kind, Orb_Persistent *parent,
                                std::string_view name)
     : m_pParent(parent), m_Kind(static_cast<std::uint8_t>(kind)), m_LongName(false), m_Dying(false),
-      m_DeleteFired(false), m_InNetwork(false), m_HasInner(false) {
+      m_DeleteFired(false), m_InNetwork(false), m_HasInner(false), m_HasProperties(false) {
   m_LongName = m_Name.Set(model->m_Names, name, kind == Orb_Kind::Pin);
+}
+
+Orb_PropertyHolder const *Orb_Persistent::Properties() const {
+  switch (GetKind()) {
+  case Orb_Kind::DesignMgr:
+    return &static_cast<Orb_DesignMgr const *>(this)->m_Properties;
+  case Orb_Kind::Design:
+    return &static_cast<Orb_Design const *>(this)->m_Properties;
+  case Orb_Kind::View:
+    return &static_cast<Orb_View const *>(this)->m_Properties;
+  case Orb_Kind::Block:
+    return &static_cast<Orb_Block const *>(this)->m_Properties;
+  case Orb_Kind::Network:
+    return &static_cast<Orb_Network const *>(this)->m_Properties;
+  case Orb_Kind::Pin:
+  case Orb_Kind::Signal:
+    break;
+  }
+  if (!m_HasProperties)
+    return nullptr;
+  return &GetModel()->m_SideProperties.find(this)->second;
+}
+
+Orb_PropertyHolder &Orb_Persistent::MakeProperties() {
+  if (Orb_PropertyHolder const *holder = Properties())
+    return const_cast<Orb_PropertyHolder &>(
+        *holder); // NOLINT(cppcoreguidelines-pro-type-const-cast)
+  auto &side = GetModel()->m_SideProperties;
+  Orb_PropertyHolder &holder =
+      side.emplace(std::piecewise_construct, std::forward_as_tuple(this), std::forward_as_tuple())
+          .first->second;
+  m_HasProperties = true;
+  return holder;
 }
 
 Orb_Pin::Orb_Pin(Orb_Model *model, Orb_Block *parent, std::string_view name,
@@ -356,10 +390,9 @@ std::unique_ptr<Orb_Model> Orb_ModelCompanion::ReleaseTakenModel() { return null
 // Model
 
 // What a million-block design pays per object; and every kind fits a pool page.
-static_assert(sizeof(void *) != 8 || sizeof(Orb_Persistent) == 32,
-              "properties, name, parent, slot");
-static_assert(sizeof(void *) != 8 || sizeof(Orb_Pin) == 48, "base and the outer side");
-static_assert(sizeof(void *) != 8 || sizeof(Orb_Signal) == 64, "base and pin list");
+static_assert(sizeof(void *) != 8 || sizeof(Orb_Persistent) == 24, "name, parent, slot, flags");
+static_assert(sizeof(void *) != 8 || sizeof(Orb_Pin) == 40, "base and the outer side");
+static_assert(sizeof(void *) != 8 || sizeof(Orb_Signal) == 56, "base and pin list");
 static_assert(sizeof(void *) != 8 || sizeof(Orb_Block) == 88, "base, view, pins, inside");
 static_assert(sizeof(Orb_View) <= Orb_ObjectPool::kMaxSlotSize &&
                   sizeof(Orb_Design) <= Orb_ObjectPool::kMaxSlotSize &&
@@ -479,9 +512,11 @@ std::size_t Orb_Model::GetObjectCount(Orb_Kind kind) const {
 
 void Orb_Model::Destroy(Orb_Persistent *object) noexcept {
   auto const k = static_cast<unsigned>(object->GetKind());
-  // The whole table goes with the model.
+  // The whole table goes with the model, and so do the side properties.
   if (object->m_LongName && !m_TearingDown)
     m_Names.Release(object->m_Name.entry);
+  if (object->m_HasProperties && !m_TearingDown)
+    m_SideProperties.erase(object);
   switch (object->GetKind()) {
   case Orb_Kind::DesignMgr:
     static_cast<Orb_DesignMgr *>(object)->~Orb_DesignMgr();

@@ -50,7 +50,7 @@ constexpr unsigned Orb_MaxBlockDepth = 1000;
 // Host objects are made and freed by their owners only, in their model's
 // pools (Orb_ObjectPool), which also know the model an object belongs to.
 // No virtual functions: the model destroys an object through its kind.
-class LUM_PLATFORM_API Orb_Persistent : public Orb_PropertyHolder {
+class LUM_PLATFORM_API Orb_Persistent {
 public:
   Orb_Persistent(Orb_Persistent const &) = delete;
   Orb_Persistent &operator=(Orb_Persistent const &) = delete;
@@ -69,6 +69,50 @@ public:
   // Prints the object's kind, name and properties, then lets the client of
   // every attached context add its lines (DebugDumpCallback).
   void DebugDump(Port::Stream *stream, int indent) const;
+
+  // Properties (Orb_PropertyHolder). A block, view, design, design manager
+  // or network keeps its own holder; a pin's or a signal's (most have none)
+  // lives in its model, made by the first property and marked by a bit.
+  Orb_Property *GetPropertyByName(char const *name) const {
+    Orb_PropertyHolder const *holder = Properties();
+    return holder ? holder->GetPropertyByName(name) : nullptr;
+  }
+  Orb_Property *CreatePropertyString(char const *name, char const *value) {
+    return MakeProperties().CreatePropertyString(name, value);
+  }
+  Orb_Property *CreatePropertyStringList(char const *name) {
+    return MakeProperties().CreatePropertyStringList(name);
+  }
+  Orb_Property *CreatePropertyList(char const *name) {
+    return MakeProperties().CreatePropertyList(name);
+  }
+  void DeleteProperty(char const *name) {
+    if (Properties())
+      MakeProperties().DeleteProperty(name);
+  }
+  void DeleteProperty(Orb_Property *property) {
+    if (Properties())
+      MakeProperties().DeleteProperty(property);
+  }
+  Orb_PropertyHolder::Range GetProperties() const {
+    Orb_PropertyHolder const *holder = Properties();
+    return holder ? holder->GetProperties() : Orb_PropertyHolder::Range(nullptr, 0);
+  }
+  void DumpProperties(Port::Stream *stream, int indent) const {
+    if (Orb_PropertyHolder const *holder = Properties())
+      holder->DumpProperties(stream, indent);
+  }
+  // Copies every property of `other` onto this object, replacing those of
+  // the same names.
+  void CopyPropertiesFrom(Orb_Persistent const &other) {
+    Orb_PropertyHolder const *holder = other.Properties();
+    if (holder && !holder->GetProperties().empty())
+      MakeProperties().CopyPropertiesFrom(*holder);
+  }
+  // The object's holder, or null while a pin or signal has none.
+  Orb_PropertyHolder const *Properties() const;
+  // The object's holder, made if needed. Throws std::bad_alloc.
+  Orb_PropertyHolder &MakeProperties();
 
 protected:
   Orb_Persistent(Orb_Model *model, Orb_Kind kind, Orb_Persistent *parent, std::string_view name);
@@ -95,6 +139,8 @@ private:
   bool m_InNetwork : 1;
   // A pin's: it has an inner connection (its view keeps it).
   bool m_HasInner : 1;
+  // A pin's or a signal's: its model keeps a property holder for it.
+  bool m_HasProperties : 1;
   // The last two bytes are free for a derived class's small fields.
 };
 
@@ -322,11 +368,13 @@ public:
   void RemoveSignal(Orb_Signal *signal);
 
 private:
+  friend class Orb_Persistent;
   friend class Orb_Model;
   friend class Orb_ModelIO;
   friend class Orb_View;
   Orb_Network(Orb_Model *model, Orb_View *parent, std::string_view name);
   Orb_List<Orb_Signal, Orb_NetworkSlot> m_Signals;
+  Orb_PropertyHolder m_Properties;
 };
 
 class LUM_PLATFORM_API Orb_Block : public Orb_Persistent {
@@ -370,6 +418,7 @@ public:
   void SortPins(Orb_SortFtor<Orb_Pin> const &ftor);
 
 private:
+  friend class Orb_Persistent;
   friend class Orb_Model;
   friend class Orb_ModelIO;
   friend class Orb_View;
@@ -388,6 +437,7 @@ private:
   Orb_View *m_pView;
   Orb_NamedList<Orb_Pin> m_Pins;
   std::unique_ptr<Inside> m_pInside;
+  Orb_PropertyHolder m_Properties;
 };
 
 class LUM_PLATFORM_API Orb_View : public Orb_Persistent {
@@ -407,6 +457,7 @@ public:
   void DeleteNetwork(Orb_Network *network);
 
 private:
+  friend class Orb_Persistent;
   friend class Orb_Model;
   friend class Orb_ModelIO;
   friend class Orb_Design;
@@ -417,6 +468,7 @@ private:
   Orb_View(Orb_Model *model, Orb_Design *parent, std::string_view name);
   Orb_Block *m_pTopBlock = nullptr;
   Orb_NamedList<Orb_Network> m_Networks;
+  Orb_PropertyHolder m_Properties;
   // The network of each of the view's signals that belongs to one, and the
   // signal's slot in the network's list. Most signals belong to none, so a
   // signal keeps only a bit (Orb_Signal::GetNetwork).
@@ -444,11 +496,13 @@ public:
   void DeleteView(Orb_View *view);
 
 private:
+  friend class Orb_Persistent;
   friend class Orb_Model;
   friend class Orb_ModelIO;
   friend class Orb_DesignMgr;
   Orb_Design(Orb_Model *model, Orb_DesignMgr *parent, std::string_view name);
   Orb_NamedList<Orb_View> m_Views;
+  Orb_PropertyHolder m_Properties;
 };
 
 class LUM_PLATFORM_API Orb_DesignMgr : public Orb_Persistent {
@@ -461,10 +515,12 @@ public:
   void DeleteDesign(Orb_Design *design);
 
 private:
+  friend class Orb_Persistent;
   friend class Orb_Model;
   friend class Orb_ModelIO;
   Orb_DesignMgr(Orb_Model *model, std::string_view name);
   Orb_NamedList<Orb_Design> m_Designs;
+  Orb_PropertyHolder m_Properties;
 };
 
 // The object as a T (Orb_Block, Orb_Pin, ...) if it is of T's kind, else
@@ -687,6 +743,8 @@ private:
   Orb_ObjectPool m_Pools[Orb_KindCount];
   // Long object names (Orb_Name.h).
   Orb_NameTable m_Names;
+  // The property holders of pins and signals that have properties.
+  std::unordered_map<Orb_Persistent const *, Orb_PropertyHolder> m_SideProperties;
   bool m_TearingDown = false;
   std::size_t m_ObjectCount[Orb_KindCount] = {};
   std::map<std::string, std::unique_ptr<Orb_ModelCompanion>> m_Companions;

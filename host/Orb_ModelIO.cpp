@@ -101,7 +101,7 @@ private:
   void WriteDesignMgr(Orb_DesignMgr const *designMgr);
   void WriteView(Orb_View const *view);
   void WriteBlock(Orb_Block const *block);
-  void WriteProperties(Orb_PropertyHolder const *holder);
+  void WriteProperties(Orb_Persistent const *object);
 
   void ReadHeader();
   // A companion's section holds no companion sections of its own.
@@ -118,8 +118,8 @@ private:
   void ReadBlock(Orb_Block *block);
   void ReadConnections();
   Orb_Network *ReadNetwork(Orb_View *view);
-  // Reads a property record into `holder` if `tag` starts one.
-  bool ReadProperty(char tag, Orb_PropertyHolder *holder);
+  // Reads a property record for `object` if `tag` starts one.
+  bool ReadProperty(char tag, Orb_Persistent *object);
   std::string ReadName(char const *kind);
   Orb_Pin *PinAt(std::uint64_t index) const;
   Orb_Signal *SignalAt(std::uint64_t index) const;
@@ -282,8 +282,8 @@ void Orb_ModelIO::WriteBlock(Orb_Block const *block) {
   m_pOut->Raw("E\n");
 }
 
-void Orb_ModelIO::WriteProperties(Orb_PropertyHolder const *holder) {
-  for (auto const &property : holder->GetProperties()) {
+void Orb_ModelIO::WriteProperties(Orb_Persistent const *object) {
+  for (auto const &property : object->GetProperties()) {
     switch (property->GetKind()) {
     case Orb_Property::STRING:
       m_pOut->Tag('P');
@@ -492,7 +492,7 @@ void Orb_ModelIO::ReadCompanion(Section &section) {
 template <class Parent, class Child>
 void Orb_ModelIO::ReadContainer(Parent *parent, char childTag, char const *parentKind,
                                 char const *childKind, void (Orb_ModelIO::*readChild)(Child *)) {
-  Orb_PropertyHolder *holder = parent;
+  Orb_Persistent *holder = parent;
   for (;;) {
     char const tag = m_pIn->Tag();
     if (ReadProperty(tag, holder))
@@ -526,7 +526,7 @@ void Orb_ModelIO::ReadDesign(Orb_Design *design) {
 void Orb_ModelIO::ReadView(Orb_View *view) {
   m_Pins.clear();
   m_Signals.clear();
-  Orb_PropertyHolder *holder = view;
+  Orb_Persistent *holder = view;
   for (;;) {
     char const tag = m_pIn->Tag();
     if (ReadProperty(tag, holder))
@@ -560,7 +560,7 @@ void Orb_ModelIO::ReadBlock(Orb_Block *top) {
   Orb_Model *model = top->GetModel();
   std::vector<Orb_Block *> &open = m_OpenBlocks;
   open.assign(1, top);
-  Orb_PropertyHolder *holder = top;
+  Orb_Persistent *holder = top;
   while (!open.empty()) {
     Orb_Block *block = open.back();
     char const tag = m_pIn->Tag();
@@ -651,11 +651,12 @@ Orb_Network *Orb_ModelIO::ReadNetwork(Orb_View *view) {
   return network;
 }
 
-bool Orb_ModelIO::ReadProperty(char tag, Orb_PropertyHolder *holder) {
+bool Orb_ModelIO::ReadProperty(char tag, Orb_Persistent *object) {
   if (tag != 'P' && tag != 'L' && tag != 'Q')
     return false;
-  if (!holder)
+  if (!object)
     m_pIn->Corrupt("property record without an object");
+  Orb_PropertyHolder *holder = &object->MakeProperties();
   std::string name;
   m_pIn->Name(name);
   std::size_t const before = holder->GetProperties().size();

@@ -184,6 +184,11 @@ inline std::string PropertiesOf(Orb_PropertyHolder const &holder) {
   return Joined(properties, " ");
 }
 
+inline std::string PropertiesOf(Orb_Persistent const &object) {
+  Orb_PropertyHolder const *holder = object.Properties();
+  return holder ? PropertiesOf(*holder) : std::string();
+}
+
 // Path of a pin, signal or block through its blocks, as "top/u1/i".
 inline std::string PathIn(Orb_Persistent const *object) {
   Orb_Persistent const *parent = object->GetParentObject();

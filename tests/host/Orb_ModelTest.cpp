@@ -413,6 +413,25 @@ TEST_F(HostModelTest, ConnectionsLeaveInOrder) {
   EXPECT_EQ(top->CreatePin("q2", Orb_Pin::PIN_INPUT)->GetInnerSignal(), nullptr);
 }
 
+// Pins and signals keep their properties beside them in the model: made by
+// the first property, saved and reopened, and gone with their object, so a
+// pin made in the same slot starts with none.
+TEST_F(HostModelTest, PinAndSignalPropertiesComeAndGo) {
+  EXPECT_TRUE(cp->GetProperties().empty());
+  EXPECT_EQ(cp->GetPropertyByName("k"), nullptr);
+  cp->DeleteProperty("k");
+  cp->CreatePropertyString("k", "v");
+  s->CreatePropertyStringList("l")->AppendString("x");
+  std::unique_ptr<Orb_Model> reopened = Reopened(*host);
+  Orb_Block *top2 =
+      reopened->GetDesignMgrByName("dm")->GetDesignByName("d")->GetViewByName("v")->GetBlock();
+  EXPECT_EQ(PropertiesOf(*top2->GetBlockByName("c")->GetPinByName("cp")), PropertiesOf(*cp));
+  EXPECT_EQ(PropertiesOf(*top2->GetSignalByName("s")), PropertiesOf(*s));
+  EXPECT_NE(PropertiesOf(*s), "");
+  c->DeletePin(cp);
+  EXPECT_TRUE(c->CreatePin("cp2", Orb_Pin::PIN_INPUT)->GetProperties().empty());
+}
+
 // Pin names over 7 bytes are stored once per model: two pins of that name share it, lookups and
 // saves see each whole, and a name goes with the last object holding it.
 TEST_F(HostModelTest, LongNamesAreSharedAndGoWithTheirLastHolder) {
