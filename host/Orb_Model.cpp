@@ -170,7 +170,9 @@ Orb_Signal *Orb_Pin::GetInnerSignal() const {
 }
 
 void Orb_Pin::Link(bool inner, Orb_Signal *signal) {
-  if (signal == (inner ? GetInnerSignal() : m_pSignal))
+  // One lookup of the inner record serves the whole change.
+  Orb_PinLink *link = inner ? InnerLink() : nullptr;
+  if (signal == (inner ? (link ? link->signal : nullptr) : m_pSignal))
     return;
   if (!signal) {
     Unlink(inner);
@@ -181,7 +183,7 @@ void Orb_Pin::Link(bool inner, Orb_Signal *signal) {
   if (!inner) {
     Unlink(false);
     m_pSignal = signal;
-  } else if (Orb_PinLink *link = InnerLink()) {
+  } else if (link) {
     link->signal->m_Pins.Remove(this);
     link->signal = signal;
   } else {
