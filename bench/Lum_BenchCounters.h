@@ -11,6 +11,8 @@
 #include <cstdio>
 #include <cstdlib>
 #include <malloc.h>
+#include <map>
+#include <memory>
 #include <new>
 #include <time.h>
 #include <unistd.h>
@@ -58,6 +60,18 @@ inline std::int64_t ResidentBytes() {
 inline std::int64_t HeapBytes() {
   struct mallinfo2 const info = ::mallinfo2();
   return static_cast<std::int64_t>(info.uordblks + info.hblkhd);
+}
+
+// The workload of one size, made on first use and kept for the later
+// phases of the same process (W has a `blocks` member).
+template <class W> W &WorkloadOf(std::int64_t blocks) {
+  static std::map<std::int64_t, std::unique_ptr<W>> workloads;
+  std::unique_ptr<W> &slot = workloads[blocks];
+  if (!slot) {
+    slot = std::make_unique<W>();
+    slot->blocks = blocks;
+  }
+  return *slot;
 }
 
 } // namespace Lum_BenchCounters

@@ -116,13 +116,7 @@ struct Workload {
 };
 
 Workload &WorkloadOf(std::int64_t blocks) {
-  static std::map<std::int64_t, std::unique_ptr<Workload>> workloads;
-  std::unique_ptr<Workload> &slot = workloads[blocks];
-  if (!slot) {
-    slot = std::make_unique<Workload>();
-    slot->blocks = blocks;
-  }
-  return *slot;
+  return Lum_BenchCounters::WorkloadOf<Workload>(blocks);
 }
 
 std::unique_ptr<Orb_Model> NewModel() {
