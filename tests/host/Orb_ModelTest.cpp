@@ -185,8 +185,14 @@ TEST_F(HostModelTest, DeleteHandlerMayDeleteSiblingsAndAncestors) {
   EXPECT_EQ(model->GetClientCount(), ObjectCount(*host));
 }
 
-// A duplicate sibling name is refused naming the object; pins and signals have separate names.
-TEST_F(HostModelTest, DuplicateNamesRefused) {
+// Duplicate names and too deep blocks or grafts are refused, creating nothing; the deepest
+// chain reopens.
+TEST_F(HostModelTest, DuplicatesAndDepthRefused) {
+  Orb_Block *source = top->CreateBlock("source");
+  source->CreateBlock("x");
+  Orb_Block *deepest = c;
+  while (deepest->GetDepth() < Orb_MaxBlockDepth)
+    deepest = deepest->CreateBlock("b");
   log.clear();
   std::size_t const before = ObjectCount(*host);
   std::pair<char const *, std::function<void()>> const cases[] = {
@@ -195,30 +201,17 @@ TEST_F(HostModelTest, DuplicateNamesRefused) {
       {"v", [&] { v->CreateTopBlock("top2"); }}, // a view has one top block
       {"p", [&] { top->CreatePin("p", Orb_Pin::PIN_OUTPUT); }},
       {"s", [&] { top->CreateSignal("s"); }},
+      {"b", [&] { deepest->CreateBlock("b"); }}, // deeper than Orb_MaxBlockDepth
   };
   for (auto const &[objectName, create] : cases)
     EXPECT_EQ(ThrownBy(create).object, objectName);
+  EXPECT_THAT(ThrownBy([&] { deepest->CreateBlock("b"); }).message,
+              HasSubstr("deeper than 1000 levels"));
+  EXPECT_THROW(Ora_GraftMgr(false, false).Graft(source, deepest), Orb_Exception);
   EXPECT_EQ(ObjectCount(*host), before);
   EXPECT_TRUE(log.empty()) << Joined(log);
   EXPECT_EQ(top->GetSignalByName("p"), top->CreateSignal("p"));
   EXPECT_EQ(top->GetPinByName("p"), p);
-}
-
-// Blocks nest at most Orb_MaxBlockDepth deep; the deepest chain saves and reopens.
-TEST_F(HostModelTest, BlockDepthIsBounded) {
-  Orb_Block *source = top->CreateBlock("source");
-  source->CreateBlock("x");
-  Orb_Block *deepest = c;
-  while (deepest->GetDepth() < Orb_MaxBlockDepth)
-    deepest = deepest->CreateBlock("b");
-  log.clear();
-  std::size_t const before = ObjectCount(*host);
-  Thrown const e = ThrownBy([&] { deepest->CreateBlock("b"); });
-  EXPECT_EQ(e.object, "b");
-  EXPECT_THAT(e.message, HasSubstr("deeper than 1000 levels"));
-  EXPECT_THROW(Ora_GraftMgr(false, false).Graft(source, deepest), Orb_Exception);
-  EXPECT_EQ(ObjectCount(*host), before);
-  EXPECT_TRUE(log.empty()) << Joined(log);
   EXPECT_TRUE(Ora_GraftMgr(false, false).Graft(source, deepest->GetParent()));
   EXPECT_EQ(Dump(*Reopened(*host)), Dump(*host));
 }
