@@ -259,6 +259,20 @@ inline std::unique_ptr<Orb_Model> Reopened(Orb_Model const &model) {
   return reopened;
 }
 
+// The bytes of the model saved to a file of this process.
+inline std::string SavedBytes(Orb_Model const &model) {
+  std::string const path = ::testing::TempDir() + "HostTest." + std::to_string(::getpid()) + ".sav";
+  model.Save(path.c_str());
+  std::string bytes = ReadBytes(path);
+  std::remove(path.c_str());
+  return bytes;
+}
+
+// The top block of view dm/d/v.
+inline Orb_Block *TopBlockOf(Orb_Model const &model, char const *dm, char const *d, char const *v) {
+  return model.GetDesignMgrByName(dm)->GetDesignByName(d)->GetViewByName(v)->GetBlock();
+}
+
 // The object name and message of the E that `action` throws; a test failure
 // when it throws nothing.
 struct Thrown {

@@ -20,8 +20,7 @@ using ::testing::HasSubstr;
 using ::testing::StrEq;
 using ::testing::ThrowsMessage;
 
-// dm / d / v with top block "top" (pin p, signal s, child block c with pin
-// cp) and network n holding s; p connects to s inside, cp outside.
+// dm/d/v, top block "top" (pin p => s, signal s, block c with pin cp -> s), network n holding s.
 class HostModelTest : public ::testing::Test {
 protected:
   void SetUp() override {
@@ -44,55 +43,39 @@ protected:
   Orb_Network *n = v->CreateNetwork("n");
 };
 
-// OnCreate fires once per object, and its client is what the client bases return; dropping the
-// model destroys the clients children first, then the host model with its companions.
+// One OnCreate per object; dropping the model destroys clients children first, then companions.
 TEST_F(HostModelTest, ClientsComeWithCreationAndGoChildrenFirst) {
   EXPECT_EQ(Joined(log), "create design manager dm; create design d; create view v; "
                          "create block top; create pin p; create signal s; "
                          "create block c; create pin cp; create network n");
-  auto *topClient = static_cast<RecTraits::Block *>(model->GetClient(top));
-  log.clear();
-  auto *child = topClient->CreateBlock("viaClient", 0);
-  EXPECT_EQ(child, model->GetClient(top->GetBlockByName("viaClient")));
-  EXPECT_EQ(child->GetParent(), topClient);
-  EXPECT_EQ(Joined(log), "create block viaClient");
-
   bool freed = false;
   host->SetCompanion("flag", std::make_unique<TestCompanion>(nullptr, &freed));
   log.clear();
   model.reset();
-  EXPECT_EQ(Joined(log), "~network n; ~pin p; ~signal s; ~pin cp; ~block c; ~block viaClient; "
-                         "~block top; ~view v; ~design d; ~design manager dm");
+  EXPECT_EQ(Joined(log), "~network n; ~pin p; ~signal s; ~pin cp; ~block c; ~block top; "
+                         "~view v; ~design d; ~design manager dm");
   EXPECT_TRUE(freed);
 }
 
-// An attached model destroys only its clients. An unsubscribed one gets no clients from events:
-// GetClient never creates, Specialize loads once, and deletion empties the bridge.
+// An attached model destroys only its clients; an unsubscribed one loads a client once, on demand.
 TEST_F(HostModelTest, AttachedModelsKeepTheirOwnClients) {
   EventLog attachedLog;
   auto attached = std::make_unique<RecModel>(&attachedLog, host);
-  EXPECT_FALSE(attached->OwnsOrbModel());
   c->CreateBlock("late");
   attached.reset();
   EXPECT_EQ(Joined(attachedLog), "create block late; ~block late");
-  EXPECT_EQ(host->GetContexts().size(), 1u);
-  EXPECT_EQ(cp->GetSignal(), s);
 
   attachedLog.clear();
   RecModel viewer(&attachedLog, host, false);
   top->CreateSignal("late");
   EXPECT_EQ(viewer.GetClient(top), nullptr);
-  EXPECT_EQ(viewer.Specialize(static_cast<Orb_Block *>(nullptr)), nullptr);
   auto *first = static_cast<RecTraits::Block *>(viewer.Specialize(top));
   EXPECT_EQ(viewer.Specialize(top), first);
-  EXPECT_EQ(viewer.GetClient(top), first);
-  EXPECT_NE(model->GetClient(top), first);
   EXPECT_EQ(Joined(attachedLog), "load block top");
 
   delete first;
   EXPECT_EQ(viewer.GetBridgeHandle(Orb_Kind::Block)[top->GetBridgeId()], nullptr);
-  auto *second = viewer.Specialize(top);
-  EXPECT_EQ(viewer.GetBridgeHandle(Orb_Kind::Block)[top->GetBridgeId()], second);
+  viewer.Specialize(top);
   attachedLog.clear();
   v->DeleteTopBlock();
   EXPECT_EQ(Joined(attachedLog), "~block top");
@@ -109,40 +92,17 @@ TEST_F(HostModelTest, ThrowingClientConstructorUndoesCreation) {
   EXPECT_THAT([&] { topClient->CreateBlock("bad", 0); },
               ThrowsMessage<std::runtime_error>(StrEq("refused bad")));
   EXPECT_EQ(top->GetBlockByName("bad"), nullptr);
-  EXPECT_EQ(host->GetObjectCount(Orb_Kind::Block), 2u);
-  EXPECT_EQ(model->GetClientCount(), 9u);
+  EXPECT_EQ(model->GetClientCount(), ObjectCount(*host));
   EXPECT_EQ(other.GetClientCount(), 0u);
   EXPECT_EQ(Joined(log), "create block bad; delete block bad; ~block bad");
   EXPECT_EQ(Joined(otherLog), "create block bad; delete block bad");
-
-  other.refuse.clear();
-  Orb_Block *good = top->CreateBlock("bad");
-  ASSERT_NE(other.GetClient(good), nullptr);
-  EXPECT_NE(static_cast<Orb_ClientObject *>(model->GetClient(good)), other.GetClient(good));
-  EXPECT_EQ(other.GetClient(good)->GetClientOrbModel(), &other);
 }
 
-// Deletion fires events children first and frees everything.
-TEST_F(HostModelTest, DeleteFiresEventsChildrenFirst) {
-  log.clear();
-  dm->DeleteDesign(d);
-  EXPECT_EQ(Joined(log), "delete network n; ~network n; delete pin p; ~pin p; "
-                         "delete signal s; ~signal s; delete pin cp; ~pin cp; "
-                         "delete block c; ~block c; delete block top; ~block top; "
-                         "delete view v; ~view v; delete design d; ~design d");
-  EXPECT_EQ(model->GetClientCount(), 1u);
-  EXPECT_EQ(ObjectCount(*host), 1u);
-}
-
-// A pin takes its parent block's signals outside and its own block's inside, listed by each signal;
-// a signal of any other block is refused naming pin and signal, changing nothing.
+// A pin connects outside to its parent block's signals, inside to its own; others are refused.
 TEST_F(HostModelTest, PinSidesTakeOnlyTheirOwnBlocksSignals) {
   Orb_Signal *cs = c->CreateSignal("cs");
   cp->ConnectInner(cs);
   Orb_Signal *elsewhere = d->CreateView("v2")->CreateTopBlock("t2")->CreateSignal("x");
-  EXPECT_EQ(Dump(cp), "pin cp output -> top/s => top/c/cs\n");
-  EXPECT_EQ(Names(s->GetPins()) + " | " + Names(cs->GetPins()), "p cp | cp");
-
   std::string const before = Dump(top);
   struct {
     Orb_Pin *pin;
@@ -150,7 +110,6 @@ TEST_F(HostModelTest, PinSidesTakeOnlyTheirOwnBlocksSignals) {
     bool inner;
   } const refused[] = {
       {p, s, false},          // a top block's pin has no outer side
-      {p, cs, true},          // a child's signal, inside
       {cp, cs, false},        // the own block's signal, outside
       {cp, s, true},          // the parent's signal, inside
       {cp, elsewhere, false}, // another view
@@ -163,17 +122,14 @@ TEST_F(HostModelTest, PinSidesTakeOnlyTheirOwnBlocksSignals) {
     EXPECT_THAT(e.message, HasSubstr(r.signal->GetName()));
   }
   EXPECT_EQ(Dump(top), before);
-
-  // Null and deletion undo one side only.
-  c->DeleteSignal(cs);
+  c->DeleteSignal(cs); // undoes the inner side only
   EXPECT_EQ(Dump(cp), "pin cp output -> top/s\n");
   cp->Connect(nullptr);
   p->ConnectInner(nullptr);
   EXPECT_TRUE(s->GetPins().empty());
 }
 
-// A delete handler may delete a sibling or an ancestor, or fail: each object gets one delete
-// event, its client goes, and the host frees everything once.
+// A delete handler may delete a sibling or an ancestor, or fail: one delete event per object.
 TEST_F(HostModelTest, DeleteHandlerMayDeleteSiblingsAndAncestors) {
   auto addSiblings = [this] {
     for (char const *name : {"a", "b"})
@@ -187,7 +143,6 @@ TEST_F(HostModelTest, DeleteHandlerMayDeleteSiblingsAndAncestors) {
   };
   auto block = [this](char const *name) { return top->GetBlockByName(name); };
 
-  // Deleting a alone: its handler deletes b, which goes at once.
   addSiblings();
   deleteOnEvent("a", [&] { top->DeleteBlock(block("b")); });
   log.clear();
@@ -196,7 +151,6 @@ TEST_F(HostModelTest, DeleteHandlerMayDeleteSiblingsAndAncestors) {
                          "delete pin x; ~pin x; delete block b; ~block b");
   EXPECT_EQ(Names(top->GetBlocks()), "c");
 
-  // Deleting their parent: b is already going, and gets its events in turn.
   addSiblings();
   log.clear();
   v->DeleteTopBlock();
@@ -207,7 +161,6 @@ TEST_F(HostModelTest, DeleteHandlerMayDeleteSiblingsAndAncestors) {
             "delete block top; ~block top");
   EXPECT_EQ(v->GetBlock(), nullptr);
 
-  // Deleting a, whose pin's handler deletes the whole tree above it.
   top = v->CreateTopBlock("top");
   addSiblings();
   Orb_Pin *ax = block("a")->GetPinByName("x");
@@ -222,45 +175,19 @@ TEST_F(HostModelTest, DeleteHandlerMayDeleteSiblingsAndAncestors) {
                          "delete block top; ~block top");
   EXPECT_EQ(v->GetBlock(), nullptr);
 
-  // A handler that fails (here: creating in a block being deleted) stops nothing.
+  // A handler that fails stops nothing.
   top = v->CreateTopBlock("top");
   addSiblings();
   deleteOnEvent("x", [&] { block("a")->CreatePin("late", Orb_Pin::PIN_INPUT); });
   EXPECT_THROW(top->DeleteBlock(block("a")), Orb_Exception);
   EXPECT_EQ(Names(top->GetBlocks()), "b");
 
-  model->onDelete = nullptr;
-  EXPECT_EQ(host->GetObjectCount(Orb_Kind::Block), 2u);
-  EXPECT_EQ(host->GetObjectCount(Orb_Kind::Pin), 1u);
   EXPECT_EQ(model->GetClientCount(), ObjectCount(*host));
 }
 
-// A duplicate sibling name is refused per kind, naming the object, and creates nothing; pins and
-// signals have names of their own.
-TEST_F(HostModelTest, DuplicateNamesRefused) {
-  log.clear();
-  std::size_t const before = ObjectCount(*host);
-  std::pair<char const *, std::function<void()>> const cases[] = {
-      {"dm", [&] { host->CreateDesignMgr("dm"); }},
-      {"d", [&] { dm->CreateDesign("d"); }},
-      {"v", [&] { d->CreateView("v"); }},
-      {"c", [&] { top->CreateBlock("c"); }},
-      {"v", [&] { v->CreateTopBlock("top2"); }}, // a view has one top block
-      {"p", [&] { top->CreatePin("p", Orb_Pin::PIN_OUTPUT); }},
-      {"s", [&] { top->CreateSignal("s"); }},
-      {"n", [&] { v->CreateNetwork("n"); }},
-  };
-  for (auto const &[objectName, create] : cases)
-    EXPECT_EQ(ThrownBy(create).object, objectName);
-  EXPECT_EQ(ObjectCount(*host), before);
-  EXPECT_TRUE(log.empty()) << Joined(log);
-  EXPECT_EQ(top->GetSignalByName("p"), top->CreateSignal("p"));
-  EXPECT_EQ(top->GetPinByName("p"), p);
-}
-
-// Blocks nest at most Orb_MaxBlockDepth deep: a deeper block or graft creates nothing, and the
-// deepest chain saves and reopens.
-TEST_F(HostModelTest, BlockDepthIsBounded) {
+// Duplicate names and too deep blocks or grafts are refused, creating nothing; the deepest
+// chain reopens.
+TEST_F(HostModelTest, DuplicatesAndDepthRefused) {
   Orb_Block *source = top->CreateBlock("source");
   source->CreateBlock("x");
   Orb_Block *deepest = c;
@@ -268,19 +195,27 @@ TEST_F(HostModelTest, BlockDepthIsBounded) {
     deepest = deepest->CreateBlock("b");
   log.clear();
   std::size_t const before = ObjectCount(*host);
-  Thrown const e = ThrownBy([&] { deepest->CreateBlock("b"); });
-  EXPECT_EQ(e.object, "b");
-  EXPECT_THAT(e.message, HasSubstr("deeper than 1000 levels"));
-  // A copy of x would land one level too deep: the graft copies nothing at all.
+  std::pair<char const *, std::function<void()>> const cases[] = {
+      {"dm", [&] { host->CreateDesignMgr("dm"); }},
+      {"c", [&] { top->CreateBlock("c"); }},
+      {"v", [&] { v->CreateTopBlock("top2"); }}, // a view has one top block
+      {"p", [&] { top->CreatePin("p", Orb_Pin::PIN_OUTPUT); }},
+      {"s", [&] { top->CreateSignal("s"); }},
+      {"b", [&] { deepest->CreateBlock("b"); }}, // deeper than Orb_MaxBlockDepth
+  };
+  for (auto const &[objectName, create] : cases)
+    EXPECT_EQ(ThrownBy(create).object, objectName);
+  EXPECT_THAT(ThrownBy([&] { deepest->CreateBlock("b"); }).message,
+              HasSubstr("deeper than 1000 levels"));
   EXPECT_THROW(Ora_GraftMgr(false, false).Graft(source, deepest), Orb_Exception);
   EXPECT_EQ(ObjectCount(*host), before);
   EXPECT_TRUE(log.empty()) << Joined(log);
+  EXPECT_EQ(top->GetSignalByName("p"), top->CreateSignal("p"));
+  EXPECT_EQ(top->GetPinByName("p"), p);
   EXPECT_TRUE(Ora_GraftMgr(false, false).Graft(source, deepest->GetParent()));
-  EXPECT_EQ(deepest->GetParent()->GetBlockByName("x")->GetDepth(), Orb_MaxBlockDepth);
   EXPECT_EQ(Dump(*Reopened(*host)), Dump(*host));
 }
 
-// Orders pins by direction only, so pins of one direction compare equal.
 struct ByDirection : Orb_SortFtor<Orb_Pin> {
   bool operator()(Orb_Pin const *a, Orb_Pin const *b) const override {
     return a->GetDirection() < b->GetDirection();
@@ -298,23 +233,19 @@ TEST_F(HostModelTest, SortPinsStableThroughDelegate) {
   }
   ByDirection byDirection;
   Orb_SortFtor<Orb_Pin> delegating(&byDirection);
-  // The host may sort with a copy of the functor.
   Orb_SortFtor<Orb_Pin> copy(delegating); // NOLINT(performance-unnecessary-copy-initialization)
-  EXPECT_EQ(copy.GetDelegate(), &byDirection);
   c->SortPins(copy);
   EXPECT_EQ(Names(c->GetPins()), expected[0] + " " + expected[1] + " " + expected[2]);
 
   Orb_SortFtor<Orb_Pin> plain;
   Orb_SortFtor<Orb_Pin> self(plain); // NOLINT(performance-unnecessary-copy-initialization)
-  EXPECT_EQ(self.GetDelegate(), &self);
   std::vector<Orb_Pin *> byAddress = c->GetPins();
   std::sort(byAddress.begin(), byAddress.end(), std::less<Orb_Pin *>());
   c->SortPins(self);
   EXPECT_EQ(c->GetPins(), byAddress);
 }
 
-// Deleting children in the patterns callers use keeps host order and the name lookups right, on
-// either side of the size where a block starts indexing names; a deleted name can be used again.
+// Deletions in callers' patterns keep order and lookups, above and below the name-index size.
 TEST_F(HostModelTest, DeletionsKeepOrderAndLookups) {
   top->DeleteBlock(c);
   std::vector<std::string> expected;
@@ -336,7 +267,6 @@ TEST_F(HostModelTest, DeletionsKeepOrderAndLookups) {
     expected.erase(std::find(expected.begin(), expected.end(), block->GetNameString()));
     top->DeleteBlock(block);
   };
-  // A snapshot of every tenth, then the front, then by index walk.
   std::vector<Orb_Block *> snapshot;
   for (std::size_t i = 0; i < top->GetBlocks().size(); i += 10)
     snapshot.push_back(top->GetBlocks()[i]);
@@ -359,8 +289,7 @@ TEST_F(HostModelTest, DeletionsKeepOrderAndLookups) {
   EXPECT_THROW(top->CreateBlock(expected.front().c_str()), Orb_Exception);
 }
 
-// A signal's pin list keeps connection order when pins leave it from either side, one by one or
-// with their block; so does a network's signal list. A deleted signal leaves both.
+// Pin and network lists keep order as members leave; moved or dropped memberships leave no trace.
 TEST_F(HostModelTest, ConnectionsLeaveInOrder) {
   std::vector<Orb_Pin *> pins;
   for (int i = 0; i < 6; ++i) {
@@ -370,17 +299,13 @@ TEST_F(HostModelTest, ConnectionsLeaveInOrder) {
   }
   Orb_Pin *q = top->CreatePin("q", Orb_Pin::PIN_OUTPUT);
   q->ConnectInner(s);
-  EXPECT_EQ(Names(s->GetPins()), "p cp x x x x x x q");
   pins[1]->Connect(nullptr);
   p->ConnectInner(nullptr);
   top->DeleteBlock(pins[3]->GetParent());
   c->DeletePin(cp);
-  std::vector<std::string> parents;
-  for (Orb_Pin *pin : s->GetPins())
-    parents.push_back(std::string(pin->GetParent()->GetName()) + "." + pin->GetName());
-  EXPECT_EQ(Joined(parents, " "), "k0.x k2.x k4.x k5.x top.q");
+  EXPECT_EQ(Dump(s), "signal s <- top/k0/x <- top/k2/x <- top/k4/x <- top/k5/x <- top/q\n");
   pins[1]->Connect(s);
-  EXPECT_EQ(s->GetPins().back(), pins[1]) << "a reconnected pin goes last";
+  EXPECT_EQ(s->GetPins().back(), pins[1]);
 
   for (int i = 0; i < 5; ++i)
     n->AddSignal(top->CreateSignal(("t" + std::to_string(i)).c_str()));
@@ -391,8 +316,6 @@ TEST_F(HostModelTest, ConnectionsLeaveInOrder) {
   EXPECT_EQ(Names(n->GetSignals()), "t0 t2 t4");
   EXPECT_EQ(q->GetInnerSignal(), nullptr);
   EXPECT_EQ(pins[0]->GetSignal(), nullptr);
-  // Moving a signal to another network, deleting a network and reusing a
-  // deleted signal's slot leave no membership behind.
   Orb_Network *n2 = v->CreateNetwork("n2");
   n2->AddSignal(top->GetSignalByName("t0"));
   EXPECT_EQ(top->GetSignalByName("t0")->GetNetwork(), n2);
@@ -402,8 +325,6 @@ TEST_F(HostModelTest, ConnectionsLeaveInOrder) {
   EXPECT_EQ(top->CreateSignal("fresh")->GetNetwork(), nullptr);
   n2->AddSignal(top->GetSignalByName("t2"));
   EXPECT_EQ(Names(n2->GetSignals()), "t0 t2");
-  // An inner connection moved from one signal to another, and a pin made in
-  // a deleted pin's slot, which starts unconnected.
   q->ConnectInner(top->GetSignalByName("t0"));
   q->ConnectInner(top->GetSignalByName("t2"));
   EXPECT_EQ(Names(top->GetSignalByName("t0")->GetPins()), "");
@@ -413,18 +334,13 @@ TEST_F(HostModelTest, ConnectionsLeaveInOrder) {
   EXPECT_EQ(top->CreatePin("q2", Orb_Pin::PIN_INPUT)->GetInnerSignal(), nullptr);
 }
 
-// Pins and signals keep their properties beside them in the model: made by
-// the first property, saved and reopened, and gone with their object, so a
-// pin made in the same slot starts with none.
+// Pin and signal properties round trip and go with their object, not passing to its slot.
 TEST_F(HostModelTest, PinAndSignalPropertiesComeAndGo) {
-  EXPECT_TRUE(cp->GetProperties().empty());
-  EXPECT_EQ(cp->GetPropertyByName("k"), nullptr);
   cp->DeleteProperty("k");
   cp->CreatePropertyString("k", "v");
   s->CreatePropertyStringList("l")->AppendString("x");
   std::unique_ptr<Orb_Model> reopened = Reopened(*host);
-  Orb_Block *top2 =
-      reopened->GetDesignMgrByName("dm")->GetDesignByName("d")->GetViewByName("v")->GetBlock();
+  Orb_Block *top2 = TopBlockOf(*reopened, "dm", "d", "v");
   EXPECT_EQ(PropertiesOf(*top2->GetBlockByName("c")->GetPinByName("cp")), PropertiesOf(*cp));
   EXPECT_EQ(PropertiesOf(*top2->GetSignalByName("s")), PropertiesOf(*s));
   EXPECT_NE(PropertiesOf(*s), "");
@@ -432,8 +348,7 @@ TEST_F(HostModelTest, PinAndSignalPropertiesComeAndGo) {
   EXPECT_TRUE(c->CreatePin("cp2", Orb_Pin::PIN_INPUT)->GetProperties().empty());
 }
 
-// Pin names over 7 bytes are stored once per model: two pins of that name share it, lookups and
-// saves see each whole, and a name goes with the last object holding it.
+// Long names are stored once per model, survive a save, and go with their last holder.
 TEST_F(HostModelTest, LongNamesAreSharedAndGoWithTheirLastHolder) {
   std::size_t const before = host->GetSharedNameCount();
   std::string const longest(300, 'q');
@@ -441,16 +356,12 @@ TEST_F(HostModelTest, LongNamesAreSharedAndGoWithTheirLastHolder) {
   Orb_Block *b = top->CreateBlock(longest.c_str());
   Orb_Pin *pa = a->CreatePin("DATA_IN_0", Orb_Pin::PIN_INPUT);
   Orb_Pin *pb = b->CreatePin("DATA_IN_0", Orb_Pin::PIN_INPUT);
-  EXPECT_EQ(pa->GetName(), pb->GetName()); // one copy
-  EXPECT_EQ(host->GetSharedNameCount(), before + 1);
-  EXPECT_EQ(b->GetNameString(), longest);
+  EXPECT_EQ(pa->GetName(), pb->GetName());
   EXPECT_EQ(top->GetBlockByName(longest.c_str()), b);
-  EXPECT_EQ(b->GetPinByName("DATA_IN_0"), pb);
   EXPECT_EQ(b->GetPinByName("DATA_IN_"), nullptr);
 
   std::unique_ptr<Orb_Model> reopened = Reopened(*host);
-  Orb_Block *top2 =
-      reopened->GetDesignMgrByName("dm")->GetDesignByName("d")->GetViewByName("v")->GetBlock();
+  Orb_Block *top2 = TopBlockOf(*reopened, "dm", "d", "v");
   ASSERT_NE(top2->GetBlockByName(longest.c_str()), nullptr);
   EXPECT_EQ(top2->GetBlockByName(longest.c_str())->GetPinByName("DATA_IN_0")->GetName(),
             top2->GetBlockByName("seven77")->GetPinByName("DATA_IN_0")->GetName());
@@ -462,8 +373,7 @@ TEST_F(HostModelTest, LongNamesAreSharedAndGoWithTheirLastHolder) {
   EXPECT_EQ(host->GetSharedNameCount(), before);
 }
 
-// Creating and deleting blocks over and over reuses the freed slots of each kind: bridge ids
-// stay as few as the objects alive at once, and the shared name table does not grow.
+// Churn reuses freed slots: bridge ids stay few and the shared name table does not grow.
 TEST_F(HostModelTest, ChurnReusesSlots) {
   std::size_t const names = host->GetSharedNameCount();
   unsigned highestBlock = 0;
@@ -482,7 +392,6 @@ TEST_F(HostModelTest, ChurnReusesSlots) {
     for (std::size_t i = blocks.size(); i-- > 0;)
       top->DeleteBlock(blocks[i]);
   }
-  // Top, c and the 25 of a round; the fixture's pins p, cp and the 25.
   EXPECT_LT(highestBlock, 27u);
   EXPECT_LT(highestPin, 27u);
   EXPECT_EQ(Names(s->GetPins()), "p cp");
