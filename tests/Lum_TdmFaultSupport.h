@@ -8,6 +8,7 @@
 #include "Lum_Tlm.h"
 #include "Ora_GraftMgr.h"
 
+#include <filesystem>
 #include <string>
 
 namespace lumtest {
@@ -90,7 +91,10 @@ public:
     return text + ")";
   }
 
-  // The typing a successful open gives, block by block.
+  static constexpr char const *kTyping =
+      "u1=LIBT:REG(CLK>CLK,D1>D1,DATA0>D0,Q>Q) u2=CELLS:NAND(A>A,Y>Y) "
+      "u3=Lum_LocalLibrary:LOC(L>L) u4=LIBT:REG(CLK>CLK,D0>D0,D1>D1,Q>Q) ";
+  // The typing an open gives, block by block.
   static std::string Typing(Lum_TdmModel &model) {
     Lum_TdmBlock *top = model.GetDesignMgrByName("dm")
                             ->GetDesignByName("top")
@@ -136,6 +140,13 @@ inline ModelState StateOf(Lum_TdmModel &model, std::string const &savePath) {
   model.Save(savePath.c_str());
   state.saved = FileBytes(savePath);
   return state;
+}
+
+inline std::string Listing(std::string const &directory) {
+  std::string names;
+  for (auto const &entry : std::filesystem::directory_iterator(directory))
+    names += (names.empty() ? "" : " ") + entry.path().filename().string();
+  return names;
 }
 
 } // namespace lumtest
