@@ -57,11 +57,34 @@ bool ReplacementInUse() {
 
 } // namespace
 
-// Visible to the shared libraries, built with hidden visibility; the other forms forward here.
+// Visible to the shared libraries, built with hidden visibility. Every form is replaced, so that
+// a memory checker never sees one form's memory freed by another.
 #define LUM_REPLACE __attribute__((visibility("default")))
+void *TryAllocate(std::size_t size) noexcept {
+  try {
+    return Allocate(size);
+  } catch (std::bad_alloc const &) {
+    return nullptr;
+  }
+}
 LUM_REPLACE void *operator new(std::size_t size) { return Allocate(size); }
+LUM_REPLACE void *operator new[](std::size_t size) { return Allocate(size); }
+LUM_REPLACE void *operator new(std::size_t size, std::nothrow_t const &) noexcept {
+  return TryAllocate(size);
+}
+LUM_REPLACE void *operator new[](std::size_t size, std::nothrow_t const &) noexcept {
+  return TryAllocate(size);
+}
 LUM_REPLACE void operator delete(void *memory) noexcept { std::free(memory); }
+LUM_REPLACE void operator delete[](void *memory) noexcept { std::free(memory); }
 LUM_REPLACE void operator delete(void *memory, std::size_t) noexcept { std::free(memory); }
+LUM_REPLACE void operator delete[](void *memory, std::size_t) noexcept { std::free(memory); }
+LUM_REPLACE void operator delete(void *memory, std::nothrow_t const &) noexcept {
+  std::free(memory);
+}
+LUM_REPLACE void operator delete[](void *memory, std::nothrow_t const &) noexcept {
+  std::free(memory);
+}
 
 using namespace lumtest;
 
