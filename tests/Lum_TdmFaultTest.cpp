@@ -1,4 +1,5 @@
-// Fault injection: an event handler throwing at every event of an open, failing save steps.
+// Fault injection: an open whose event handler throws at every possible
+// event, and saves whose write, sync, close or rename fails.
 
 #include "Lum_TdmFaultSupport.h"
 
@@ -17,11 +18,14 @@ using namespace lumtest;
 
 namespace {
 
+// The exception a handler throws; the caller must receive this very one.
 struct InjectedFault {
   unsigned event;
 };
 
-// While armed, the k-th specialization event (from 1) throws, before or after making its client.
+// A client model whose k-th specialization event (creation or load, of any
+// kind, counted from 1 while armed) throws InjectedFault, either before the
+// client is made or right after.
 class FaultModel : public Lum_TdmModel {
 public:
   FaultModel() : Lum_TdmModel("fault", "faultdb", "") {}
@@ -32,6 +36,7 @@ public:
     m_AfterClient = afterClient;
   }
   void Disarm() { m_FailAt = 0; }
+  unsigned Count() const { return m_Count; }
 
 #define LUM_FAULT_EVENT(Event, Kind)                                                               \
   void Event(Orb_##Kind *object) override {                                                        \
@@ -63,40 +68,63 @@ private:
   bool m_AfterClient = false;
 };
 
-// The throw reaches the caller unchanged, the model stays as it was, then opens in full.
-TEST(TdmFaultTest, ThrowAtEveryOpenEventLeavesTheModelAsItWas) {
-  FaultDesign design;
+class TdmFaultTest : public ::testing::Test {
+protected:
+  FaultDesign m_Design;
+};
+
+// A throw at any event of the open, before or after the event's client is
+// made (binding, reconciliation's new pins and the library loads included),
+// reaches the caller unchanged and leaves the model with exactly its own
+// objects, clients, companions and saved bytes; the library file is given
+// back; the same model then opens the design in full.
+TEST_F(TdmFaultTest, ThrowAtEveryOpenEventLeavesTheModelAsItWas) {
+  std::string expected;
+  unsigned events = 0;
+  {
+    FaultModel model;
+    model.Arm(~0u, false);
+    model.Open(m_Design.Path().c_str());
+    events = model.Count();
+    expected = FaultDesign::Typing(model);
+  }
+  ASSERT_GT(events, 20u) << "the design is too small to exercise the open";
+  EXPECT_EQ(expected, "u1=LIBT:REG(CLK>CLK,D1>D1,DATA0>D0,Q>Q) u2=CELLS:NAND(A>A,Y>Y) "
+                      "u3=Lum_LocalLibrary:LOC(L>L) u4=LIBT:REG(CLK>CLK,D0>D0,D1>D1,Q>Q) ");
+
   for (bool const afterClient : {false, true}) {
-    for (unsigned k = 1;; ++k) {
+    for (unsigned k = 1; k <= events; ++k) {
       SCOPED_TRACE("event " + std::to_string(k) + (afterClient ? ", after" : ", before") +
                    " its client");
       FaultModel model;
       FaultDesign::AddOwnContent(model);
-      ModelState const before = StateOf(model, design.Scratch("before.odb"));
+      ModelState const before = StateOf(model, m_Design.Scratch("before.odb"));
       model.Arm(k, afterClient);
       try {
-        model.Open(design.Path().c_str());
-        EXPECT_EQ(FaultDesign::Typing(model), FaultDesign::kTyping);
-        EXPECT_GT(k, 20u) << "the design is too small to exercise the open";
-        break;
+        model.Open(m_Design.Path().c_str());
+        ADD_FAILURE() << "the open did not throw";
       } catch (InjectedFault const &fault) {
         EXPECT_EQ(fault.event, k);
       }
       model.Disarm();
-      EXPECT_EQ(StateOf(model, design.Scratch("after.odb")), before);
+      EXPECT_EQ(StateOf(model, m_Design.Scratch("after.odb")), before);
       EXPECT_FALSE(Lum_TlmCatalog::IsLoaded("CELLS")) << "the library file stays loaded";
-      model.Open(design.Path().c_str());
-      EXPECT_EQ(FaultDesign::Typing(model), FaultDesign::kTyping);
+      model.Open(m_Design.Path().c_str());
+      EXPECT_EQ(FaultDesign::Typing(model), expected);
     }
   }
 }
 
+// ---------------------------------------------------------------------------
+// Saves that fail
+
+// Which call of which operation fails, and how often each ran.
 struct SaveFault {
-  int failWrite = 0; // 0 for none
+  int failWrite = 0; // the n-th write fails, 0 for none
   bool failSync = false;
   bool failClose = false;
   bool failRename = false;
-  std::size_t maxChunk = 0; // 0 for all
+  std::size_t maxChunk = 0; // writes take at most this many bytes, 0 for all
   int writes = 0;
 };
 SaveFault g_Fault;
@@ -119,14 +147,34 @@ int FaultyRename(char const *from, char const *to) {
   return g_Fault.failRename ? Fail(EXDEV) : ::rename(from, to);
 }
 
-struct FaultyFileOps {
-  explicit FaultyFileOps(SaveFault const &fault) { g_Fault = fault; }
+// Puts the faulty operations in place for one scope.
+class FaultyFileOps {
+public:
+  explicit FaultyFileOps(SaveFault const &fault)
+      : m_Saved(Orb_FileOps::Set({&FaultyWrite, &FaultySync, &FaultyClose, &FaultyRename})) {
+    g_Fault = fault;
+  }
   ~FaultyFileOps() { Orb_FileOps::Set(m_Saved); }
-  Orb_FileOps m_Saved = Orb_FileOps::Set({&FaultyWrite, &FaultySync, &FaultyClose, &FaultyRename});
+  FaultyFileOps(FaultyFileOps const &) = delete;
+  FaultyFileOps &operator=(FaultyFileOps const &) = delete;
+
+private:
+  Orb_FileOps m_Saved;
 };
 
-// Each failed write, sync, close or rename names file and step and keeps the previous database;
-// a save whose writes take part of what they are given still writes it all.
+// The names in the directory.
+std::string Listing(std::string const &directory) {
+  std::string names;
+  for (auto const &entry : std::filesystem::directory_iterator(directory))
+    names += (names.empty() ? "" : " ") + entry.path().filename().string();
+  return names;
+}
+
+// Every write of a multi-buffer save, the sync, the close and the rename:
+// each failure throws Orb_Exception naming the file and the failed step,
+// leaves the previous database byte for byte and no temporary file; the
+// next save without faults succeeds, and so does one whose writes take only
+// part of what they are given.
 TEST(TdmSaveFaultTest, FailedWriteSyncCloseOrRenameKeepsThePreviousDatabase) {
   TempDir dir;
   std::string const path = dir.File("d.odb");
@@ -134,6 +182,7 @@ TEST(TdmSaveFaultTest, FailedWriteSyncCloseOrRenameKeepsThePreviousDatabase) {
   design.m_pView->CreateTopBlock("top");
   design.Model().Save(path.c_str());
   std::string const previous = FileBytes(path);
+  // Large enough for several buffer writes.
   Lum_TdmBlock *wide = design.m_pView->GetBlock()->CreateBlock("wide", 0);
   for (int i = 0; i < 4000; ++i)
     wide->CreatePin(("pin_with_a_long_name_" + std::to_string(i)).c_str(), Orb_Pin::PIN_INPUT);
@@ -161,6 +210,7 @@ TEST(TdmSaveFaultTest, FailedWriteSyncCloseOrRenameKeepsThePreviousDatabase) {
       design.Model().Save(path.c_str());
       ADD_FAILURE() << "the save did not fail";
     } catch (Orb_Exception const &e) {
+      EXPECT_EQ(e.GetObjectName(), path);
       EXPECT_NE(e.GetMessage().find(step), std::string::npos) << e.GetMessage();
       EXPECT_NE(e.GetMessage().find(path), std::string::npos) << e.GetMessage();
     }
@@ -169,8 +219,12 @@ TEST(TdmSaveFaultTest, FailedWriteSyncCloseOrRenameKeepsThePreviousDatabase) {
   }
 
   design.Model().Save(path.c_str());
+  EXPECT_EQ(FirstView(*OpenModel(path))->GetBlock()->GetBlockByName("wide")->GetPins().size(),
+            4000u);
+  SaveFault shortWrites;
+  shortWrites.maxChunk = 7;
   {
-    FaultyFileOps faulty(SaveFault{0, false, false, false, 7});
+    FaultyFileOps faulty(shortWrites);
     design.Model().Save(dir.File("short.odb").c_str());
   }
   EXPECT_EQ(FileBytes(dir.File("short.odb")), FileBytes(path));
