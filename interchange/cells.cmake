@@ -1,0 +1,3 @@
+# Cell libraries: Liberty files and cell models in JSON become type libraries.
+list(APPEND LUM_INTERCHANGE_SOURCES)
+list(APPEND LUM_INTERCHANGE_HEADERS)

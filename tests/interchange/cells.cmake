@@ -1,0 +1,2 @@
+# Cell-library reader tests.
+list(APPEND LUM_INTERCHANGE_TEST_SOURCES)

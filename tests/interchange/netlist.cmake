@@ -1,0 +1,2 @@
+# Netlist reader, writer and mapping tests.
+list(APPEND LUM_INTERCHANGE_TEST_SOURCES)
