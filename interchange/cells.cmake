@@ -1,3 +1,3 @@
 # Cell libraries: Liberty files and cell models in JSON become type libraries.
-list(APPEND LUM_INTERCHANGE_SOURCES)
-list(APPEND LUM_INTERCHANGE_HEADERS)
+list(APPEND LUM_INTERCHANGE_SOURCES s/Lum_CellLibraryReader.cpp)
+list(APPEND LUM_INTERCHANGE_HEADERS include/Lum_CellLibraryReader.h)
