@@ -6,6 +6,10 @@
 
 #include <string>
 
+namespace CLI {
+class App;
+}
+
 namespace tdm {
 
 struct DemoOptions {
@@ -30,5 +34,17 @@ struct TreeOptions {
 };
 int RunTree(std::string const &path, TreeOptions const &tree, CommonOptions const &options);
 int RunDot(std::string const &path, TreeOptions const &tree, CommonOptions const &options);
+
+struct LibOptions {
+  std::string file; // the cell library (import) or type library file (show)
+  std::string name; // import: the type library's name; empty: the file's own
+  std::string personality;
+  std::string part;
+  std::string output; // import: the folder written to; empty: the current one
+  std::string cell;   // show: only this cell
+};
+// Adds "lib import" and "lib show" to the command line.
+CLI::App *AddLibCommand(CLI::App &app, LibOptions &lib, CommonOptions &options);
+int RunLib(CLI::App const &command, LibOptions const &lib, CommonOptions const &options);
 
 } // namespace tdm

@@ -49,6 +49,7 @@ int Main(int argc, char **argv) {
   demo.program = argc > 0 && argv[0] ? argv[0] : "tdm";
   tdm::CommitOptions commit;
   tdm::TreeOptions tree;
+  tdm::LibOptions lib;
 
   CLI::App *demoCommand = app.add_subcommand(
       "demo", "Write two sample type libraries and a typed design database using them, commit, "
@@ -91,6 +92,8 @@ int Main(int argc, char **argv) {
         ->check(CLI::NonNegativeNumber);
   }
   treeCommand->add_flag("--pins", tree.pins, "Also each pin with its direction and type pin");
+  CLI::App *libCommand = tdm::AddLibCommand(app, lib, common);
+  libCommand->footer(kExitCodes);
 
   for (CLI::App *command :
        {demoCommand, infoCommand, checkCommand, commitCommand, treeCommand, dotCommand}) {
@@ -107,9 +110,13 @@ int Main(int argc, char **argv) {
   }
 
   std::string name = "tdm";
-  for (CLI::App const *command : app.get_subcommands())
+  for (CLI::App const *command = &app; !command->get_subcommands().empty();) {
+    command = command->get_subcommands().front();
     name += " " + command->get_name();
+  }
   try {
+    if (libCommand->parsed())
+      return tdm::RunLib(*libCommand, lib, common);
     if (demoCommand->parsed())
       return tdm::RunDemo(demo, common);
     if (infoCommand->parsed())
