@@ -19,10 +19,14 @@
 namespace tdm {
 namespace {
 
+// The first ten names, then how many more.
 std::string Joined(std::vector<std::string> const &names) {
+  std::size_t const shown = names.size() < 10 ? names.size() : 10;
   std::string text;
-  for (std::string const &name : names)
-    text += (text.empty() ? "" : ", ") + name;
+  for (std::size_t i = 0; i < shown; ++i)
+    text += (i ? ", " : "") + names[i];
+  if (shown < names.size())
+    text += " and " + std::to_string(names.size() - shown) + " more";
   return text;
 }
 
