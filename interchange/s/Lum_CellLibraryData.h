@@ -8,6 +8,13 @@
 #include <string>
 #include <vector>
 
+// Bounds on what a file may make, so that a small hostile file cannot make
+// the readers build a huge library: pins of all cells together, bits of one
+// bus, and bus bits that member pin groups may address in all.
+constexpr std::size_t kLumCellMaxPins = std::size_t(1) << 20;
+constexpr long kLumCellMaxBusWidth = 1L << 16;
+constexpr std::size_t kLumCellMaxMemberBits = std::size_t(1) << 22;
+
 enum class Lum_CellPinDirection { Input, Output, Inout };
 
 struct Lum_CellPinData {

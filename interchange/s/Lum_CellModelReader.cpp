@@ -14,8 +14,7 @@ namespace od = simdjson::ondemand;
 
 // How deep values the reader does not interpret may nest.
 constexpr unsigned kMaxDepth = 128;
-// The widest port the reader builds.
-constexpr std::uint64_t kMaxPortWidth = 1 << 16;
+constexpr std::uint64_t kMaxPortWidth = kLumCellMaxBusWidth;
 
 std::string Quote(std::string_view name) { return "\"" + std::string(name) + "\""; }
 
@@ -325,6 +324,8 @@ private:
 
   void AddPin(Lum_CellData &cell, Port const &port, Lum_CellPinData const &pin,
               std::unordered_set<std::string> &names) {
+    if (++m_PinCount > kLumCellMaxPins)
+      Fail(port.at, "the library has more than " + std::to_string(kLumCellMaxPins) + " pins");
     if (!names.insert(pin.name).second)
       Fail(port.at, "module " + Quote(cell.name) + ": pin " + Quote(pin.name) +
                         " is named twice (port " + Quote(port.name) + ")");
@@ -355,6 +356,7 @@ private:
   od::parser m_Parser;
   od::document m_Doc;
   Lum_CellLibraryData m_Library;
+  std::size_t m_PinCount = 0;
   char const *m_Cursor = nullptr;
   std::size_t m_CursorLine = 1;
   char const *m_CursorLineStart = nullptr;

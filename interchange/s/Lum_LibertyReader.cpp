@@ -110,8 +110,7 @@ Field FieldOf(Context where, std::string_view name) {
 
 enum class Direction { None, Input, Output, Inout, Internal };
 
-// The widest bus the reader builds.
-constexpr long kMaxBusWidth = 1 << 16;
+constexpr long kMaxBusWidth = kLumCellMaxBusWidth;
 
 std::string Quote(std::string_view name) { return "\"" + std::string(name) + "\""; }
 
@@ -493,6 +492,9 @@ private:
 
   // Records a pin name of the current cell; a second use is an error.
   void Claim(std::string const &name, Position at) {
+    if (++m_PinCount > kLumCellMaxPins)
+      m_S.Fail(at,
+               Cell() + ": the library has more than " + std::to_string(kLumCellMaxPins) + " pins");
     auto const [it, added] = m_PinNames.emplace(name, at);
     if (!added)
       m_S.Fail(at, Cell() + ": pin " + Quote(name) + " is declared twice (first at " +
@@ -610,6 +612,10 @@ private:
         }
         long const first = range.from < range.to ? range.from : range.to;
         long const last = range.from < range.to ? range.to : range.from;
+        m_MemberBits += static_cast<std::size_t>(last - first + 1);
+        if (m_MemberBits > kLumCellMaxMemberBits)
+          m_S.Fail(member.at, prefix + ": bus member pins address more than " +
+                                  std::to_string(kLumCellMaxMemberBits) + " bits in all");
         if (first < low || last >= low + span)
           m_S.Fail(member.at, prefix + ": member pin " + Quote(name) + " is outside bits " +
                                   std::to_string(type.from) + " to " + std::to_string(type.to));
@@ -646,28 +652,27 @@ private:
     std::string const prefix = Cell() + ", bundle " + Quote(m_BundleOwn.names[0]);
     if (!m_HasMembers || m_Members.empty())
       m_S.Fail(m_BundleOwn.at, prefix + ": no members");
+    // Each member starts with the bundle's own attributes; its pin groups
+    // override them.
+    std::vector<PinGroup> pins(m_Members.size(), m_BundleOwn);
+    std::unordered_map<std::string, std::size_t> index;
+    for (std::size_t i = 0; i < m_Members.size(); ++i)
+      index.emplace(m_Members[i], i);
     for (PinGroup const &group : m_BundleMembers)
       for (std::string const &name : group.names) {
-        bool known = false;
-        for (std::string const &member : m_Members)
-          known = known || member == name;
-        if (!known)
+        auto const found = index.find(name);
+        if (found == index.end())
           m_S.Fail(group.at, prefix + ": pin " + Quote(name) + " is not one of its members");
+        PinGroup &pin = pins[found->second];
+        if (group.direction != Direction::None)
+          pin.direction = group.direction;
+        if (!group.function.empty())
+          pin.function = group.function;
+        if (!group.clock.empty())
+          pin.clock = group.clock;
       }
-    for (std::string const &member : m_Members) {
-      PinGroup pin = m_BundleOwn;
-      for (PinGroup const &group : m_BundleMembers)
-        for (std::string const &name : group.names)
-          if (name == member) {
-            if (group.direction != Direction::None)
-              pin.direction = group.direction;
-            if (!group.function.empty())
-              pin.function = group.function;
-            if (!group.clock.empty())
-              pin.clock = group.clock;
-          }
-      AddPin(member, pin, pin.direction);
-    }
+    for (std::size_t i = 0; i < m_Members.size(); ++i)
+      AddPin(m_Members[i], pins[i], pins[i].direction);
   }
 
   Lum_LibertyScanner &m_S;
@@ -689,6 +694,8 @@ private:
   std::vector<std::string> m_Members;
   bool m_HasMembers = false;
   std::vector<PinGroup> m_BundleMembers;
+  std::size_t m_PinCount = 0;
+  std::size_t m_MemberBits = 0;
   // Reused for every statement: no allocation per token once warm.
   std::string m_Keyword;
   std::string m_Value;

@@ -260,6 +260,9 @@ INSTANTIATE_TEST_SUITE_P(
             1, 53, "pin \"Y\" is not one of its members"},
         Bad{"a cell name a type block cannot take", "library (t) {\n  cell (\"a:b\") { } }", 2, 3,
             "cell \"a:b\": a type block name must not be empty nor hold ':'"},
+        Bad{"a bus wider than the reader builds",
+            "library (t) {\n type (w) { bit_width : 70000 ; } }", 2, 25,
+            "expected a whole number from 0 to 65536, found \"70000\""},
         Bad{"an unknown direction",
             "library (t) { cell (C) { pin (A) { direction : sideways ; } } }", 1, 48,
             "expected a direction (input, output, inout or internal), found \"sideways\""}));
