@@ -37,7 +37,9 @@ public:
 
   Lum_CellLibraryData Run() {
     m_Library.format = "json";
-    Check(m_Parser.iterate(m_Json).get(m_Doc), nullptr, "");
+    // A document that fails the first pass has no place to ask for.
+    if (simdjson::error_code const error = m_Parser.iterate(m_Json).get(m_Doc))
+      Fail(FirstPassError(error), std::string("invalid JSON: ") + simdjson::error_message(error));
     od::object root;
     simdjson::error_code const error = m_Doc.get_object().get(root);
     Check(error, nullptr,
@@ -101,6 +103,41 @@ private:
     throw Lum_ExceptionInvalidFormat(
         __FILE__, __LINE__, m_Path, line, column,
         "line " + std::to_string(line) + ", column " + std::to_string(column), what);
+  }
+
+  // Where the parser's first pass found the document invalid, which it does
+  // not tell: the first byte that breaks what that pass checks (a control
+  // byte in a string, a byte that is not UTF-8, a string left open).
+  char const *FirstPassError(simdjson::error_code error) const {
+    char const *const begin = m_Json.data();
+    char const *const end = begin + m_Json.size();
+    char const *open = nullptr;
+    for (char const *p = begin; p < end; ++p) {
+      auto const c = static_cast<unsigned char>(*p);
+      if (open) {
+        if (c == '\\')
+          ++p;
+        else if (c == '"')
+          open = nullptr;
+        else if (c < 0x20 && error == simdjson::UNESCAPED_CHARS)
+          return p;
+      } else if (c == '"') {
+        open = p;
+      }
+      if (c < 0x80 || error != simdjson::UTF8_ERROR)
+        continue;
+      std::ptrdiff_t const length = c >= 0xC2 && c <= 0xDF   ? 2
+                                    : c >= 0xE0 && c <= 0xEF ? 3
+                                    : c >= 0xF0 && c <= 0xF4 ? 4
+                                                             : 0;
+      if (length == 0 || end - p < length)
+        return p;
+      for (std::ptrdiff_t i = 1; i < length; ++i)
+        if ((static_cast<unsigned char>(p[i]) & 0xC0) != 0x80)
+          return p;
+      p += length - 1;
+    }
+    return open && error == simdjson::UNCLOSED_STRING ? open : begin;
   }
 
   // Fails on a simdjson error: "invalid JSON (reason)" at the place the

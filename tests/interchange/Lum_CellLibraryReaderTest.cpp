@@ -301,6 +301,8 @@ INSTANTIATE_TEST_SUITE_P(
     Json, InvalidFile,
     ::testing::Values(
         Bad{"invalid JSON", "{\"modules\": {},\n  \"A\": [1, }", 2, 12, "invalid JSON"},
+        Bad{"an unterminated string", "{\"modules\": {\n  \"A\": {\"x}}}", 2, 9, "invalid JSON"},
+        Bad{"a byte that is not UTF-8", "{\"modules\": {\n  \"A\xff\": {}}}", 2, 5, "invalid JSON"},
         Bad{"text after the document", "{\"modules\": {}}\n x", 1, 1, "invalid JSON"},
         Bad{"not a Yosys JSON file", "{\"x\": 1}", 1, 1, "expected a \"modules\" object"},
         Bad{"no blackbox module", "{\"modules\": {\"top\": {\"ports\": {}}}}", 1, 1,
