@@ -193,7 +193,7 @@ std::string Lum_CellLibraryReader::Save(Lum_TlmModel const &library, std::string
   if (managers.begin() == managers.end())
     Fail(dir, 0, 0, "the model holds no type library to save");
   std::string const name = (*managers.begin())->GetName();
-  std::string const path = (dir.empty() ? std::string(".") : dir) + "/" + name + ".tlm";
+  std::string path = (dir.empty() ? std::string(".") : dir) + "/" + name + ".tlm";
   library.Save(path.c_str());
   return path;
 }

@@ -161,7 +161,7 @@ private:
   void Validate(od::value value, unsigned depth) {
     if (depth > kMaxDepth)
       Fail(Location(), "values nested deeper than " + std::to_string(kMaxDepth));
-    od::json_type type;
+    od::json_type type = od::json_type::null;
     Check(value.type().get(type), nullptr, "");
     switch (type) {
     case od::json_type::object: {
@@ -181,7 +181,7 @@ private:
       Check(value.get_array().get(array), nullptr, "");
       for (auto result : array) {
         od::value element;
-        Check(std::move(result).get(element), nullptr, "");
+        Check(result.get(element), nullptr, "");
         Validate(element, depth + 1);
       }
       return;
@@ -265,7 +265,7 @@ private:
       }
       // A bit string (MSB first) or, with -compat-int, a number.
       od::value flag = field.value();
-      od::json_type type;
+      od::json_type type = od::json_type::null;
       Check(flag.type().get(type), nullptr, "");
       if (type == od::json_type::string) {
         std::string_view bits;
@@ -342,8 +342,8 @@ private:
     port.hasBits = true;
     for (auto result : bits) {
       od::value bit;
-      Check(std::move(result).get(bit), nullptr, "");
-      od::json_type type;
+      Check(result.get(bit), nullptr, "");
+      od::json_type type = od::json_type::null;
       Check(bit.type().get(type), nullptr, "");
       if (type != od::json_type::number && type != od::json_type::string)
         Fail(Location(), what + ": expected a bit number or a constant in \"bits\"");

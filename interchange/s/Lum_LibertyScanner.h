@@ -21,7 +21,7 @@ public:
     std::size_t column = 0;
   };
   // The longest name or value the reader keeps; longer ones are refused.
-  static constexpr std::size_t kMaxToken = 64 * 1024;
+  static constexpr std::size_t kMaxToken = std::size_t(64) << 10;
   // How deep groups may nest.
   static constexpr unsigned kMaxDepth = 256;
 
