@@ -2,10 +2,12 @@
 
 #include "Lum_CellLibraryTestSupport.h"
 #include "Lum_ExceptionInvalidFormat.h"
+#include "Lum_TdmTestSupport.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <fstream>
 #include <string>
 
 using celltest::Cell;
@@ -153,6 +155,28 @@ TEST(Lum_CellLibraryReader, RealStandardCells) {
     ASSERT_NE(block, nullptr) << name;
     EXPECT_EQ(Cell(block), expected);
   }
+}
+
+// A file is streamed through a window of 1 MB: names, values and
+// continuations that straddle its edges read as they do from memory.
+TEST(Lum_CellLibraryReader, StreamedFileReadsAsInMemory) {
+  std::string text = "library (big) {\n";
+  // Long kept names and values fill most of the file, so every edge of the
+  // window falls inside one.
+  for (std::size_t i = 0; text.size() < (std::size_t(4) << 20); ++i) {
+    text += "cell (C" + std::to_string(i) + std::string(20000 + 7 * i, 'n') + ") {\n pin (P" +
+            std::string(9000 + 13 * i, 'p') + ") { direction : \"in\\\nput\" ; function : \"" +
+            std::string(30000 + 11 * i, 'f') + "\\\n+g\" ; }\n}\n";
+  }
+  text += "}\n";
+  lumtest::TempDir dir;
+  std::string const path = dir.File("big.lib");
+  std::ofstream(path, std::ios::binary) << text;
+  Lum_CellLibrarySummary summary;
+  std::string const streamed = Cells(*Lum_CellLibraryReader::Read(path, {}, &summary));
+  EXPECT_GT(summary.cells, 60U);
+  EXPECT_EQ(summary.inputs, summary.cells);
+  EXPECT_TRUE(streamed == Cells(*Lum_CellLibraryReader::ReadText(text, path, {})));
 }
 
 // The FPGA cell models in JSON: 50 blackbox cells, buses bit by bit from
