@@ -201,8 +201,9 @@ private:
       return;
     }
     if (c != '(')
-      m_S.Fail(m_S.Where(), "expected ':' or '(' after '" + keyword + "', found " +
-                                Lum_LibertyScanner::Describe(c));
+      m_S.Fail(m_S.Where(),
+               std::string(context == Context::Top ? "expected '('" : "expected ':' or '('") +
+                   " after '" + keyword + "', found " + Lum_LibertyScanner::Describe(c));
     Position const open = m_S.Where();
     m_S.Advance();
     Context const child = ChildOf(context, keyword);

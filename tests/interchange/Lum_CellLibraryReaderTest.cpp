@@ -7,7 +7,9 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <cctype>
 #include <fstream>
+#include <ostream>
 #include <string>
 
 using celltest::Cell;
@@ -27,6 +29,14 @@ struct Construct {
   char const *body; // inside `library (t) { ... }`
   char const *cells;
 };
+
+// Parameters show as their description, in letters, digits and '_', so
+// that test names stay plain.
+void PrintDescription(char const *what, std::ostream *os) {
+  for (char const *c = what; *c; ++c)
+    *os << (std::isalnum(static_cast<unsigned char>(*c)) ? *c : '_');
+}
+void PrintTo(Construct const &c, std::ostream *os) { PrintDescription(c.what, os); }
 
 class LibertyConstruct : public ::testing::TestWithParam<Construct> {};
 
@@ -220,6 +230,8 @@ struct Bad {
   std::size_t column;
   char const *message;
 };
+
+void PrintTo(Bad const &bad, std::ostream *os) { PrintDescription(bad.what, os); }
 
 class InvalidFile : public ::testing::TestWithParam<Bad> {};
 
