@@ -56,20 +56,10 @@ std::string PathOf(Orb_Persistent const *object) {
 
 char const *Orb_KindName(Orb_Kind kind) {
   switch (kind) {
-  case Orb_Kind::DesignMgr:
-    return "design manager";
-  case Orb_Kind::Design:
-    return "design";
-  case Orb_Kind::View:
-    return "view";
-  case Orb_Kind::Block:
-    return "block";
-  case Orb_Kind::Pin:
-    return "pin";
-  case Orb_Kind::Signal:
-    return "signal";
-  case Orb_Kind::Network:
-    return "network";
+#define ORB_KIND(Kind, shown)                                                                      \
+  case Orb_Kind::Kind:                                                                             \
+    return shown;
+#include "Orb_Kinds.def"
   }
   return "object";
 }
@@ -396,18 +386,17 @@ static_assert(sizeof(void *) != 8 || sizeof(Orb_Persistent) == 24, "name, parent
 static_assert(sizeof(void *) != 8 || sizeof(Orb_Pin) == 40, "base and the outer side");
 static_assert(sizeof(void *) != 8 || sizeof(Orb_Signal) == 56, "base and pin list");
 static_assert(sizeof(void *) != 8 || sizeof(Orb_Block) == 88, "base, view, pins, inside");
-static_assert(sizeof(Orb_View) <= Orb_ObjectPool::kMaxSlotSize &&
-                  sizeof(Orb_Design) <= Orb_ObjectPool::kMaxSlotSize &&
-                  sizeof(Orb_DesignMgr) <= Orb_ObjectPool::kMaxSlotSize &&
-                  sizeof(Orb_Network) <= Orb_ObjectPool::kMaxSlotSize,
-              "a host object fits a pool page");
+#define ORB_KIND(Kind, shown)                                                                      \
+  static_assert(sizeof(Orb_##Kind) <= Orb_ObjectPool::kMaxSlotSize, "Orb_" #Kind " fits a page");
+#include "Orb_Kinds.def"
 
 Orb_Model::Orb_Model(char const *name, char const *dbName, char const *path, bool readOnly)
     : m_Name(name ? name : ""), m_DbName(dbName ? dbName : ""), m_Path(path ? path : ""),
       m_ReadOnly(readOnly) {
   std::size_t const sizes[Orb_KindCount] = {
-      sizeof(Orb_DesignMgr), sizeof(Orb_Design), sizeof(Orb_View),   sizeof(Orb_Block),
-      sizeof(Orb_Pin),       sizeof(Orb_Signal), sizeof(Orb_Network)};
+#define ORB_KIND(Kind, shown) sizeof(Orb_##Kind),
+#include "Orb_Kinds.def"
+  };
   for (unsigned k = 0; k < Orb_KindCount; ++k)
     m_Pools[k].SetSlotSize(sizes[k], this);
 }
@@ -520,27 +509,11 @@ void Orb_Model::Destroy(Orb_Persistent *object) noexcept {
   if (object->m_HasProperties && !m_TearingDown)
     m_SideProperties.erase(object);
   switch (object->GetKind()) {
-  case Orb_Kind::DesignMgr:
-    static_cast<Orb_DesignMgr *>(object)->~Orb_DesignMgr();
+#define ORB_KIND(Kind, shown)                                                                      \
+  case Orb_Kind::Kind:                                                                             \
+    static_cast<Orb_##Kind *>(object)->~Orb_##Kind();                                              \
     break;
-  case Orb_Kind::Design:
-    static_cast<Orb_Design *>(object)->~Orb_Design();
-    break;
-  case Orb_Kind::View:
-    static_cast<Orb_View *>(object)->~Orb_View();
-    break;
-  case Orb_Kind::Block:
-    static_cast<Orb_Block *>(object)->~Orb_Block();
-    break;
-  case Orb_Kind::Pin:
-    static_cast<Orb_Pin *>(object)->~Orb_Pin();
-    break;
-  case Orb_Kind::Signal:
-    static_cast<Orb_Signal *>(object)->~Orb_Signal();
-    break;
-  case Orb_Kind::Network:
-    static_cast<Orb_Network *>(object)->~Orb_Network();
-    break;
+#include "Orb_Kinds.def"
   }
   --m_ObjectCount[k];
   if (!m_TearingDown)

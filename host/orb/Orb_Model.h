@@ -35,9 +35,15 @@ namespace Port {
 class Stream;
 }
 
-// The kinds of host objects that clients specialize.
-enum class Orb_Kind : unsigned { DesignMgr, Design, View, Block, Pin, Signal, Network };
-constexpr unsigned Orb_KindCount = 7;
+// The kinds of host objects that clients specialize (Orb_Kinds.def).
+enum class Orb_Kind : unsigned {
+#define ORB_KIND(Kind, shown) Kind,
+#include "Orb_Kinds.def"
+};
+constexpr unsigned Orb_KindCount = 0
+#define ORB_KIND(Kind, shown) +1
+#include "Orb_Kinds.def"
+    ;
 
 LUM_PLATFORM_API char const *Orb_KindName(Orb_Kind kind);
 
@@ -522,6 +528,11 @@ private:
   Orb_NamedList<Orb_Design> m_Designs;
   Orb_PropertyHolder m_Properties;
 };
+
+// Every kind has its class, which knows its kind.
+#define ORB_KIND(Kind, shown)                                                                      \
+  static_assert(Orb_##Kind::kKind == Orb_Kind::Kind, "Orb_" #Kind " is of kind " #Kind);
+#include "Orb_Kinds.def"
 
 // The object as a T (Orb_Block, Orb_Pin, ...) if it is of T's kind, else
 // null (also for null): host objects have no virtual functions, so this
