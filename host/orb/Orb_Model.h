@@ -40,8 +40,9 @@ enum class Orb_Kind : unsigned {
 #define ORB_KIND(Kind, shown) Kind,
 #include "Orb_Kinds.def"
 };
+// One term of the sum per kind.
 constexpr unsigned Orb_KindCount = 0
-#define ORB_KIND(Kind, shown) +1
+#define ORB_KIND(Kind, shown) +1 // NOLINT(bugprone-macro-parentheses)
 #include "Orb_Kinds.def"
     ;
 
