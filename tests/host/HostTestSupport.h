@@ -98,13 +98,8 @@ public:
     if (onDelete)                                                                                  \
       onDelete(o);                                                                                 \
   }
-  HOSTTEST_EVENTS(DesignMgr)
-  HOSTTEST_EVENTS(Design)
-  HOSTTEST_EVENTS(View)
-  HOSTTEST_EVENTS(Block)
-  HOSTTEST_EVENTS(Pin)
-  HOSTTEST_EVENTS(Signal)
-  HOSTTEST_EVENTS(Network)
+#define ORB_KIND(Kind, shown) HOSTTEST_EVENTS(Kind)
+#include "Orb_Kinds.def"
 #undef HOSTTEST_EVENTS
 
 private:

@@ -5,7 +5,7 @@
 // Orb_Model. Clients attach through Orb_ModelDerived (Orb_Derived.h).
 
 #include "Orb_List.h"
-#include "Orb_Name.h"
+#include "Orb_NamedList.h"
 #include "Orb_Pool.h"
 #include "Orb_Property.h"
 
@@ -35,9 +35,16 @@ namespace Port {
 class Stream;
 }
 
-// The kinds of host objects that clients specialize.
-enum class Orb_Kind : unsigned { DesignMgr, Design, View, Block, Pin, Signal, Network };
-constexpr unsigned Orb_KindCount = 7;
+// The kinds of host objects that clients specialize (Orb_Kinds.def).
+enum class Orb_Kind : unsigned {
+#define ORB_KIND(Kind, shown) Kind,
+#include "Orb_Kinds.def"
+};
+// One term of the sum per kind.
+constexpr unsigned Orb_KindCount = 0
+#define ORB_KIND(Kind, shown) +1 // NOLINT(bugprone-macro-parentheses)
+#include "Orb_Kinds.def"
+    ;
 
 LUM_PLATFORM_API char const *Orb_KindName(Orb_Kind kind);
 
@@ -151,113 +158,8 @@ struct Orb_ChildSlot {
   }
 };
 
-// Children of one kind in host order (Orb_List: O(1) removal), with lookup
-// by name: a scan while there are few, an index (Orb_NameIndex) once there
-// are many.
-template <class T> class Orb_NamedList {
-public:
-  Orb_NamedList() = default;
-  Orb_NamedList(Orb_NamedList const &) = delete;
-  Orb_NamedList &operator=(Orb_NamedList const &) = delete;
-
-  Orb_Range<T> Items() const { return m_List.Range(); }
-  std::size_t Size() const { return m_List.Size(); }
-  // The child of that name, or null (also for a null name).
-  T *Find(std::string_view name) const;
-  T *Find(char const *name) const { return name ? Find(std::string_view(name)) : nullptr; }
-  T *Find(std::string const &name) const { return Find(std::string_view(name)); }
-  // Appends `item` unless a child has its name; then returns false and
-  // changes nothing. One hash insertion for a large list.
-  bool AddUnique(T *item);
-  // Appends `item` without looking at names, for a reader that adds many
-  // children and then checks them all at once with CheckNames: one sorted
-  // pass instead of a hash insertion at a random place per child.
-  void Append(T *item) {
-    m_List.Add(item);
-    m_Index.Clear();
-  }
-  // A child whose name an earlier child has, or null; indexes the children
-  // when they are many.
-  T *CheckNames();
-  void Remove(T *item) noexcept {
-    if (m_Index.Built())
-      m_Index.Erase(item);
-    m_List.Remove(item);
-    if (m_List.Size() == 0)
-      m_Index.Clear();
-  }
-  // Forgets every child without touching them.
-  void Clear() noexcept {
-    m_List.Clear();
-    m_Index.Clear();
-  }
-  // Room for `more` children beyond those held, in the list and, when they
-  // make the list large, in the index: adding them rehashes nothing.
-  void Reserve(std::size_t more);
-  template <class Less> void StableSort(Less const &less) { m_List.StableSort(less); }
-
-private:
-  // Builds the index when the list has grown past a scan.
-  void IndexIfLarge() const {
-    if (!m_Index.Built() && m_List.Size() > Orb_NameIndex<T>::kScanLimit)
-      m_Index.Rebuild(2 * m_List.Size(), m_List.Range());
-  }
-
-  Orb_List<T, Orb_ChildSlot> m_List;
-  mutable Orb_NameIndex<T> m_Index;
-};
-
 static_assert(sizeof(Orb_List<Orb_Pin, Orb_ChildSlot>) == 32, "a pointer and six 32-bit counts");
 static_assert(sizeof(Orb_NamedList<Orb_Pin>) == 40, "a list and the index's table pointer");
-
-template <class T> T *Orb_NamedList<T>::Find(std::string_view name) const {
-  IndexIfLarge();
-  if (m_Index.Built())
-    return m_Index.Find(name);
-  for (T *item : m_List.Range())
-    if (item->GetNameString() == name)
-      return item;
-  return nullptr;
-}
-
-template <class T> bool Orb_NamedList<T>::AddUnique(T *item) {
-  IndexIfLarge();
-  if (!m_Index.Built()) {
-    if (Find(item->GetNameString()))
-      return false;
-    m_List.Add(item);
-    return true;
-  }
-  // Geometric growth keeps insertions amortised O(1).
-  if (!m_Index.HasRoom(1))
-    m_Index.Rebuild(2 * (m_List.Size() + 1), m_List.Range());
-  if (m_Index.Insert(item))
-    return false;
-  try {
-    m_List.Add(item);
-  } catch (...) {
-    m_Index.Erase(item);
-    throw;
-  }
-  return true;
-}
-
-template <class T> T *Orb_NamedList<T>::CheckNames() {
-  if (m_List.Size() > Orb_NameIndex<T>::kScanLimit)
-    return m_Index.RebuildChecked(2 * m_List.Size(), m_List.Range());
-  auto const items = m_List.Range();
-  for (std::size_t i = 1; i < items.size(); ++i)
-    for (std::size_t j = 0; j < i; ++j)
-      if (items[j]->GetNameString() == items[i]->GetNameString())
-        return items[i];
-  return nullptr;
-}
-
-template <class T> void Orb_NamedList<T>::Reserve(std::size_t more) {
-  m_List.Reserve(more);
-  if (m_List.Size() + more > Orb_NameIndex<T>::kScanLimit && !m_Index.HasRoom(more))
-    m_Index.Rebuild(m_List.Size() + more, m_List.Range());
-}
 
 // Where a pin keeps its slot in the pin list of the signal it connects to,
 // on the side that the list is of.
@@ -523,63 +425,10 @@ private:
   Orb_PropertyHolder m_Properties;
 };
 
-// The object as a T (Orb_Block, Orb_Pin, ...) if it is of T's kind, else
-// null (also for null): host objects have no virtual functions, so this
-// stands in for dynamic_cast.
-template <class T> T *Orb_Cast(Orb_Persistent *object) {
-  return object && object->GetKind() == T::kKind ? static_cast<T *>(object) : nullptr;
-}
-template <class T> T const *Orb_Cast(Orb_Persistent const *object) {
-  return object && object->GetKind() == T::kKind ? static_cast<T const *>(object) : nullptr;
-}
-
-// Calls `visit` on each object that `object` owns directly, in host order: a
-// design manager's designs, a design's views, a view's networks and then its
-// top block, a block's pins, then its signals, then its child blocks. The one
-// place that knows the shape of the tree. Containers are read by index with
-// their size read afresh, so a visit that removes objects (under an
-// Orb_Model::FreeHold, which keeps them in memory) may make the walk miss
-// some, but never read freed memory.
-template <class F> void Orb_ForEachChild(Orb_Persistent *object, F const &visit) {
-  auto each = [&visit](auto const &items) {
-    for (std::size_t i = 0; i < items.size(); ++i)
-      visit(items[i]);
-  };
-  switch (object->GetKind()) {
-  case Orb_Kind::DesignMgr:
-    each(static_cast<Orb_DesignMgr *>(object)->GetDesigns());
-    break;
-  case Orb_Kind::Design:
-    each(static_cast<Orb_Design *>(object)->GetViews());
-    break;
-  case Orb_Kind::View: {
-    auto *view = static_cast<Orb_View *>(object);
-    each(view->GetNetworks());
-    if (view->GetBlock())
-      visit(view->GetBlock());
-    break;
-  }
-  case Orb_Kind::Block: {
-    auto *block = static_cast<Orb_Block *>(object);
-    each(block->GetPins());
-    each(block->GetSignals());
-    each(block->GetBlocks());
-    break;
-  }
-  case Orb_Kind::Pin:
-  case Orb_Kind::Signal:
-  case Orb_Kind::Network:
-    break;
-  }
-}
-
-// Visits the object and everything it owns, children before parents, each
-// object after what it owns, in the order of Orb_ForEachChild. Recursion
-// goes only as deep as blocks nest (Orb_MaxBlockDepth).
-template <class F> void Orb_VisitPostOrder(Orb_Persistent *object, F const &visit) {
-  Orb_ForEachChild(object, [&visit](Orb_Persistent *child) { Orb_VisitPostOrder(child, visit); });
-  visit(object);
-}
+// Every kind has its class, which knows its kind.
+#define ORB_KIND(Kind, shown)                                                                      \
+  static_assert(Orb_##Kind::kKind == Orb_Kind::Kind, "Orb_" #Kind " is of kind " #Kind);
+#include "Orb_Kinds.def"
 
 // Something a client keeps with a host model and that is saved with it: its
 // own host model, written into the design database under a key (for instance
@@ -770,3 +619,6 @@ template <class T, class... Args> T *Orb_Model::Make(Args &&...args) {
   ++m_ObjectCount[k];
   return object;
 }
+
+// Casts and walks over the tree of host objects.
+#include "Orb_Walk.h"

@@ -1,5 +1,7 @@
 #include "Orb_Debug.h"
 
+#include "Orb_Derived.h"
+#include "Orb_Model.h"
 #include "Port_Stream.h"
 #include "Port_String.h"
 
@@ -41,4 +43,12 @@ Port::Stream *Orb_Debug::SetOutput(Port::Stream *stream) {
   Port::Stream *previous = g_pDebugOutput;
   g_pDebugOutput = stream;
   return previous;
+}
+
+void Orb_Persistent::DebugDump(Port::Stream *stream, int indent) const {
+  Orb_Debug::Printf(stream, indent, "%s <%s>\n", Orb_KindName(GetKind()), GetName());
+  DumpProperties(stream, indent + 1);
+  for (Orb_ModelDerived *context : GetModel()->GetContexts())
+    if (Orb_ClientObject *client = context->GetClient(this))
+      client->DebugDumpCallback(stream, indent + 1);
 }

@@ -144,67 +144,23 @@ void Orb_Sync::SetEventNotifyAll() {
 
 void Orb_Sync::FireSpecialize(Orb_Persistent *object, bool create) {
   switch (object->GetKind()) {
-  case Orb_Kind::DesignMgr: {
-    auto *o = static_cast<Orb_DesignMgr *>(object);
-    create ? SyncEventSpecializeDesignMgrOnCreate(o) : SyncEventSpecializeDesignMgrOnLoad(o);
-    break;
+#define ORB_KIND(Kind, shown)                                                                      \
+  case Orb_Kind::Kind: {                                                                           \
+    auto *o = static_cast<Orb_##Kind *>(object);                                                   \
+    create ? SyncEventSpecialize##Kind##OnCreate(o) : SyncEventSpecialize##Kind##OnLoad(o);        \
+    break;                                                                                         \
   }
-  case Orb_Kind::Design: {
-    auto *o = static_cast<Orb_Design *>(object);
-    create ? SyncEventSpecializeDesignOnCreate(o) : SyncEventSpecializeDesignOnLoad(o);
-    break;
-  }
-  case Orb_Kind::View: {
-    auto *o = static_cast<Orb_View *>(object);
-    create ? SyncEventSpecializeViewOnCreate(o) : SyncEventSpecializeViewOnLoad(o);
-    break;
-  }
-  case Orb_Kind::Block: {
-    auto *o = static_cast<Orb_Block *>(object);
-    create ? SyncEventSpecializeBlockOnCreate(o) : SyncEventSpecializeBlockOnLoad(o);
-    break;
-  }
-  case Orb_Kind::Pin: {
-    auto *o = static_cast<Orb_Pin *>(object);
-    create ? SyncEventSpecializePinOnCreate(o) : SyncEventSpecializePinOnLoad(o);
-    break;
-  }
-  case Orb_Kind::Signal: {
-    auto *o = static_cast<Orb_Signal *>(object);
-    create ? SyncEventSpecializeSignalOnCreate(o) : SyncEventSpecializeSignalOnLoad(o);
-    break;
-  }
-  case Orb_Kind::Network: {
-    auto *o = static_cast<Orb_Network *>(object);
-    create ? SyncEventSpecializeNetworkOnCreate(o) : SyncEventSpecializeNetworkOnLoad(o);
-    break;
-  }
+#include "Orb_Kinds.def"
   }
 }
 
 void Orb_Sync::FireDelete(Orb_Persistent *object) {
   switch (object->GetKind()) {
-  case Orb_Kind::DesignMgr:
-    SyncEventDeleteDesignMgr(static_cast<Orb_DesignMgr *>(object));
+#define ORB_KIND(Kind, shown)                                                                      \
+  case Orb_Kind::Kind:                                                                             \
+    SyncEventDelete##Kind(static_cast<Orb_##Kind *>(object));                                      \
     break;
-  case Orb_Kind::Design:
-    SyncEventDeleteDesign(static_cast<Orb_Design *>(object));
-    break;
-  case Orb_Kind::View:
-    SyncEventDeleteView(static_cast<Orb_View *>(object));
-    break;
-  case Orb_Kind::Block:
-    SyncEventDeleteBlock(static_cast<Orb_Block *>(object));
-    break;
-  case Orb_Kind::Pin:
-    SyncEventDeletePin(static_cast<Orb_Pin *>(object));
-    break;
-  case Orb_Kind::Signal:
-    SyncEventDeleteSignal(static_cast<Orb_Signal *>(object));
-    break;
-  case Orb_Kind::Network:
-    SyncEventDeleteNetwork(static_cast<Orb_Network *>(object));
-    break;
+#include "Orb_Kinds.def"
   }
 }
 

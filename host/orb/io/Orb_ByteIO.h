@@ -1,7 +1,7 @@
 #pragma once
 
 // The buffered file writer and reader of design databases: fields of the
-// record format that Orb_ModelIO.cpp describes (tags, decimal numbers,
+// record format that Orb_ModelIO.h describes (tags, decimal numbers,
 // "<length>:<bytes>" strings). Internal to the platform.
 
 #include <cstddef>

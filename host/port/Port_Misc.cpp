@@ -1,7 +1,6 @@
 // Streams, exceptions, the message manager and time stamps.
 
-#include "Lum_Exception.h"
-#include "Orb_Exception.h"
+#include "Port_Exception.h"
 #include "Port_MsgManData.h"
 #include "Port_Stream.h"
 #include "Port_String.h"
@@ -45,18 +44,6 @@ std::string Exception::ShownName(std::string_view name) {
 Exception::~Exception() = default;
 
 } // namespace Port
-
-Lum_Exception::~Lum_Exception() = default;
-Lum_ExceptionCorruptDatabase::~Lum_ExceptionCorruptDatabase() = default;
-Lum_ExceptionDesignLoad::~Lum_ExceptionDesignLoad() = default;
-Lum_ExceptionInvalidLibrary::~Lum_ExceptionInvalidLibrary() = default;
-Lum_ExceptionInvalidTypeBlock::~Lum_ExceptionInvalidTypeBlock() = default;
-
-Orb_Exception::Orb_Exception(char const *file, int line, char const *objectName,
-                             char const *message)
-    : Port::Exception("Orb", file, "", line, objectName, message, false) {}
-
-Orb_Exception::~Orb_Exception() = default;
 
 namespace {
 
