@@ -1,0 +1,163 @@
+#include "Lum_PyDatabase.h"
+
+#include "Lum_Tlm.h"
+#include "Orb_Derived.h"
+#include "PM_PIC.h"
+#include "Port_String.h"
+
+#include <pybind11/pybind11.h>
+
+#include <filesystem>
+
+namespace py = pybind11;
+
+namespace lumpy {
+
+namespace {
+std::mutex g_LibraryMutex;
+thread_local int t_LockDepth = 0;
+} // namespace
+
+LibraryLock::LibraryLock() {
+  if (t_LockDepth++ > 0)
+    return;
+  if (g_LibraryMutex.try_lock())
+    return;
+  // Another thread runs a long call without the interpreter lock: wait for
+  // it without holding the interpreter lock ourselves.
+  py::gil_scoped_release release;
+  g_LibraryMutex.lock();
+}
+
+LibraryLock::~LibraryLock() {
+  if (--t_LockDepth == 0)
+    g_LibraryMutex.unlock();
+}
+
+// ---------------------------------------------------------------------------
+
+#define LUMPY_NOTE_DELETE(Kind)                                                                    \
+  void TrackingModel::SyncEventDelete##Kind(Orb_##Kind *o) {                                       \
+    m_Database.NoteDeleted(o);                                                                     \
+    Lum_TdmModel::SyncEventDelete##Kind(o);                                                        \
+  }
+LUMPY_NOTE_DELETE(DesignMgr)
+LUMPY_NOTE_DELETE(Design)
+LUMPY_NOTE_DELETE(View)
+LUMPY_NOTE_DELETE(Block)
+LUMPY_NOTE_DELETE(Pin)
+LUMPY_NOTE_DELETE(Signal)
+LUMPY_NOTE_DELETE(Network)
+#undef LUMPY_NOTE_DELETE
+
+Database::Database(std::string path, bool create) : m_Path(std::move(path)) {
+  std::string const dbName =
+      m_Path.empty() ? std::string("lumtdm") : std::filesystem::path(m_Path).stem().string();
+  m_pModel = std::make_unique<TrackingModel>(*this, dbName.c_str(), m_Path.c_str());
+  if (!create) {
+    // Opening is the long call: other Python threads may run meanwhile.
+    py::gil_scoped_release release;
+    m_pModel->Open(m_Path.c_str());
+  }
+}
+
+Database::~Database() {
+  LibraryLock const lock;
+  Close();
+}
+
+TrackingModel &Database::Model() const {
+  if (!m_pModel)
+    throw StaleError("database '" + m_Path + "' is closed");
+  return *m_pModel;
+}
+
+void Database::Close() {
+  if (!m_pModel)
+    return;
+  // Out of the model first, so that a handle never sees a model half gone.
+  std::unique_ptr<TrackingModel> model = std::move(m_pModel);
+  model.reset();
+}
+
+void Database::NoteDeleted(Orb_Persistent const *object) {
+  auto &counts = m_Generations[static_cast<unsigned>(object->GetKind())];
+  std::uint32_t const id = object->GetBridgeId();
+  if (id >= counts.size())
+    counts.resize(id + 1, 0);
+  ++counts[id];
+}
+
+// ---------------------------------------------------------------------------
+
+Handle::Handle(DatabasePtr database, Orb_Persistent *o)
+    : db(std::move(database)), object(o), id(o->GetBridgeId()), kind(o->GetKind()),
+      name(o->GetNameString()) {
+  generation = db->Generation(kind, id);
+}
+
+Orb_Persistent *Handle::Check() const {
+  if (!db->IsOpen())
+    throw StaleError(Describe() + " is stale: its database '" + db->GetPath() + "' is closed");
+  if (db->Generation(kind, id) != generation)
+    throw StaleError(Describe() + " is stale: it was deleted");
+  return object;
+}
+
+std::string Handle::Describe() const { return std::string(KindName(kind)) + " '" + name + "'"; }
+
+void LibraryHold::Check() const {
+  if (counted)
+    return;
+  if (view && !view->IsLive())
+    throw StaleError("type library object of " + view->Describe() +
+                     " is stale: the view that loaded its library is gone");
+}
+
+std::shared_ptr<Lum_TlmLibrary const>
+LoadCounted(std::string const &name, std::string const &personality, std::string const &part) {
+  PM_PIC const pic(personality.c_str(), part.c_str(), nullptr);
+  Lum_TlmLibrary const *library = nullptr;
+  {
+    py::gil_scoped_release release;
+    library = Lum_TlmLibrary::LoadLibrary(Port::StringBase<char>(name.c_str()), pic);
+  }
+  return std::shared_ptr<Lum_TlmLibrary const>(library, [](Lum_TlmLibrary const *l) {
+    LibraryLock const lock;
+    Lum_TlmLibrary::ReleaseLibrary(l);
+  });
+}
+
+char const *KindName(Orb_Kind kind) {
+  switch (kind) {
+  case Orb_Kind::DesignMgr:
+    return "design manager";
+  case Orb_Kind::Design:
+    return "design";
+  case Orb_Kind::View:
+    return "view";
+  case Orb_Kind::Block:
+    return "block";
+  case Orb_Kind::Pin:
+    return "pin";
+  case Orb_Kind::Signal:
+    return "signal";
+  case Orb_Kind::Network:
+    return "network";
+  }
+  return "object";
+}
+
+std::string FullPath(Orb_Persistent const *object) {
+  Orb_Persistent const *parent = object->GetParentObject();
+  if (!parent)
+    return object->GetName();
+  char separator = '/';
+  if (object->GetKind() == Orb_Kind::Pin)
+    separator = '.';
+  else if (object->GetKind() == Orb_Kind::Signal || object->GetKind() == Orb_Kind::Network)
+    separator = ':';
+  return FullPath(parent) + separator + object->GetName();
+}
+
+} // namespace lumpy
