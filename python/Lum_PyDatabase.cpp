@@ -107,11 +107,13 @@ Orb_Persistent *Handle::Check() const {
 std::string Handle::Describe() const { return std::string(KindName(kind)) + " '" + name + "'"; }
 
 void LibraryHold::Check() const {
-  if (counted)
+  if (counted || !view || view->IsLive())
     return;
-  if (view && !view->IsLive())
-    throw StaleError("type library object of " + view->Describe() +
-                     " is stale: the view that loaded its library is gone");
+  if (!view->db->IsOpen())
+    throw StaleError("type library object is stale: its database '" + view->db->GetPath() +
+                     "' is closed");
+  throw StaleError("type library object is stale: " + view->Describe() +
+                   ", which loaded its library, was deleted");
 }
 
 std::shared_ptr<Lum_TlmLibrary const>

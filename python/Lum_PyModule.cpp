@@ -938,6 +938,9 @@ PYBIND11_MODULE(_lumtdm, m) {
           "alive", Locked(+[](Handle const &h) { return h.IsLive(); }),
           "Whether the object still exists (False once deleted or its database closed).")
       .def_property_readonly(
+          "database", [](Handle const &h) { return h.db; },
+          "The Database it belongs to (closed or not).")
+      .def_property_readonly(
           "kind", [](Handle const &h) { return std::string(KindName(h.kind)); },
           "The kind: 'design manager', 'design', 'view', 'block', 'pin', 'signal' or 'network'.")
       .def("dump", Locked(+[](Handle const &h) { return ToPy(Dump(h)); }),
