@@ -16,6 +16,8 @@ if(TARGET lumtdm_python)
                     OUTPUT_VARIABLE lum_asan_runtime OUTPUT_STRIP_TRAILING_WHITESPACE)
     list(APPEND lum_python_test_env LD_PRELOAD=${lum_asan_runtime}
          ASAN_OPTIONS=detect_leaks=0:halt_on_error=1:abort_on_error=1)
+    set_property(TEST LumTdmInstall.FindPackageAndPkgConfig APPEND PROPERTY ENVIRONMENT
+                 LUM_PYTHON_PRELOAD=${lum_asan_runtime})
   endif()
   set_tests_properties(LumTdmPython.pytest PROPERTIES ENVIRONMENT "${lum_python_test_env}"
                        TIMEOUT 600)
