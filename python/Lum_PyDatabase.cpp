@@ -62,8 +62,12 @@ Database::Database(std::string path, bool create) : m_Path(std::move(path)) {
 }
 
 Database::~Database() {
-  LibraryLock const lock;
-  Close();
+  try {
+    LibraryLock const lock;
+    Close();
+  } catch (...) {
+    // Nothing to tell from a destructor; the model goes with its member.
+  }
 }
 
 TrackingModel &Database::Model() const {

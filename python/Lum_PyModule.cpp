@@ -118,7 +118,8 @@ void Raise(PyObject *type, Port::Exception const &e) {
   Raise(type, text, e.GetObjectName(), message, e.what());
 }
 
-void Translate(std::exception_ptr pointer) {
+// The signature is pybind11's translator type.
+void Translate(std::exception_ptr pointer) { // NOLINT(performance-unnecessary-value-param)
   try {
     if (pointer)
       std::rethrow_exception(pointer);
@@ -888,7 +889,10 @@ py::class_<Ref<T>, Handle> Common(py::module_ &m, char const *name, char const *
                              "The path from the design manager down, as Database.lookup takes it: "
                              "'mgr/design/view/top/child', a pin '<block path>.pin', a signal "
                              "'<block path>:signal', a network '<view path>:network'.")
-      .def("__repr__", [name](R const &r) { return Repr(r, name); });
+      .def("__repr__", [name](R const &r) {
+        LibraryLock const lock;
+        return Repr(r, name);
+      });
   return c;
 }
 
