@@ -988,9 +988,11 @@ PYBIND11_MODULE(_lumtdm, m) {
              return ListIterator{l, 0};
            })
       .def("__getitem__",
-           Locked(+[](ListRef const &l, py::object const &k) { return ListGetItem(l, k); }))
+           Locked(+[](ListRef const &l, py::object const &k) { return ListGetItem(l, k); }),
+           "The child at an index (IndexError past the end) or of a name (KeyError when absent).")
       .def("__contains__",
-           Locked(+[](ListRef const &l, py::object const &k) { return ListContains(l, k); }))
+           Locked(+[](ListRef const &l, py::object const &k) { return ListContains(l, k); }),
+           "Whether a child has that name, or is that object.")
       .def("get", Locked(+[](ListRef const &l, Text const &name) {
              return Wrap(l.owner.db, ListFindIndexed(l, name));
            }),
@@ -1352,10 +1354,12 @@ PYBIND11_MODULE(_lumtdm, m) {
              if (!block)
                throw py::key_error(name.value);
              return TypeBlockOf(l.hold, block);
-           }))
+           }),
+           "The type block of that name; KeyError when the library has none.")
       .def("__contains__", Locked(+[](TypeLibraryRef const &l, Text const &name) {
              return l.Get()->GetTypeBlock(Port::StringBase<char>(CName(name))) != nullptr;
-           }))
+           }),
+           "Whether the library has a type block of that name.")
       .def("__eq__",
            [](TypeLibraryRef const &a, py::object const &b) {
              return py::isinstance<TypeLibraryRef>(b) &&

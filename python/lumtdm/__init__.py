@@ -75,18 +75,23 @@ class Properties(_MutableMapping):
         self._object = obj
 
     def __getitem__(self, name):
+        """The value of the property of that name; KeyError when there is none."""
         return self._object._property_get(name)
 
     def __setitem__(self, name, value):
+        """Creates or replaces a property: a str, or a list of str for a string list."""
         self._object._property_set(name, value)
 
     def __delitem__(self, name):
+        """Deletes the property of that name; KeyError when there is none."""
         self._object._property_del(name)
 
     def __iter__(self):
+        """The property names in the object's order."""
         return iter(self._object._property_names())
 
     def __len__(self):
+        """The number of properties."""
         return len(self._object._property_names())
 
     def __repr__(self):

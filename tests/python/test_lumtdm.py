@@ -255,3 +255,23 @@ def test_dump_memory_report_and_threads(demo_db):
 def test_classes_cannot_be_subclassed():
     with pytest.raises(TypeError):
         type("MyBlock", (lumtdm.Block,), {})
+
+
+def test_every_public_class_and_function_has_a_docstring():
+    def described(name, obj):
+        lines = (getattr(obj, "__doc__", None) or "").strip().splitlines()
+        # pybind11 puts the signature first; a docstring must say more.
+        return any(line.strip() and not line.startswith(name + "(") for line in lines)
+
+    missing = []
+    for name in lumtdm.__all__:
+        obj = getattr(lumtdm, name)
+        if not described(name, obj):
+            missing.append(name)
+        if isinstance(obj, type) and obj is not lumtdm.Direction:
+            for attr, value in vars(obj).items():
+                public = not attr.startswith("_") or attr in ("__getitem__", "__contains__")
+                if public and (callable(value) or isinstance(value, property)) \
+                        and not described(attr, value):
+                    missing.append(name + "." + attr)
+    assert missing == []
