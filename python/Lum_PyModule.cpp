@@ -858,10 +858,11 @@ py::object CreateTypedBlock(BlockRef const &ref, Text const &name, TypeBlockRef 
                             bool pins, bool graft) {
   Lum_TdmBlock *block = BlockClient(ref);
   Lum_TlmBlock const *typeBlock = type.Get();
+  char const *childName = CName(name);
   Lum_TdmBlock *child = nullptr;
   {
     py::gil_scoped_release release;
-    child = block->CreateTypedBlock(CName(name), typeBlock, graft, pins);
+    child = block->CreateTypedBlock(childName, typeBlock, graft, pins);
   }
   return Wrap(ref.db, child->GetOrbBlock());
 }

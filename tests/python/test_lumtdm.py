@@ -2,7 +2,10 @@
 reopen, the error classes and stale handles."""
 
 import gc
+import os
 import shutil
+import subprocess
+import sys
 import threading
 
 import pytest
@@ -275,3 +278,33 @@ def test_every_public_class_and_function_has_a_docstring():
                         and not described(attr, value):
                     missing.append(name + "." + attr)
     assert missing == []
+
+
+@pytest.mark.skipif("asan" in os.environ.get("LD_PRELOAD", ""),
+                    reason="the sanitizer runtime needs more address space than the limit leaves")
+def test_running_out_of_memory_raises_memory_error():
+    # In a process of its own whose address space is capped: creating blocks
+    # until the library's allocation fails must raise MemoryError and leave
+    # the model usable.
+    script = """if True:
+        import os, resource, lumtdm
+        db = lumtdm.create()
+        top = db.create_design_manager("m").create_design("d").create_view("v").create_top_block("t")
+        used = int(open("/proc/self/statm").read().split()[0]) * os.sysconf("SC_PAGE_SIZE")
+        soft, hard = resource.getrlimit(resource.RLIMIT_AS)
+        resource.setrlimit(resource.RLIMIT_AS, (used + 64 * 2**20, hard))
+        n = 0
+        try:
+            while True:
+                top.create_block("b%d" % n)
+                n += 1
+        except MemoryError:
+            pass
+        resource.setrlimit(resource.RLIMIT_AS, (soft, hard))
+        assert len(top.children) == n and top.children[n - 1].name == "b%d" % (n - 1)
+        db.close()
+        print("ok", n)
+    """
+    result = subprocess.run([sys.executable, "-c", script], capture_output=True, text=True,
+                            timeout=300)
+    assert result.returncode == 0 and result.stdout.startswith("ok"), result.stderr
