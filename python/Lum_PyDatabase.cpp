@@ -108,7 +108,7 @@ Orb_Persistent *Handle::Check() const {
   return object;
 }
 
-std::string Handle::Describe() const { return std::string(KindName(kind)) + " '" + name + "'"; }
+std::string Handle::Describe() const { return std::string(Orb_KindName(kind)) + " '" + name + "'"; }
 
 void LibraryHold::Check() const {
   if (counted || !view || view->IsLive())
@@ -132,26 +132,6 @@ LoadCounted(std::string const &name, std::string const &personality, std::string
     LibraryLock const lock;
     Lum_TlmLibrary::ReleaseLibrary(l);
   });
-}
-
-char const *KindName(Orb_Kind kind) {
-  switch (kind) {
-  case Orb_Kind::DesignMgr:
-    return "design manager";
-  case Orb_Kind::Design:
-    return "design";
-  case Orb_Kind::View:
-    return "view";
-  case Orb_Kind::Block:
-    return "block";
-  case Orb_Kind::Pin:
-    return "pin";
-  case Orb_Kind::Signal:
-    return "signal";
-  case Orb_Kind::Network:
-    return "network";
-  }
-  return "object";
 }
 
 std::string FullPath(Orb_Persistent const *object) {

@@ -174,8 +174,6 @@ struct TypePinRef {
 std::shared_ptr<Lum_TlmLibrary const>
 LoadCounted(std::string const &name, std::string const &personality, std::string const &part);
 
-// Names as the module shows them.
-char const *KindName(Orb_Kind kind);
 // "mgr/design/view/top/child", pins "<block>.pin", signals "<block>:sig",
 // networks "<view>:net".
 std::string FullPath(Orb_Persistent const *object);

@@ -946,7 +946,7 @@ PYBIND11_MODULE(_lumtdm, m) {
           "database", [](Handle const &h) { return h.db; },
           "The Database it belongs to (closed or not).")
       .def_property_readonly(
-          "kind", [](Handle const &h) { return std::string(KindName(h.kind)); },
+          "kind", [](Handle const &h) { return std::string(Orb_KindName(h.kind)); },
           "The kind: 'design manager', 'design', 'view', 'block', 'pin', 'signal' or 'network'.")
       .def("dump", Locked(+[](Handle const &h) { return ToPy(Dump(h)); }),
            "The object's debug dump (its class, its typing and the host's dump) as text.")
