@@ -9,15 +9,20 @@ if(TARGET lumtdm_python)
   if(TARGET tdm)
     list(APPEND lum_python_test_env LUMTDM_TDM=$<TARGET_FILE:tdm>)
   endif()
-  # An instrumented module needs the sanitizer runtime loaded first; the
-  # interpreter's own allocations are not ours to leak-check.
+  # An instrumented module needs the sanitizer runtime loaded first, and the
+  # C++ runtime with it (the interpreter has none, and the sanitizer must see
+  # its throw to intercept it); the interpreter's own allocations are not
+  # ours to leak-check.
   if(CMAKE_CXX_FLAGS MATCHES "-fsanitize=[^ ]*address")
     execute_process(COMMAND ${CMAKE_CXX_COMPILER} -print-file-name=libasan.so
                     OUTPUT_VARIABLE lum_asan_runtime OUTPUT_STRIP_TRAILING_WHITESPACE)
-    list(APPEND lum_python_test_env LD_PRELOAD=${lum_asan_runtime}
+    execute_process(COMMAND ${CMAKE_CXX_COMPILER} -print-file-name=libstdc++.so
+                    OUTPUT_VARIABLE lum_cxx_runtime OUTPUT_STRIP_TRAILING_WHITESPACE)
+    set(lum_preload "${lum_asan_runtime} ${lum_cxx_runtime}")
+    list(APPEND lum_python_test_env "LD_PRELOAD=${lum_preload}"
          ASAN_OPTIONS=detect_leaks=0:halt_on_error=1:abort_on_error=1)
     set_property(TEST LumTdmInstall.FindPackageAndPkgConfig APPEND PROPERTY ENVIRONMENT
-                 LUM_PYTHON_PRELOAD=${lum_asan_runtime})
+                 "LUM_PYTHON_PRELOAD=${lum_preload}")
   endif()
   set_tests_properties(LumTdmPython.pytest PROPERTIES ENVIRONMENT "${lum_python_test_env}"
                        TIMEOUT 600)
