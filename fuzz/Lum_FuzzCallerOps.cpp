@@ -8,6 +8,7 @@
 #include "Lum_FuzzSupport.h"
 
 #include "Lum_Exception.h"
+#include "Lum_TdmSchema.h"
 #include "Lum_TdmTypePinMap.h"
 
 #include <fuzzer/FuzzedDataProvider.h>
@@ -45,9 +46,9 @@ PM_PIC Personality() { return PM_PIC("pm1", "part1", nullptr); }
 std::unique_ptr<Lum_TdmModel> MakeDesign() {
   auto model = std::make_unique<Lum_TdmModel>("fuzz", "fuzzdb", "");
   Lum_TdmView *view = model->CreateDesignMgr("dm")->CreateDesign("top")->CreateView("netlist");
-  view->CreatePropertyString("TDS_DEVICE_PM", "pm1");
-  view->CreatePropertyString("TDS_DEVICE_PART", "part1");
-  Orb_Property *libraries = view->CreatePropertyStringList("TDS_VIEW_TYPE_LIBS");
+  view->CreatePropertyString(Lum_TdmSchema::kDevicePm, "pm1");
+  view->CreatePropertyString(Lum_TdmSchema::kDevicePart, "part1");
+  Orb_Property *libraries = view->CreatePropertyStringList(Lum_TdmSchema::kTypeLibraries);
   libraries->AppendString("LIBT 2.1");
   libraries->AppendString(Lum_TlmLibrary::LOCAL_LIBRARY_NAME);
   Lum_TlmBlock *loc =

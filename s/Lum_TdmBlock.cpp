@@ -11,6 +11,7 @@
 #include "Lum_TdmView.h"
 
 #include "Lum_Exception.h"
+#include "Lum_TdmSchema.h"
 #include "Lum_Tlm.h"
 #include "Lum_TlmTypeID.h"
 #include "Ora_GraftMgr.h"
@@ -34,9 +35,9 @@ namespace {
 char const kSourcePath[] = "../s/Lum_TdmBlock";
 char const kRevision[] = "$Revision: 1.1 $";
 
-char const kBlockTypeProperty[] = "TDS_BLOCK_TYPE";
-char const kPinMapProperty[] = "TDS_BLOCK_PIN_MAP";
-char const kDontCreatePinsProperty[] = "LUM_DONT_CREATE_UNUSED_PINS";
+using Lum_TdmSchema::kBlockPinMap;
+using Lum_TdmSchema::kBlockType;
+using Lum_TdmSchema::kDontCreateUnusedPins;
 
 // A pin whose name differs from its type pin's. A pin without a type pin is
 // not one: it has nothing to record.
@@ -162,7 +163,7 @@ void Lum_TdmBlock::InitTypeBlock() {}
 // Binding on load
 
 void Lum_TdmBlock::ResolveTypeBlock() {
-  Orb_Property const *stored = GetPropertyByName(kBlockTypeProperty);
+  Orb_Property const *stored = GetPropertyByName(kBlockType);
   if (!stored)
     return;
   std::string const storedType(stored->GetValue());
@@ -217,7 +218,7 @@ void Lum_TdmBlock::ReconcilePins(Lum_TlmBlock const *typeBlock) {
   // last member of a name winning. The views point into the property, which
   // nothing touches before the map is dropped.
   std::unordered_map<std::string_view, char const *> nameMap;
-  if (Orb_Property const *pinMap = GetPropertyByName(kPinMapProperty)) {
+  if (Orb_Property const *pinMap = GetPropertyByName(kBlockPinMap)) {
     nameMap.reserve(pinMap->GetMembers().size());
     for (auto const &member : pinMap->GetMembers())
       nameMap[std::string_view(member->GetName())] = member->GetStringValue();
@@ -228,7 +229,7 @@ void Lum_TdmBlock::ReconcilePins(Lum_TlmBlock const *typeBlock) {
   // no pin, so whether it will run is known now, and the taken type pins are
   // noted only then.
   bool const createMissing = typeBlock->GetNumPins() > GetNumPins() &&
-                             !GetOrbBlock()->GetView()->GetPropertyByName(kDontCreatePinsProperty);
+                             !GetOrbBlock()->GetView()->GetPropertyByName(kDontCreateUnusedPins);
   std::vector<Lum_TlmPin const *> taken;
   if (createMissing)
     taken.reserve(pins.size());
@@ -351,7 +352,7 @@ Lum_TdmBlock *Lum_TdmBlock::CreateUntypedBlock(char const *name, Lum_TlmBlock co
   association += typeBlock->GetName();
   association += ' ';
   association += UT_TIMESTAMP().getTimeStampString();
-  child->CreatePropertyString("TDS_LIBRARY_ASSOC", association.c_str());
+  child->CreatePropertyString(Lum_TdmSchema::kLibraryAssociation, association.c_str());
 
   Port::StringBase<char> const viewName(GetView()->GetName());
   if (typeBlock->HasHier(viewName)) {
@@ -614,17 +615,17 @@ void Lum_TdmBlock::NormalizePins() { SortPinsByName(); }
 // Commit
 
 void Lum_TdmBlock::CommitTypeProperties() {
-  Orb_Property *stored = GetPropertyByName(kBlockTypeProperty);
+  Orb_Property *stored = GetPropertyByName(kBlockType);
   if (m_pTypeBlock) {
     Port::StringBase<char> const tag = m_pTypeBlock->GetUniqueTag();
     if (stored && stored->GetKind() == Orb_Property::STRING)
       stored->SetStringValue(tag.str());
     else
-      CreatePropertyString(kBlockTypeProperty, tag.c_str());
+      CreatePropertyString(kBlockType, tag.c_str());
   } else if (stored) {
     DeleteProperty(stored);
   }
-  if (Orb_Property *pinMap = GetPropertyByName(kPinMapProperty))
+  if (Orb_Property *pinMap = GetPropertyByName(kBlockPinMap))
     DeleteProperty(pinMap);
   if (!m_pTypeBlock)
     return;
@@ -646,7 +647,7 @@ void Lum_TdmBlock::CommitTypeProperties() {
     ++first;
   if (first == pins.size())
     return;
-  Orb_Property *pinMap = CreatePropertyList(kPinMapProperty);
+  Orb_Property *pinMap = CreatePropertyList(kBlockPinMap);
   for (std::size_t i = first; i < pins.size(); ++i) {
     Lum_TdmPin const *pin = clientOf(pins[i]);
     if (IsMappedPin(pin))

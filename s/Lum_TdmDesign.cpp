@@ -4,6 +4,7 @@
 #include "Lum_TdmModel.h"
 
 #include "Lum_Exception.h"
+#include "Lum_TdmSchema.h"
 #include "Lum_Tlm.h"
 
 #include <cstring>
@@ -13,16 +14,16 @@ namespace {
 char const kSourcePath[] = "../s/Lum_TdmDesign";
 char const kRevision[] = "$Revision: 1.1 $";
 
-char const kDesignType[] = "TDS_DESIGN_TYPE";
-char const kUserDesign[] = "TDS_DESIGN_TYPE_USER";
+using Lum_TdmSchema::kDesignType;
+using Lum_TdmSchema::kDesignTypeUser;
 
 bool IsUserMark(Orb_Property const *mark) {
-  return !mark || std::strcmp(mark->GetStringValue(), kUserDesign) == 0;
+  return !mark || std::strcmp(mark->GetStringValue(), kDesignTypeUser) == 0;
 }
 
 // The mark as the dumps show it: an absent mark reads as a user design.
 char const *ShownMark(Orb_Property const *mark) {
-  return mark ? mark->GetStringValue() : kUserDesign;
+  return mark ? mark->GetStringValue() : kDesignTypeUser;
 }
 
 } // namespace
@@ -54,7 +55,7 @@ bool Lum_TdmDesign::IsTypeBlockDesign(Orb_Design const &design) {
 
 void Lum_TdmDesign::CommitToOrb() {
   if (!GetPropertyByName(kDesignType))
-    CreatePropertyString(kDesignType, kUserDesign);
+    CreatePropertyString(kDesignType, kDesignTypeUser);
 }
 
 void Lum_TdmDesign::TraverseAndCommitToOrb() { CommitToOrb(); }

@@ -10,6 +10,7 @@
 #include "Lum_TdmSignal.h"
 
 #include "Lum_Exception.h"
+#include "Lum_TdmSchema.h"
 #include "Lum_Tlm.h"
 #include "Lum_TlmTypeID.h"
 #include "PM_PIC.h"
@@ -25,17 +26,16 @@ namespace {
 char const kSourcePath[] = "../s/Lum_TdmView";
 char const kRevision[] = "$Revision: 1.1 $";
 
-// The format this software writes.
-constexpr unsigned kTdmVersion = 3;
-constexpr unsigned kTdmRevision = 1;
 // Marks the version fields while the constructor runs.
 constexpr std::uint32_t kUnsetVersion = 0xFFFF;
 
-char const kVersionProperty[] = "TDS_TDM_VERSION";
-char const kLibrariesProperty[] = "TDS_VIEW_TYPE_LIBS";
-char const kDevicePmProperty[] = "TDS_DEVICE_PM";
-char const kDevicePartProperty[] = "TDS_DEVICE_PART";
-char const kDontCreatePinsProperty[] = "LUM_DONT_CREATE_UNUSED_PINS";
+using Lum_TdmSchema::kDevicePart;
+using Lum_TdmSchema::kDevicePm;
+using Lum_TdmSchema::kDontCreateUnusedPins;
+using Lum_TdmSchema::kFormatRevision;
+using Lum_TdmSchema::kFormatVersion;
+using Lum_TdmSchema::kTypeLibraries;
+using Lum_TdmSchema::kVersion;
 
 // The entries of TDS_VIEW_TYPE_LIBS: a string list, or a lone string taken
 // as one entry.
@@ -55,8 +55,8 @@ Lum_TdmView::Lum_TdmView(Lum_TdmModel *model, Orb_View *view, bool isNew)
     : Orb_ViewT<Lum_TdmTraits>(model, view), m_Version(kUnsetVersion), m_Revision(kUnsetVersion),
       m_LibraryListFailed(false) {
   if (isNew) {
-    m_Version = kTdmVersion;
-    m_Revision = kTdmRevision;
+    m_Version = kFormatVersion;
+    m_Revision = kFormatRevision;
     WriteTdmProperties();
   } else {
     CheckTdmVersion();
@@ -76,8 +76,8 @@ Lum_TdmView::~Lum_TdmView() {
 }
 
 void Lum_TdmView::GetTdmVersion(unsigned int &version, unsigned int &revision) {
-  version = kTdmVersion;
-  revision = kTdmRevision;
+  version = kFormatVersion;
+  revision = kFormatRevision;
 }
 
 void Lum_TdmView::GetTdmLoadedDesignVersion(unsigned int &version, unsigned int &revision) const {
@@ -92,7 +92,7 @@ char const *Lum_TdmView::GetDesignMgrName() const {
 void Lum_TdmView::CheckTdmVersion() {
   m_Version = 0;
   m_Revision = 0;
-  Orb_Property const *stamp = GetPropertyByName(kVersionProperty);
+  Orb_Property const *stamp = GetPropertyByName(kVersion);
   if (!stamp)
     return;
   // Fields the parse does not reach stay 0; negative numbers wrap to their
@@ -105,7 +105,7 @@ void Lum_TdmView::CheckTdmVersion() {
 
   bool const tooOld = m_Version == 0 && m_Revision <= 2;
   bool const tooNew =
-      m_Version > kTdmVersion || (m_Version == kTdmVersion && m_Revision > kTdmRevision);
+      m_Version > kFormatVersion || (m_Version == kFormatVersion && m_Revision > kFormatRevision);
   if (tooOld) {
     Port_MsgManData::createObject("Lum", kSourcePath, __LINE__, kRevision)
         .issueError("Tdm version is %d and the revision is %d. This is an old design that is no "
@@ -126,26 +126,26 @@ void Lum_TdmView::CheckTdmVersion() {
 }
 
 void Lum_TdmView::WriteTdmProperties() {
-  if (GetPropertyByName(kDontCreatePinsProperty))
-    DeleteProperty(kDontCreatePinsProperty);
+  if (GetPropertyByName(kDontCreateUnusedPins))
+    DeleteProperty(kDontCreateUnusedPins);
 
   Port::StringBase<char> stamp;
-  stamp.doFormat("%d.%d", kTdmVersion, kTdmRevision);
-  Orb_Property *stampProperty = GetPropertyByName(kVersionProperty);
+  stamp.doFormat("%d.%d", kFormatVersion, kFormatRevision);
+  Orb_Property *stampProperty = GetPropertyByName(kVersion);
   if (stampProperty && stampProperty->GetKind() == Orb_Property::STRING)
     stampProperty->SetStringValue(stamp.str());
   else
-    CreatePropertyString(kVersionProperty, stamp.c_str());
+    CreatePropertyString(kVersion, stamp.c_str());
 
   // A list that failed to build lacks the libraries after the failing entry:
   // writing it would drop them from the database.
   if (!m_pLibrary || m_LibraryListFailed)
     return;
-  Orb_Property *libraries = GetPropertyByName(kLibrariesProperty);
+  Orb_Property *libraries = GetPropertyByName(kTypeLibraries);
   if (libraries && libraries->GetKind() == Orb_Property::STRING_LIST)
     libraries->ClearStrings();
   else
-    libraries = CreatePropertyStringList(kLibrariesProperty);
+    libraries = CreatePropertyStringList(kTypeLibraries);
   for (Lum_TlmLibrary const *library : *m_pLibrary) {
     unsigned version = 0;
     unsigned revision = 0;
@@ -173,11 +173,11 @@ bool Lum_TdmView::IsLocalLibrary(Lum_TlmLibrary const *library) {
 }
 
 void Lum_TdmView::GetDevicePic(PM_PIC &personality) const {
-  Orb_Property const *pm = GetPropertyByName(kDevicePmProperty);
-  Orb_Property const *part = GetPropertyByName(kDevicePartProperty);
+  Orb_Property const *pm = GetPropertyByName(kDevicePm);
+  Orb_Property const *part = GetPropertyByName(kDevicePart);
   if (!pm || !part) {
     std::string const message =
-        std::string("The view has no ") + (pm ? kDevicePartProperty : kDevicePmProperty) +
+        std::string("The view has no ") + (pm ? kDevicePart : kDevicePm) +
         " property: the device personality is needed to load its type libraries.";
     throw Lum_ExceptionInvalidLibrary("Lum", kSourcePath, kRevision, __LINE__, GetName(),
                                       message.c_str(), false);
@@ -215,7 +215,7 @@ void Lum_TdmView::BuildLibraryList() const {
   // The personality is built only when a library has to be loaded.
   PM_PIC personality("", "", nullptr);
   bool havePersonality = false;
-  for (std::string const &text : LibraryEntries(GetPropertyByName(kLibrariesProperty))) {
+  for (std::string const &text : LibraryEntries(GetPropertyByName(kTypeLibraries))) {
     // The name is the first field; leading blanks are skipped.
     Port::StringBase<char> const entry(text);
     std::size_t begin = 0;

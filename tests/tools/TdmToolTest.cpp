@@ -2,6 +2,7 @@
 
 #include "../Lum_TdmTestSupport.h"
 
+#include "Lum_TdmSchema.h"
 #include "Orb_Model.h"
 #include "Port_Exception.h"
 
@@ -90,19 +91,19 @@ public:
     Design d{};
     d.dm = dm;
     d.design = dm->CreateDesign(name);
-    d.design->CreatePropertyString("TDS_DESIGN_TYPE", "TDS_DESIGN_TYPE_USER");
+    d.design->CreatePropertyString(Lum_TdmSchema::kDesignType, Lum_TdmSchema::kDesignTypeUser);
     d.view = d.design->CreateView("netlist");
-    d.view->CreatePropertyString("TDS_TDM_VERSION", stamp);
-    d.view->CreatePropertyString("TDS_DEVICE_PM", "demo");
-    d.view->CreatePropertyString("TDS_DEVICE_PART", "d1");
-    d.view->CreatePropertyStringList("TDS_VIEW_TYPE_LIBS")->AppendString("GATES 1.2 demo");
+    d.view->CreatePropertyString(Lum_TdmSchema::kVersion, stamp);
+    d.view->CreatePropertyString(Lum_TdmSchema::kDevicePm, "demo");
+    d.view->CreatePropertyString(Lum_TdmSchema::kDevicePart, "d1");
+    d.view->CreatePropertyStringList(Lum_TdmSchema::kTypeLibraries)->AppendString("GATES 1.2 demo");
     d.top = d.view->CreateTopBlock(name);
     d.net = d.top->CreateSignal("n1");
     Orb_Block *u1 = AddTyped(d, "u1", "GATES:NAND2", {"A", "B", "Y"});
     u1->GetPinByName("A")->Connect(d.net);
     Orb_Block *u2 = AddTyped(d, "u2", "GATES:INV", {"IN", "Y"});
     u2->GetPinByName("IN")->Connect(d.net);
-    u2->CreatePropertyList("TDS_BLOCK_PIN_MAP")->CreatePropertyString("IN", "A");
+    u2->CreatePropertyList(Lum_TdmSchema::kBlockPinMap)->CreatePropertyString("IN", "A");
     d.top->CreateBlock("u3")->CreatePin("P", Orb_Pin::PIN_INPUT);
     d.view->CreateNetwork("nets")->AddSignal(d.net);
     return d;
@@ -110,7 +111,7 @@ public:
   static Orb_Block *AddTyped(Design const &d, char const *name, char const *type,
                              std::vector<char const *> const &pins) {
     Orb_Block *block = d.top->CreateBlock(name);
-    block->CreatePropertyString("TDS_BLOCK_TYPE", type);
+    block->CreatePropertyString(Lum_TdmSchema::kBlockType, type);
     for (char const *pin : pins)
       block->CreatePin(pin, Orb_Pin::PIN_INPUT);
     return block;
@@ -170,7 +171,7 @@ TEST_F(TdmTool, CheckReportsTheFaultThatMakesOpeningFail) {
       Lum_TlmLibrary::GetLocalLibrary(d.view->GetModel(), PM_PIC("demo", "d1", nullptr))
           ->CreateTypeBlock("MACRO")
           ->CreatePin("X", Orb_Pin::PIN_INPUT);
-      d.view->GetPropertyByName("TDS_VIEW_TYPE_LIBS")->AppendString(local + " 1.0");
+      d.view->GetPropertyByName(Lum_TdmSchema::kTypeLibraries)->AppendString(local + " 1.0");
       AddTyped(d, "mac", type.c_str(), {"X"})->GetPinByName("X")->Connect(d.net);
     };
   };
@@ -178,13 +179,13 @@ TEST_F(TdmTool, CheckReportsTheFaultThatMakesOpeningFail) {
       {"  GATES:INV: 1 pin: work/chip/netlist:chip/u2 pin IN (mapped to Z)",
        [](Design &d) {
          d.top->GetBlockByName("u2")
-             ->GetPropertyByName("TDS_BLOCK_PIN_MAP")
+             ->GetPropertyByName(Lum_TdmSchema::kBlockPinMap)
              ->CreatePropertyString("IN", "Z");
        }},
       {"  GATES:NAND2: 1 pin: work/chip/netlist:chip/u4 pin A",
        [](Design &d) {
          AddTyped(d, "u4", "GATES:NAND2", {"A"})
-             ->CreatePropertyList("TDS_BLOCK_PIN_MAP")
+             ->CreatePropertyList(Lum_TdmSchema::kBlockPinMap)
              ->CreatePropertyString("A", "B");
        }},
       {"  " + local + ":OTHER: 1 block: work/chip/netlist:chip/mac\n", withLocal(local + ":OTHER")},
@@ -205,7 +206,8 @@ TEST_F(TdmTool, CheckReportsTheFaultThatMakesOpeningFail) {
 TEST_F(TdmTool, CheckReportsEveryProblemGroupedWithCounts) {
   std::string const db = WriteDatabase("many.odb", [](Design &d) {
     Orb_DesignMgr *dm = d.dm;
-    dm->CreateDesign("lib1")->CreatePropertyString("TDS_DESIGN_TYPE", "TDS_DESIGN_TYPE_LIBRARY");
+    dm->CreateDesign("lib1")->CreatePropertyString(Lum_TdmSchema::kDesignType,
+                                                   Lum_TdmSchema::kDesignTypeLibrary);
     AddDesign(dm, "old1", "0.1");
     AddDesign(dm, "old2", "");
     AddDesign(dm, "new1", "3.2");
@@ -216,22 +218,22 @@ TEST_F(TdmTool, CheckReportsEveryProblemGroupedWithCounts) {
     AddTyped(d, "c1", "CELLS:NAND2", {});
     AddTyped(d, "z1", "GATES:NAND2", {"A", "B", "Y", "Z"})->GetPinByName("Z")->Connect(d.net);
     AddTyped(d, "k1", "GATES:INV", {"Y"})
-        ->CreatePropertyList("TDS_BLOCK_PIN_MAP")
+        ->CreatePropertyList(Lum_TdmSchema::kBlockPinMap)
         ->CreatePropertyString("Y", "A");
     // No collisions where the view forbids creating pins.
     Design quiet = AddDesign(dm, "quiet");
-    quiet.view->CreatePropertyString("LUM_DONT_CREATE_UNUSED_PINS", "");
+    quiet.view->CreatePropertyString(Lum_TdmSchema::kDontCreateUnusedPins, "");
     AddTyped(quiet, "k3", "GATES:INV", {"Y"})
-        ->CreatePropertyList("TDS_BLOCK_PIN_MAP")
+        ->CreatePropertyList(Lum_TdmSchema::kBlockPinMap)
         ->CreatePropertyString("Y", "A");
     Design nodevice = AddDesign(dm, "nodevice");
-    nodevice.view->DeleteProperty("TDS_DEVICE_PM");
-    nodevice.view->DeleteProperty("TDS_DEVICE_PART");
+    nodevice.view->DeleteProperty(Lum_TdmSchema::kDevicePm);
+    nodevice.view->DeleteProperty(Lum_TdmSchema::kDevicePart);
     AddDesign(dm, "nowhere")
-        .view->GetPropertyByName("TDS_VIEW_TYPE_LIBS")
+        .view->GetPropertyByName(Lum_TdmSchema::kTypeLibraries)
         ->AppendString("NOWHERE 1.0");
     Design broken = AddDesign(dm, "broken");
-    broken.view->GetPropertyByName("TDS_VIEW_TYPE_LIBS")->AppendString("BROKEN 1.0");
+    broken.view->GetPropertyByName(Lum_TdmSchema::kTypeLibraries)->AppendString("BROKEN 1.0");
     AddTyped(broken, "b1", "BROKEN:ANY", {});
   });
   std::ofstream(File("BROKEN.tlm")) << "not a library\n";
@@ -283,7 +285,7 @@ TEST_F(TdmTool, ErrorsAndACleanDatabase) {
   std::string const corrupt = File("corrupt.odb"), missing = File("missing.odb");
   std::ofstream(corrupt) << "garbage\n";
   std::string const old = WriteDatabase(
-      "old.odb", [](Design &d) { d.view->CreatePropertyString("TDS_TDM_VERSION", "0.1"); });
+      "old.odb", [](Design &d) { d.view->CreatePropertyString(Lum_TdmSchema::kVersion, "0.1"); });
   using Case = std::tuple<std::vector<std::string>, int, std::string>;
   for (auto const &[args, code, message] : std::vector<Case>{
            {{"info", missing}, 3, "tdm info: error: " + missing + ": "},
@@ -339,7 +341,7 @@ TEST_F(TdmTool, ErrorsAndACleanDatabase) {
 
 TEST_F(TdmTool, CommitUpgradesAnOldStampAndTheResultOpens) {
   std::string const db = WriteDatabase(
-      "old.odb", [](Design &d) { d.view->CreatePropertyString("TDS_TDM_VERSION", "2.5"); });
+      "old.odb", [](Design &d) { d.view->CreatePropertyString(Lum_TdmSchema::kVersion, "2.5"); });
   std::string const out = File("new.odb");
   Outcome run = Tdm({"commit", "--lib-path", m_Dir, db, "-o", out});
   EXPECT_EQ(run.code, 0) << run.err;
@@ -348,7 +350,7 @@ TEST_F(TdmTool, CommitUpgradesAnOldStampAndTheResultOpens) {
 
   // In place, with the file size limited below the database's: the database stays as it was.
   std::string const big = WriteDatabase("big.odb", [](Design &d) {
-    d.view->CreatePropertyString("TDS_TDM_VERSION", "2.5");
+    d.view->CreatePropertyString(Lum_TdmSchema::kVersion, "2.5");
     for (int i = 0; i < 200; ++i)
       d.top->CreateBlock(("spare" + std::to_string(i)).c_str());
   });

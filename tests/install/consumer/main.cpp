@@ -12,6 +12,7 @@
 #include "Lum_TdmView.h"
 
 #include "Lum_Exception.h"
+#include "Lum_TdmSchema.h"
 #include "Orb_Exception.h"
 
 #include <cstdio>
@@ -32,8 +33,8 @@ void Check(bool ok, char const *what) {
 void Write(std::string const &path) {
   Lum_TdmModel model("tool", "tool_db", path.c_str());
   Lum_TdmView *view = model.CreateDesignMgr("work")->CreateDesign("counter")->CreateView("netlist");
-  view->CreatePropertyString("TDS_DEVICE_PM", "generic");
-  view->CreatePropertyString("TDS_DEVICE_PART", "part0");
+  view->CreatePropertyString(Lum_TdmSchema::kDevicePm, "generic");
+  view->CreatePropertyString(Lum_TdmSchema::kDevicePart, "part0");
   Lum_TdmBlock *top = view->CreateTopBlock("counter");
   top->CreatePin("clk", Orb_Pin::PIN_INPUT);
   Lum_TdmBlock *bit = top->CreateBlock("bit0", 0);
@@ -68,9 +69,9 @@ void CatchByType() {
   Check(caught, "a duplicate design throws Orb_Exception");
 
   Lum_TdmView *view = designMgr->GetDesignByName("counter")->CreateView("netlist");
-  view->CreatePropertyString("TDS_DEVICE_PM", "generic");
-  view->CreatePropertyString("TDS_DEVICE_PART", "part0");
-  view->CreatePropertyStringList("TDS_VIEW_TYPE_LIBS")->AppendString("NO_SUCH_LIBRARY");
+  view->CreatePropertyString(Lum_TdmSchema::kDevicePm, "generic");
+  view->CreatePropertyString(Lum_TdmSchema::kDevicePart, "part0");
+  view->CreatePropertyStringList(Lum_TdmSchema::kTypeLibraries)->AppendString("NO_SUCH_LIBRARY");
   caught = false;
   try {
     std::vector<Lum_TlmLibrary const *> libraries;
