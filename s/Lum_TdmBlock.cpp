@@ -1,5 +1,6 @@
 #include "Lum_TdmBlock.h"
 
+#include "Lum_TdmClient.h"
 #include "Lum_TdmCommit.h"
 #include "Lum_TdmDbg.h"
 #include "Lum_TdmModel.h"
@@ -46,16 +47,6 @@ bool IsMappedPin(Lum_TdmPin const *pin) {
   return typePin && std::strcmp(pin->GetName(), typePin->GetName()) != 0;
 }
 
-// The client of a host object in `context`, specialized when it has none.
-template <class Client, class Host>
-Client *ClientOf(Orb_Context *context, Orb_BridgeHandle const &bridge, Host *object) {
-  Orb_ClientObject *client = bridge[object->GetBridgeId()];
-  if (!client)
-    client = context->Specialize(object);
-  assert(client && "the client model made no client for a host object");
-  return static_cast<Client *>(client);
-}
-
 // Calls `visit` with each host object of `objects` (a block's children or
 // pins, in host order) as its client, until it returns true; returns that
 // client or null. The bridge table is fetched once for the walk.
@@ -66,7 +57,7 @@ Client *FindClient(Orb_Context *context, Range const &objects, Visit const &visi
   using Host = std::remove_pointer_t<typename Range::value_type>;
   Orb_BridgeHandle const bridge = context->GetBridgeHandle(Host::kKind);
   for (std::size_t i = 0; i < objects.size(); ++i) {
-    Client *client = ClientOf<Client>(context, bridge, objects[i]);
+    Client *client = Lum_TdmClient::Of<Client>(context, bridge, objects[i]);
     if (visit(client))
       return client;
   }
@@ -200,13 +191,7 @@ void Lum_TdmBlock::ReconcilePins(Lum_TlmBlock const *typeBlock) {
   Orb_Context *context = GetContext();
   auto const pins = GetOrbBlock()->GetPins();
   Orb_BridgeHandle const bridge = context->GetBridgeHandle(Orb_Kind::Pin);
-  auto clientOf = [&](Orb_Pin *pin) {
-    Orb_ClientObject *client = bridge[pin->GetBridgeId()];
-    if (!client)
-      client = context->Specialize(pin);
-    assert(client && "the client model made no client for a pin");
-    return static_cast<Lum_TdmPin *>(client);
-  };
+  auto clientOf = [&](Orb_Pin *pin) { return Lum_TdmClient::Of<Lum_TdmPin>(context, bridge, pin); };
 
   if (!typeBlock) {
     for (std::size_t i = 0; i < pins.size(); ++i)
@@ -404,14 +389,14 @@ void Lum_TdmBlock::SetTypeBlock(Lum_TlmBlock const *typeBlock) {
   std::vector<std::pair<Orb_Pin *, Lum_TlmPin const *>> before;
   before.reserve(pins.size());
   for (Orb_Pin *pin : pins)
-    before.emplace_back(pin, ClientOf<Lum_TdmPin>(context, bridge, pin)->GetTypePin());
+    before.emplace_back(pin, Lum_TdmClient::Of<Lum_TdmPin>(context, bridge, pin)->GetTypePin());
   try {
     ReconcilePins(typeBlock);
   } catch (...) {
     std::unordered_set<Orb_Pin const *> kept;
     kept.reserve(before.size());
     for (auto const &[pin, typePin] : before) {
-      ClientOf<Lum_TdmPin>(context, bridge, pin)->SetTypePin(typePin);
+      Lum_TdmClient::Of<Lum_TdmPin>(context, bridge, pin)->SetTypePin(typePin);
       kept.insert(pin);
     }
     std::vector<Orb_Pin *> created;
@@ -435,7 +420,7 @@ void Lum_TdmBlock::SetTypeBlock(Lum_TlmBlock const *typeBlock, Lum_TdmTypePinMap
   if (!typeBlock) {
     m_pTypeBlock = nullptr;
     for (Orb_Pin *pin : pins)
-      ClientOf<Lum_TdmPin>(context, bridge, pin)->SetTypePin(nullptr);
+      Lum_TdmClient::Of<Lum_TdmPin>(context, bridge, pin)->SetTypePin(nullptr);
     InitTypeBlock();
     return;
   }
@@ -457,7 +442,7 @@ void Lum_TdmBlock::SetTypeBlock(Lum_TlmBlock const *typeBlock, Lum_TdmTypePinMap
   std::vector<std::pair<Lum_TdmPin *, Lum_TlmPin const *>> mapped;
   mapped.reserve(pins.size());
   for (Orb_Pin *hostPin : pins) {
-    Lum_TdmPin *pin = ClientOf<Lum_TdmPin>(context, bridge, hostPin);
+    Lum_TdmPin *pin = Lum_TdmClient::Of<Lum_TdmPin>(context, bridge, hostPin);
     Lum_TlmPin const *typePin = pinMap.GetPinMapping(pin);
     if (!typePin || typePin->GetParent() != typeBlock)
       throw Lum_ExceptionCorruptDatabase("Lum", kSourcePath, kRevision, __LINE__, pin->GetName(),
@@ -636,11 +621,7 @@ void Lum_TdmBlock::CommitTypeProperties() {
   Orb_Context *context = GetContext();
   Orb_BridgeHandle const bridge = context->GetBridgeHandle(Orb_Kind::Pin);
   auto clientOf = [&](Orb_Pin *pin) {
-    Orb_ClientObject *client = bridge[pin->GetBridgeId()];
-    if (!client)
-      client = context->Specialize(pin);
-    assert(client && "the client model made no client for a pin");
-    return static_cast<Lum_TdmPin const *>(client);
+    return static_cast<Lum_TdmPin const *>(Lum_TdmClient::Of<Lum_TdmPin>(context, bridge, pin));
   };
   std::size_t first = 0;
   while (first < pins.size() && !IsMappedPin(clientOf(pins[first])))

@@ -1,6 +1,7 @@
 #include "Lum_TdmView.h"
 
 #include "Lum_TdmBlock.h"
+#include "Lum_TdmClient.h"
 #include "Lum_TdmCommit.h"
 #include "Lum_TdmDbg.h"
 #include "Lum_TdmDesign.h"
@@ -16,7 +17,6 @@
 #include "PM_PIC.h"
 #include "Port_MsgManData.h"
 
-#include <cassert>
 #include <cstdint>
 #include <string>
 #include <vector>
@@ -336,17 +336,6 @@ std::uint64_t Lum_TdmView::DbgSecondarySize() const { return 0; }
 
 namespace {
 
-// The client of a host object read from a bridge table fetched once for the
-// whole walk; an object without one is specialized on the spot.
-template <class Client, class Host>
-Client const *MeasuredClient(Orb_Context *context, Orb_BridgeHandle const &bridge, Host *object) {
-  Orb_ClientObject *client = bridge[object->GetBridgeId()];
-  if (!client)
-    client = context->Specialize(object);
-  assert(client && "the client model made no client for a host object");
-  return static_cast<Client const *>(client);
-}
-
 // Adds one object of `bytes` to a kind's counters and to the total.
 void Count(std::uint64_t bytes, std::uint64_t &kindBytes, std::uint64_t &kindCount,
            std::uint64_t &total) {
@@ -376,17 +365,18 @@ std::uint64_t Lum_TdmView::DbgGetSize(std::uint64_t &blockBytes, std::uint64_t &
     auto const *block = static_cast<Lum_TdmBlock const *>(hostBlock);
     Count(block->DbgMySize(), blockBytes, blockCount, total);
     for (Orb_Pin *pin : block->GetPins())
-      Count(MeasuredClient<Lum_TdmPin>(context, pins, pin)->DbgMySize(), pinBytes, pinCount, total);
+      Count(Lum_TdmClient::Of<Lum_TdmPin>(context, pins, pin)->DbgMySize(), pinBytes, pinCount,
+            total);
   }
 
   // Signals are counted through their networks.
   Orb_BridgeHandle const networks = context->GetBridgeHandle(Orb_Kind::Network);
   Orb_BridgeHandle const signals = context->GetBridgeHandle(Orb_Kind::Signal);
   for (Orb_Network *network : GetNetworks()) {
-    Count(MeasuredClient<Lum_TdmNetwork>(context, networks, network)->DbgMySize(), networkBytes,
+    Count(Lum_TdmClient::Of<Lum_TdmNetwork>(context, networks, network)->DbgMySize(), networkBytes,
           networkCount, total);
     for (Orb_Signal *signal : network->GetSignals())
-      Count(MeasuredClient<Lum_TdmSignal>(context, signals, signal)->DbgMySize(), signalBytes,
+      Count(Lum_TdmClient::Of<Lum_TdmSignal>(context, signals, signal)->DbgMySize(), signalBytes,
             signalCount, total);
   }
   return total;
