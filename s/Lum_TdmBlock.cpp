@@ -3,6 +3,7 @@
 #include "Lum_TdmClient.h"
 #include "Lum_TdmCommit.h"
 #include "Lum_TdmDbg.h"
+#include "Lum_TdmLoadRules.h"
 #include "Lum_TdmModel.h"
 #include "Lum_TdmNetwork.h"
 #include "Lum_TdmPin.h"
@@ -161,25 +162,19 @@ void Lum_TdmBlock::ResolveTypeBlock() {
   Lum_TdmView const *view = GetView();
   Lum_TlmBlock const *typeBlock = view->FindTypeBlock(storedType);
   if (!typeBlock) {
-    // The library name is the text before the first ":", the type block's
-    // name all that follows; without ":" the type block's name is empty.
-    std::size_t const colon = storedType.find(':');
-    std::string const libraryName = storedType.substr(0, colon);
-    std::string const typeBlockName =
-        colon == std::string::npos ? std::string() : storedType.substr(colon + 1);
+    std::string libraryName;
+    std::string typeBlockName;
+    Lum_TdmLoadRules::SplitStoredType(storedType, libraryName, typeBlockName);
     Lum_TlmLibrary const *library = view->GetLibrary(Port::StringBase<char>(libraryName.c_str()));
     if (!library)
       throw Lum_ExceptionCorruptDatabase("Lum", kSourcePath, kRevision, __LINE__,
-                                         libraryName.c_str(),
-                                         "Could not locate the specified library.", false);
+                                         libraryName.c_str(), Lum_TdmLoadRules::kLibraryNotFound,
+                                         false);
     typeBlock = library->GetTypeBlock(Port::StringBase<char>(typeBlockName.c_str()));
-    if (!typeBlock) {
-      Port::StringBase<char> message;
-      message.doFormat("\nCouldn't find type block <%s> in library <%s>.\n", typeBlockName.c_str(),
-                       libraryName.c_str());
-      throw Lum_ExceptionCorruptDatabase("Lum", kSourcePath, kRevision, __LINE__,
-                                         typeBlockName.c_str(), message.c_str(), false);
-    }
+    if (!typeBlock)
+      throw Lum_ExceptionCorruptDatabase(
+          "Lum", kSourcePath, kRevision, __LINE__, typeBlockName.c_str(),
+          Lum_TdmLoadRules::TypeBlockMissingMessage(typeBlockName, libraryName).c_str(), false);
     view->NoteTypeBlock(storedType, typeBlock);
   }
   m_pTypeBlock = typeBlock;
@@ -199,22 +194,16 @@ void Lum_TdmBlock::ReconcilePins(Lum_TlmBlock const *typeBlock) {
     return;
   }
 
-  // Name map from TDS_BLOCK_PIN_MAP: design pin name to type pin name, the
-  // last member of a name winning. The views point into the property, which
-  // nothing touches before the map is dropped.
-  std::unordered_map<std::string_view, char const *> nameMap;
-  if (Orb_Property const *pinMap = GetPropertyByName(kBlockPinMap)) {
-    nameMap.reserve(pinMap->GetMembers().size());
-    for (auto const &member : pinMap->GetMembers())
-      nameMap[std::string_view(member->GetName())] = member->GetStringValue();
-  }
+  // The map's views point into the property, which nothing touches before
+  // the map is dropped.
+  Lum_TdmLoadRules::NameMap nameMap;
+  Lum_TdmLoadRules::ReadPinMap(GetOrbBlock(), nameMap);
 
-  // The second phase gives a block with fewer pins than its type block, in a
-  // view that allows it, the type pins nobody took. The first phase creates
-  // no pin, so whether it will run is known now, and the taken type pins are
-  // noted only then.
-  bool const createMissing = typeBlock->GetNumPins() > GetNumPins() &&
-                             !GetOrbBlock()->GetView()->GetPropertyByName(kDontCreateUnusedPins);
+  // The second phase creates what the first phase left untaken. The first
+  // phase creates no pin, so whether the second will run is known now, and
+  // the taken type pins are noted only then.
+  bool const createMissing = Lum_TdmLoadRules::CreatesMissing(
+      typeBlock, GetOrbBlock(), Lum_TdmLoadRules::ForbidsCreating(GetOrbBlock()->GetView()));
   std::vector<Lum_TlmPin const *> taken;
   if (createMissing)
     taken.reserve(pins.size());
@@ -222,16 +211,11 @@ void Lum_TdmBlock::ReconcilePins(Lum_TlmBlock const *typeBlock) {
   // First phase: every pin takes the type pin of its (mapped) name.
   for (std::size_t i = 0; i < pins.size(); ++i) {
     Orb_Pin *pin = pins[i];
-    char const *typePinName = pin->GetName();
-    if (!nameMap.empty()) {
-      auto const mapped = nameMap.find(std::string_view(pin->GetNameString()));
-      if (mapped != nameMap.end())
-        typePinName = mapped->second;
-    }
-    Lum_TlmPin const *typePin = typeBlock->GetPinByName(typePinName);
-    if (!typePin && pin->GetSignal())
+    Lum_TlmPin const *typePin =
+        typeBlock->GetPinByName(Lum_TdmLoadRules::TypePinName(pin, nameMap));
+    if (Lum_TdmLoadRules::IsUnmatched(pin, typePin))
       throw Lum_ExceptionCorruptDatabase("Lum", kSourcePath, kRevision, __LINE__, pin->GetName(),
-                                         "Could not locate the specified pin.", false);
+                                         Lum_TdmLoadRules::kPinNotFound, false);
     clientOf(pin)->SetTypePin(typePin);
     if (createMissing && typePin)
       taken.push_back(typePin);
@@ -241,25 +225,17 @@ void Lum_TdmBlock::ReconcilePins(Lum_TlmBlock const *typeBlock) {
 
   // Second phase: creation in the type block's pin order, then the sort.
   nameMap.clear();
-  std::sort(taken.begin(), taken.end());
-  std::size_t const typePinCount = typeBlock->GetPins().size();
-  for (std::size_t i = 0; i < typePinCount; ++i) {
-    Lum_TlmPin const *typePin = typeBlock->GetPin(i);
-    if (std::binary_search(taken.begin(), taken.end(), typePin))
-      continue;
-    if (GetOrbBlock()->GetPinByName(typePin->GetName())) {
-      Port::StringBase<char> message;
-      message.doFormat("While trying to patch up design block <%s> with new type pin <%s>\nof "
-                       "type block <%s>, found that the block already had a pin by that\nname.  "
-                       "This could have been due to an earlier and inappropriate\nclient call to "
-                       "pin->SetName().\n",
-                       GetName(), typePin->GetName(), typeBlock->GetName());
-      throw Lum_ExceptionCorruptDatabase("Lum", kSourcePath, kRevision, __LINE__,
-                                         GetOrbBlock()->GetView()->GetParent()->GetName(),
-                                         message.c_str(), false);
-    }
-    CreatePin(typePin->GetName(), typePin->GetDirection())->SetTypePin(typePin);
-  }
+  Lum_TdmLoadRules::ForEachUntaken(
+      typeBlock, GetOrbBlock(), taken, [&](Lum_TlmPin const *typePin, bool collides) {
+        if (collides)
+          throw Lum_ExceptionCorruptDatabase(
+              "Lum", kSourcePath, kRevision, __LINE__,
+              GetOrbBlock()->GetView()->GetParent()->GetName(),
+              Lum_TdmLoadRules::PatchUpMessage(GetName(), typePin->GetName(), typeBlock->GetName())
+                  .c_str(),
+              false);
+        CreatePin(typePin->GetName(), typePin->GetDirection())->SetTypePin(typePin);
+      });
   SortPinsByName();
 }
 
@@ -289,8 +265,8 @@ Lum_TdmBlock *Lum_TdmBlock::CreateTypedBlock(char const *name, Lum_TlmBlock cons
                                         "Null type block specified in CreateTypedBlock.", false);
   if (!IsOfViewLibrary(typeBlock))
     throw Lum_ExceptionCorruptDatabase("Lum", kSourcePath, kRevision, __LINE__,
-                                       typeBlock->GetName(),
-                                       "Could not locate the specified library.", false);
+                                       typeBlock->GetName(), Lum_TdmLoadRules::kLibraryNotFound,
+                                       false);
 
   Lum_TdmBlock *child = CreateBlock(name, 0);
   if (pins) {
@@ -356,8 +332,8 @@ void Lum_TdmBlock::VerifyTypeBlock(Lum_TlmBlock const *typeBlock) const {
   assert(typeBlock && "VerifyTypeBlock needs a type block");
   if (!IsOfViewLibrary(typeBlock))
     throw Lum_ExceptionCorruptDatabase("Lum", kSourcePath, kRevision, __LINE__,
-                                       typeBlock->GetName(),
-                                       "Could not locate the specified library.", false);
+                                       typeBlock->GetName(), Lum_TdmLoadRules::kLibraryNotFound,
+                                       false);
   Orb_Block const *typeHost = typeBlock->GetOrbBlock();
   for (Orb_Pin const *pin : GetOrbBlock()->GetPins())
     if (pin->GetSignal() && !typeHost->GetPinByName(pin->GetName()))
@@ -428,8 +404,8 @@ void Lum_TdmBlock::SetTypeBlock(Lum_TlmBlock const *typeBlock, Lum_TdmTypePinMap
     VerifyTypeBlock(typeBlock);
   } catch (Port::Exception const &) {
     throw Lum_ExceptionCorruptDatabase("Lum", kSourcePath, kRevision, __LINE__,
-                                       typeBlock->GetName(),
-                                       "Could not locate the specified library.", false);
+                                       typeBlock->GetName(), Lum_TdmLoadRules::kLibraryNotFound,
+                                       false);
   }
   if (pinMap.GetNumPins() > GetNumPins())
     throw Lum_ExceptionCorruptDatabase("Lum", kSourcePath, kRevision, __LINE__,

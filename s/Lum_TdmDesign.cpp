@@ -1,6 +1,7 @@
 #include "Lum_TdmDesign.h"
 
 #include "Lum_TdmDbg.h"
+#include "Lum_TdmLoadRules.h"
 #include "Lum_TdmModel.h"
 
 #include "Lum_Exception.h"
@@ -37,7 +38,7 @@ Lum_TdmDesign::Lum_TdmDesign(Lum_TdmModel *model, Orb_Design *design, bool isNew
     CommitToOrb();
   } else if (!IsUserMark(GetPropertyByName(kDesignType))) {
     throw Lum_ExceptionDesignLoad("Lum", kSourcePath, kRevision, __LINE__, GetName(),
-                                  "Attempt to specialize non-Tdm design.", false);
+                                  Lum_TdmLoadRules::kForeignDesign, false);
   }
 }
 

@@ -5,6 +5,7 @@
 #include "Lum_TdmCommit.h"
 #include "Lum_TdmDbg.h"
 #include "Lum_TdmDesign.h"
+#include "Lum_TdmLoadRules.h"
 #include "Lum_TdmModel.h"
 #include "Lum_TdmNetwork.h"
 #include "Lum_TdmPin.h"
@@ -36,18 +37,6 @@ using Lum_TdmSchema::kFormatRevision;
 using Lum_TdmSchema::kFormatVersion;
 using Lum_TdmSchema::kTypeLibraries;
 using Lum_TdmSchema::kVersion;
-
-// The entries of TDS_VIEW_TYPE_LIBS: a string list, or a lone string taken
-// as one entry.
-std::vector<std::string> LibraryEntries(Orb_Property const *property) {
-  if (!property)
-    return {};
-  if (property->GetKind() == Orb_Property::STRING_LIST)
-    return property->GetStrings();
-  if (property->GetKind() == Orb_Property::STRING)
-    return {std::string(property->GetValue())};
-  return {};
-}
 
 } // namespace
 
@@ -90,38 +79,24 @@ char const *Lum_TdmView::GetDesignMgrName() const {
 }
 
 void Lum_TdmView::CheckTdmVersion() {
-  m_Version = 0;
-  m_Revision = 0;
-  Orb_Property const *stamp = GetPropertyByName(kVersion);
-  if (!stamp)
-    return;
-  // Fields the parse does not reach stay 0; negative numbers wrap to their
-  // unsigned 32-bit value.
-  int version = 0;
-  int revision = 0;
-  Port::sscanf(stamp->GetStringValue(), "%d.%d", &version, &revision);
-  m_Version = static_cast<std::uint32_t>(version);
-  m_Revision = static_cast<std::uint32_t>(revision);
-
-  bool const tooOld = m_Version == 0 && m_Revision <= 2;
-  bool const tooNew =
-      m_Version > kFormatVersion || (m_Version == kFormatVersion && m_Revision > kFormatRevision);
-  if (tooOld) {
+  Lum_TdmLoadRules::Stamp const stamp =
+      Lum_TdmLoadRules::ReadStamp(GetPropertyByName(kVersion), m_Version, m_Revision);
+  if (stamp == Lum_TdmLoadRules::Stamp::TooOld) {
     Port_MsgManData::createObject("Lum", kSourcePath, __LINE__, kRevision)
         .issueError("Tdm version is %d and the revision is %d. This is an old design that is no "
                     "longer supported by the software.  Please convert your design.\n",
                     static_cast<int>(m_Version), static_cast<int>(m_Revision));
     throw Lum_ExceptionCorruptDatabase("Lum", kSourcePath, kRevision, __LINE__, GetDesignMgrName(),
-                                       "Old design that requires conversion.", false);
+                                       Lum_TdmLoadRules::kOldStamp, false);
   }
-  if (tooNew) {
+  if (stamp == Lum_TdmLoadRules::Stamp::TooNew) {
     Port_MsgManData::createObject("Lum", kSourcePath, __LINE__, kRevision)
         .issueError("Tdm version is %d and the revision is %d.\nThis design was created by "
                     "software with a newer version than this software.\nPlease use this design "
                     "with the newer software.\n",
                     static_cast<int>(m_Version), static_cast<int>(m_Revision));
     throw Lum_ExceptionCorruptDatabase("Lum", kSourcePath, kRevision, __LINE__, GetDesignMgrName(),
-                                       "New design that requires newer software.", false);
+                                       Lum_TdmLoadRules::kNewStamp, false);
   }
 }
 
@@ -173,16 +148,11 @@ bool Lum_TdmView::IsLocalLibrary(Lum_TlmLibrary const *library) {
 }
 
 void Lum_TdmView::GetDevicePic(PM_PIC &personality) const {
-  Orb_Property const *pm = GetPropertyByName(kDevicePm);
-  Orb_Property const *part = GetPropertyByName(kDevicePart);
-  if (!pm || !part) {
-    std::string const message =
-        std::string("The view has no ") + (pm ? kDevicePart : kDevicePm) +
-        " property: the device personality is needed to load its type libraries.";
+  if (char const *missing = Lum_TdmLoadRules::MissingDevice(GetOrbView()))
     throw Lum_ExceptionInvalidLibrary("Lum", kSourcePath, kRevision, __LINE__, GetName(),
-                                      message.c_str(), false);
-  }
-  personality = PM_PIC(pm->GetStringValue(), part->GetStringValue(), nullptr);
+                                      Lum_TdmLoadRules::NoDeviceMessage(missing).c_str(), false);
+  personality = PM_PIC(GetPropertyByName(kDevicePm)->GetStringValue(),
+                       GetPropertyByName(kDevicePart)->GetStringValue(), nullptr);
 }
 
 void Lum_TdmView::AppendLibrary(Lum_TlmLibrary const *library) const {
@@ -215,18 +185,15 @@ void Lum_TdmView::BuildLibraryList() const {
   // The personality is built only when a library has to be loaded.
   PM_PIC personality("", "", nullptr);
   bool havePersonality = false;
-  for (std::string const &text : LibraryEntries(GetPropertyByName(kTypeLibraries))) {
-    // The name is the first field; leading blanks are skipped.
-    Port::StringBase<char> const entry(text);
-    std::size_t begin = 0;
-    std::size_t end = 0;
-    if (!entry.NextTokenRange(0, " ", begin, end)) {
+  for (std::string const &text :
+       Lum_TdmLoadRules::LibraryEntries(GetPropertyByName(kTypeLibraries))) {
+    std::string name;
+    if (!Lum_TdmLoadRules::LibraryName(text, name)) {
       Port_MsgManData::debugStub("Warning:  view <%s> lists a type library without a name; the "
                                  "entry is ignored.\n",
                                  GetName());
       continue;
     }
-    std::string const name = text.substr(begin, end - begin);
     if (name == Lum_TlmLibrary::LOCAL_LIBRARY_NAME) {
       AddLocalLibrary();
       continue;
