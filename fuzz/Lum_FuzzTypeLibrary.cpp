@@ -54,7 +54,8 @@ extern "C" int LLVMFuzzerTestOneInput(std::uint8_t const *data, std::size_t size
     if (!LumFuzz::Attempt("open", [&] { model.Open(design.c_str()); }))
       LumFuzz::CheckEmptyAfterRefusal(model);
     else
-      LumFuzz::CommitSaveReopen(model, LumFuzz::TheScratch().File("saved.odb"));
+      LumFuzz::CommitSaveReopen(model, LumFuzz::TheScratch().File("saved.odb"),
+                                LumFuzz::Reopen::UnlessPinsWereHeldBack);
   }
   LumFuzz::Check(!Lum_TlmCatalog::IsLoaded("FZ"), "the library FZ stays loaded");
   return 0;

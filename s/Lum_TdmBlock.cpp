@@ -425,6 +425,17 @@ void Lum_TdmBlock::SetTypeBlock(Lum_TlmBlock const *typeBlock, Lum_TdmTypePinMap
                                          "Invalid type pin specified in type pin map.", false);
     mapped.emplace_back(pin, typePin);
   }
+  // The commit stores the map; the next open must not find a type pin that
+  // no pin took but whose name a pin holds. The view's
+  // LUM_DONT_CREATE_UNUSED_PINS does not count: the commit removes it.
+  std::size_t next = 0; // the host pins come in the order `mapped` has them
+  Lum_TdmLoadRules::Refusal const refusal = Lum_TdmLoadRules::Predict(
+      GetOrbBlock(), typeBlock, Lum_TdmLoadRules::CreatesMissing(typeBlock, GetOrbBlock(), false),
+      [&](Orb_Pin *) { return mapped[next++].second; });
+  if (refusal.collision)
+    throw Lum_ExceptionCorruptDatabase("Lum", kSourcePath, kRevision, __LINE__,
+                                       refusal.collision->GetName(),
+                                       CollisionMessage(refusal.collision).c_str(), false);
   for (auto const &[pin, typePin] : mapped)
     pin->SetTypePin(typePin);
   m_pTypeBlock = typeBlock;
@@ -614,7 +625,84 @@ void Lum_TdmBlock::CommitTypeProperties() {
 
 void Lum_TdmBlock::CommitToOrb() { CommitTypeProperties(); }
 
+std::string Lum_TdmBlock::CollisionMessage(Lum_TlmPin const *typePin) const {
+  std::string const pin = typePin->GetName();
+  return "Pin <" + pin + "> of block <" + GetName() + "> holds the name of type pin <" + pin +
+         "> of type block <" + m_pTypeBlock->GetName() +
+         ">, which no pin is bound to: the next open would have to create that type pin and "
+         "could not. Bind a pin to <" +
+         pin + ">, rename pin <" + pin + ">, or give the block every pin of its type block.";
+}
+
+void Lum_TdmBlock::VerifyCommit(bool viewForbidsCreating) const {
+  if (!m_pTypeBlock)
+    return;
+  // What the commit stores: each pin's type pin by name (through the pin
+  // map when the names differ), nothing for a pin without one, which the
+  // open then looks up by its own name.
+  Orb_Context *context = GetContext();
+  Orb_BridgeHandle const bridge = context->GetBridgeHandle(Orb_Kind::Pin);
+  Lum_TdmLoadRules::Refusal const refusal = Lum_TdmLoadRules::Predict(
+      GetOrbBlock(), m_pTypeBlock,
+      Lum_TdmLoadRules::CreatesMissing(m_pTypeBlock, GetOrbBlock(), viewForbidsCreating),
+      [&](Orb_Pin *pin) {
+        Lum_TlmPin const *typePin =
+            Lum_TdmClient::Of<Lum_TdmPin>(context, bridge, pin)->GetTypePin();
+        return m_pTypeBlock->GetPinByName(typePin ? typePin->GetName() : pin->GetName());
+      });
+  if (refusal.unmatched) {
+    std::string const pin = refusal.unmatched->GetName();
+    std::string const message =
+        "Pin <" + pin + "> of block <" + GetName() +
+        "> is connected but has no type pin of type block <" + m_pTypeBlock->GetName() +
+        ">: the next open would refuse it. Bind it to a type pin (SetTypeBlock with a pin map), "
+        "rename it after a type pin, or leave it unconnected.";
+    throw Lum_ExceptionInvalidTypeBlock("Lum", kSourcePath, kRevision, __LINE__, pin.c_str(),
+                                        message.c_str(), false);
+  }
+  if (refusal.collision)
+    throw Lum_ExceptionInvalidTypeBlock("Lum", kSourcePath, kRevision, __LINE__,
+                                        refusal.collision->GetName(),
+                                        CollisionMessage(refusal.collision).c_str(), false);
+}
+
+void Lum_TdmBlock::VerifyCommitTree() const {
+  bool const forbidden = Lum_TdmLoadRules::ForbidsCreating(GetOrbBlock()->GetView());
+  Orb_Context *context = GetContext();
+  Orb_BridgeHandle const bridge = context->GetBridgeHandle(Orb_Kind::Block);
+  VerifyCommit(forbidden);
+  // A stack of its own, as a hierarchy may be deep.
+  std::vector<Orb_Block *> stack{GetOrbBlock()};
+  while (!stack.empty()) {
+    Orb_Block *block = stack.back();
+    stack.pop_back();
+    for (Orb_Block *child : block->GetBlocks()) {
+      Lum_TdmClient::Of<Lum_TdmBlock>(context, bridge, child)->VerifyCommit(forbidden);
+      stack.push_back(child);
+    }
+  }
+}
+
 void Lum_TdmBlock::TraverseAndCommitToOrb() {
+  // A commit of this subtree alone checks it first; within a view's commit
+  // the view has checked every block.
+  Lum_TdmView const *view = GetView();
+  bool const outermost = !view->m_CommitVerified;
+  if (outermost)
+    VerifyCommitTree();
+  view->m_CommitVerified = true;
+  try {
+    CommitSubtree();
+  } catch (...) {
+    if (outermost)
+      view->m_CommitVerified = false;
+    throw;
+  }
+  if (outermost)
+    view->m_CommitVerified = false;
+}
+
+void Lum_TdmBlock::CommitSubtree() {
   CommitToOrb();
   Orb_Block const *host = GetOrbBlock();
   Lum_TdmCommitEach<Lum_TdmPin>(GetContext(), Orb_Kind::Pin, host->GetPins());

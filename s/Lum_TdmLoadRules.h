@@ -112,7 +112,7 @@ public:
   // for its own name): the first pin it would refuse, or the first type pin
   // it could not create. `createMissing` as CreatesMissing says.
   struct Refusal {
-    Orb_Pin const *unmatched = nullptr;
+    Orb_Pin *unmatched = nullptr;
     Lum_TlmPin const *collision = nullptr;
     explicit operator bool() const { return unmatched || collision; }
   };
@@ -121,7 +121,7 @@ public:
                          TypePinOf const &typePinOf) {
     Refusal refusal;
     std::vector<Lum_TlmPin const *> taken;
-    for (Orb_Pin const *pin : block->GetPins()) {
+    for (Orb_Pin *pin : block->GetPins()) {
       Lum_TlmPin const *typePin = typePinOf(pin);
       if (IsUnmatched(pin, typePin)) {
         refusal.unmatched = pin;

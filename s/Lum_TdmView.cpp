@@ -284,10 +284,21 @@ void Lum_TdmView::CommitToOrb() {
 void Lum_TdmView::CommitAll() { TraverseAndCommitToOrb(); }
 
 void Lum_TdmView::TraverseAndCommitToOrb() {
-  CommitToOrb();
-  Lum_TdmCommitEach<Lum_TdmNetwork>(GetContext(), Orb_Kind::Network, GetOrbView()->GetNetworks());
-  if (Lum_TdmBlock *top = GetBlock())
-    top->TraverseAndCommitToOrb();
+  // Nothing is written unless the next open takes every block as stored.
+  Lum_TdmBlock *top = GetBlock();
+  if (top)
+    top->VerifyCommitTree();
+  m_CommitVerified = true;
+  try {
+    CommitToOrb();
+    Lum_TdmCommitEach<Lum_TdmNetwork>(GetContext(), Orb_Kind::Network, GetOrbView()->GetNetworks());
+    if (top)
+      top->TraverseAndCommitToOrb();
+  } catch (...) {
+    m_CommitVerified = false;
+    throw;
+  }
+  m_CommitVerified = false;
   if (Lum_TdmDesign::IsUserDesign(*GetOrbView()->GetParent()))
     GetParent()->TraverseAndCommitToOrb();
 }
