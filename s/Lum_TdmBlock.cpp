@@ -433,9 +433,9 @@ void Lum_TdmBlock::SetTypeBlock(Lum_TlmBlock const *typeBlock, Lum_TdmTypePinMap
       GetOrbBlock(), typeBlock, Lum_TdmLoadRules::CreatesMissing(typeBlock, GetOrbBlock(), false),
       [&](Orb_Pin *) { return mapped[next++].second; });
   if (refusal.collision)
-    throw Lum_ExceptionCorruptDatabase("Lum", kSourcePath, kRevision, __LINE__,
-                                       refusal.collision->GetName(),
-                                       CollisionMessage(refusal.collision).c_str(), false);
+    throw Lum_ExceptionCorruptDatabase(
+        "Lum", kSourcePath, kRevision, __LINE__, refusal.collision->GetName(),
+        CollisionMessage(refusal.collision, typeBlock).c_str(), false);
   for (auto const &[pin, typePin] : mapped)
     pin->SetTypePin(typePin);
   m_pTypeBlock = typeBlock;
@@ -625,10 +625,11 @@ void Lum_TdmBlock::CommitTypeProperties() {
 
 void Lum_TdmBlock::CommitToOrb() { CommitTypeProperties(); }
 
-std::string Lum_TdmBlock::CollisionMessage(Lum_TlmPin const *typePin) const {
+std::string Lum_TdmBlock::CollisionMessage(Lum_TlmPin const *typePin,
+                                           Lum_TlmBlock const *typeBlock) const {
   std::string const pin = typePin->GetName();
   return "Pin <" + pin + "> of block <" + GetName() + "> holds the name of type pin <" + pin +
-         "> of type block <" + m_pTypeBlock->GetName() +
+         "> of type block <" + typeBlock->GetName() +
          ">, which no pin is bound to: the next open would have to create that type pin and "
          "could not. Bind a pin to <" +
          pin + ">, rename pin <" + pin + ">, or give the block every pin of its type block.";
@@ -661,9 +662,9 @@ void Lum_TdmBlock::VerifyCommit(bool viewForbidsCreating) const {
                                         message.c_str(), false);
   }
   if (refusal.collision)
-    throw Lum_ExceptionInvalidTypeBlock("Lum", kSourcePath, kRevision, __LINE__,
-                                        refusal.collision->GetName(),
-                                        CollisionMessage(refusal.collision).c_str(), false);
+    throw Lum_ExceptionInvalidTypeBlock(
+        "Lum", kSourcePath, kRevision, __LINE__, refusal.collision->GetName(),
+        CollisionMessage(refusal.collision, m_pTypeBlock).c_str(), false);
 }
 
 void Lum_TdmBlock::VerifyCommitTree() const {

@@ -11,6 +11,7 @@
 #include <gtest/gtest.h>
 
 #include <cstring>
+#include <functional>
 #include <map>
 #include <optional>
 #include <regex>
@@ -572,6 +573,93 @@ TEST_F(TdmRebindTest, RebindingSurvivesReopen) {
   EXPECT_EQ(State(top->GetBlockByName("empty")), "EMPTY");
   EXPECT_EQ(State(top->GetBlockByName("u")), "- A=- B=- Y=-");
   EXPECT_EQ(PropertyValue(top->GetBlockByName("u"), Lum_TdmSchema::kBlockType), "<absent>");
+}
+
+// What would make the next open refuse a saved design is refused before anything changes: a
+// rebind through a map (at the call), a pin connected or deleted after the binding (at the
+// commit, of the view or of the block alone, which then writes nothing: not even the rebinding
+// of the sibling it reaches first). Once mended, the design commits and reopens.
+TEST_F(TdmRebindTest, NothingSavedIsRefusedByTheNextOpen) {
+  Lum_TlmBlock *ab = m_Library.AddTypeBlock("AB", {"A", "B"});
+  Lum_TlmBlock *abc = m_Library.AddTypeBlock("ABC3", {"A", "B", "C"});
+  auto const to = [abc](char const *name) { return abc->GetPinByName(name); };
+  auto const and2 = [this](char const *name) { return m_pAnd2->GetPinByName(name); };
+  auto const collision = [](char const *kind, char const *type) {
+    return std::string(kind) +
+           "|A|Pin <A> of block <c> holds the name of type pin <A> of type block <" + type +
+           ">, which no pin is bound to: the next open would have to create that type pin and "
+           "could not. Bind a pin to <A>, rename pin <A>, or give the block every pin of its type "
+           "block.";
+  };
+  std::string const unmatched =
+      "InvalidTypeBlock|X|Pin <X> of block <c> is connected but has no type pin of type block "
+      "<AND>: the next open would refuse it. Bind it to a type pin (SetTypeBlock with a pin map), "
+      "rename it after a type pin, or leave it unconnected.";
+  auto const connectX = [this](Lum_TdmBlock *c) {
+    c->CreatePin("X", Orb_Pin::PIN_INPUT)->GetOrbPin()->Connect(m_pWire);
+  };
+  auto const deleteX = [](Lum_TdmBlock *c) { c->DeletePin(c->GetPinByName("X")->GetOrbPin()); };
+  auto const commitView = [this](Lum_TdmBlock *) { m_Design.m_pView->CommitAll(); };
+  struct Case {
+    char const *what;
+    std::function<void(Lum_TdmBlock *)> prepare, refused, mend;
+    std::string failure;
+  } const cases[] = {
+      {"rebind A>B, B>C leaves A untaken",
+       [&](Lum_TdmBlock *c) {
+         c->SetTypeBlock(nullptr);
+         c->DeletePin(c->GetPinByName("Y")->GetOrbPin());
+         c->SetTypeBlock(ab);
+       },
+       [&](Lum_TdmBlock *c) {
+         c->SetTypeBlock(abc, Map({{"A", to("B")}, {"B", to("C")}}));
+       },
+       [&](Lum_TdmBlock *c) {
+         c->SetTypeBlock(abc, Map({{"A", to("A")}, {"B", to("B")}}));
+       },
+       collision("CorruptDatabase", "ABC3")},
+      {"pin added and connected after binding", connectX, commitView, deleteX, unmatched},
+      {"the same, committing the block alone", connectX,
+       [this](Lum_TdmBlock *) { m_pTop->TraverseAndCommitToOrb(); }, deleteX, unmatched},
+      {"pin deleted after a rebind A>B, B>Y, Y>A",
+       [&](Lum_TdmBlock *c) {
+         c->CreatePin("Z", Orb_Pin::PIN_INPUT);
+         c->SetTypeBlock(
+             m_pAnd2,
+             Map({{"A", and2("B")}, {"B", and2("Y")}, {"Y", and2("A")}, {"Z", and2("Z")}}));
+         m_Design.m_pView->CommitAll();
+         c->DeletePin(c->GetPinByName("Y")->GetOrbPin());
+       },
+       commitView,
+       [&](Lum_TdmBlock *c) {
+         c->CreatePin("Y", Orb_Pin::PIN_INPUT);
+         c->SetTypeBlock(nullptr);
+         c->SetTypeBlock(
+             m_pAnd2,
+             Map({{"A", and2("B")}, {"B", and2("Y")}, {"Y", and2("A")}, {"Z", and2("Z")}}));
+       },
+       collision("InvalidTypeBlock", "AND2")},
+  };
+  for (Case const &test : cases) {
+    SCOPED_TRACE(test.what);
+    Lum_TdmBlock *d = AndChild("d");
+    Lum_TdmBlock *c = AndChild("c");
+    m_Design.m_pView->CommitAll();
+    test.prepare(c);
+    d->SetTypeBlock(m_pAnd2);
+    std::string const state = State(c);
+    EXPECT_EQ(Failure([&] { test.refused(c); }), test.failure);
+    EXPECT_EQ(State(c), state);
+    EXPECT_EQ(PropertyValue(d, Lum_TdmSchema::kBlockType), "LIBC:AND");
+    test.mend(c);
+    m_Design.m_pView->CommitAll();
+    auto reopened = SaveAndReopen(Model(), m_Dir.File("mended.odb"));
+    Lum_TdmBlock *top = FirstView(*reopened)->GetBlock();
+    EXPECT_EQ(State(top->GetBlockByName("d")), "AND2 A=AND2.A B=AND2.B Y=AND2.Y Z=AND2.Z");
+    EXPECT_STREQ(top->GetBlockByName("c")->GetTypeBlock()->GetName(), c->GetTypeBlock()->GetName());
+    m_pTop->DeleteBlock(d->GetOrbBlock());
+    m_pTop->DeleteBlock(c->GetOrbBlock());
+  }
 }
 
 // Children and pins by type and by identifier; the block's own type, resolved per context.
