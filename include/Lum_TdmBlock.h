@@ -201,9 +201,6 @@ private:
   void VerifyCommit(bool viewForbidsCreating) const;
   // VerifyCommit over this block and every block under it.
   void VerifyCommitTree() const;
-  // The message of a collision of this block's pins with a type pin of
-  // `typeBlock`.
-  std::string CollisionMessage(Lum_TlmPin const *typePin, Lum_TlmBlock const *typeBlock) const;
   // Commits the block and its subtree, as TraverseAndCommitToOrb without the
   // check.
   void CommitSubtree();

@@ -132,6 +132,36 @@ private:
   Lum_TdmModel *m_pModel;
 };
 
+// The type block that the next open binds a block bound to `typeBlock` to.
+Lum_TlmBlock const *ReopenedTypeBlock(Lum_TlmBlock const *typeBlock) {
+  // The stored tag holds the block's name: a hierarchy block of a type
+  // block, which is named like it, comes back as the type block.
+  Lum_TlmBlock const *named =
+      typeBlock->GetLibrary()->GetTypeBlock(Port::StringBase<char>(typeBlock->GetName()));
+  return named ? named : typeBlock;
+}
+
+char const *RefusedPin(Lum_TdmLoadRules::Refusal const &refusal) {
+  return refusal.unmatched ? refusal.unmatched->GetName() : refusal.collision->GetName();
+}
+
+std::string RefusalMessage(Lum_TdmLoadRules::Refusal const &refusal, char const *block,
+                           Lum_TlmBlock const *typeBlock) {
+  if (refusal.unmatched) {
+    std::string const pin = refusal.unmatched->GetName();
+    return "Pin <" + pin + "> of block <" + block +
+           "> is connected but has no type pin of type block <" + typeBlock->GetName() +
+           ">: the next open would refuse it. Bind it to a type pin (SetTypeBlock with a pin "
+           "map), rename it after a type pin, or leave it unconnected.";
+  }
+  std::string const pin = refusal.collision->GetName();
+  return "Pin <" + pin + "> of block <" + block + "> holds the name of type pin <" + pin +
+         "> of type block <" + typeBlock->GetName() +
+         ">, which no pin is bound to: the next open would have to create that type pin and "
+         "could not. Bind a pin to <" +
+         pin + ">, rename pin <" + pin + ">, or give the block every pin of its type block.";
+}
+
 } // namespace
 
 // The block adds one pointer to its host base; whatever else a binding needs
@@ -425,17 +455,16 @@ void Lum_TdmBlock::SetTypeBlock(Lum_TlmBlock const *typeBlock, Lum_TdmTypePinMap
                                          "Invalid type pin specified in type pin map.", false);
     mapped.emplace_back(pin, typePin);
   }
-  // The commit stores the map; the next open must not find a type pin that
-  // no pin took but whose name a pin holds. The view's
-  // LUM_DONT_CREATE_UNUSED_PINS does not count: the commit removes it.
+  // The commit stores the map: the next open must take it. The view's
+  // LUM_DONT_CREATE_UNUSED_PINS does not count, as the commit removes it.
   std::size_t next = 0; // the host pins come in the order `mapped` has them
+  Lum_TlmBlock const *reopened = ReopenedTypeBlock(typeBlock);
   Lum_TdmLoadRules::Refusal const refusal = Lum_TdmLoadRules::Predict(
-      GetOrbBlock(), typeBlock, Lum_TdmLoadRules::CreatesMissing(typeBlock, GetOrbBlock(), false),
-      [&](Orb_Pin *) { return mapped[next++].second; });
-  if (refusal.collision)
-    throw Lum_ExceptionCorruptDatabase(
-        "Lum", kSourcePath, kRevision, __LINE__, refusal.collision->GetName(),
-        CollisionMessage(refusal.collision, typeBlock).c_str(), false);
+      GetOrbBlock(), reopened, Lum_TdmLoadRules::CreatesMissing(reopened, GetOrbBlock(), false),
+      [&](Orb_Pin *) { return reopened->GetPinByName(mapped[next++].second->GetName()); });
+  if (refusal)
+    throw Lum_ExceptionCorruptDatabase("Lum", kSourcePath, kRevision, __LINE__, RefusedPin(refusal),
+                                       RefusalMessage(refusal, GetName(), reopened).c_str(), false);
   for (auto const &[pin, typePin] : mapped)
     pin->SetTypePin(typePin);
   m_pTypeBlock = typeBlock;
@@ -625,16 +654,6 @@ void Lum_TdmBlock::CommitTypeProperties() {
 
 void Lum_TdmBlock::CommitToOrb() { CommitTypeProperties(); }
 
-std::string Lum_TdmBlock::CollisionMessage(Lum_TlmPin const *typePin,
-                                           Lum_TlmBlock const *typeBlock) const {
-  std::string const pin = typePin->GetName();
-  return "Pin <" + pin + "> of block <" + GetName() + "> holds the name of type pin <" + pin +
-         "> of type block <" + typeBlock->GetName() +
-         ">, which no pin is bound to: the next open would have to create that type pin and "
-         "could not. Bind a pin to <" +
-         pin + ">, rename pin <" + pin + ">, or give the block every pin of its type block.";
-}
-
 void Lum_TdmBlock::VerifyCommit(bool viewForbidsCreating) const {
   if (!m_pTypeBlock)
     return;
@@ -643,28 +662,19 @@ void Lum_TdmBlock::VerifyCommit(bool viewForbidsCreating) const {
   // open then looks up by its own name.
   Orb_Context *context = GetContext();
   Orb_BridgeHandle const bridge = context->GetBridgeHandle(Orb_Kind::Pin);
+  Lum_TlmBlock const *reopened = ReopenedTypeBlock(m_pTypeBlock);
   Lum_TdmLoadRules::Refusal const refusal = Lum_TdmLoadRules::Predict(
-      GetOrbBlock(), m_pTypeBlock,
-      Lum_TdmLoadRules::CreatesMissing(m_pTypeBlock, GetOrbBlock(), viewForbidsCreating),
+      GetOrbBlock(), reopened,
+      Lum_TdmLoadRules::CreatesMissing(reopened, GetOrbBlock(), viewForbidsCreating),
       [&](Orb_Pin *pin) {
         Lum_TlmPin const *typePin =
             Lum_TdmClient::Of<Lum_TdmPin>(context, bridge, pin)->GetTypePin();
-        return m_pTypeBlock->GetPinByName(typePin ? typePin->GetName() : pin->GetName());
+        return reopened->GetPinByName(typePin ? typePin->GetName() : pin->GetName());
       });
-  if (refusal.unmatched) {
-    std::string const pin = refusal.unmatched->GetName();
-    std::string const message =
-        "Pin <" + pin + "> of block <" + GetName() +
-        "> is connected but has no type pin of type block <" + m_pTypeBlock->GetName() +
-        ">: the next open would refuse it. Bind it to a type pin (SetTypeBlock with a pin map), "
-        "rename it after a type pin, or leave it unconnected.";
-    throw Lum_ExceptionInvalidTypeBlock("Lum", kSourcePath, kRevision, __LINE__, pin.c_str(),
-                                        message.c_str(), false);
-  }
-  if (refusal.collision)
+  if (refusal)
     throw Lum_ExceptionInvalidTypeBlock(
-        "Lum", kSourcePath, kRevision, __LINE__, refusal.collision->GetName(),
-        CollisionMessage(refusal.collision, m_pTypeBlock).c_str(), false);
+        "Lum", kSourcePath, kRevision, __LINE__, RefusedPin(refusal),
+        RefusalMessage(refusal, GetName(), reopened).c_str(), false);
 }
 
 void Lum_TdmBlock::VerifyCommitTree() const {
