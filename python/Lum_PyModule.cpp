@@ -12,6 +12,7 @@
 #include "Lum_TdmPin.h"
 #include "Lum_TdmSignal.h"
 #include "Lum_TdmTypePinMap.h"
+#include "Lum_TdmVerifier.h"
 #include "Lum_TdmView.h"
 
 #include "Lum_Exception.h"
@@ -20,6 +21,7 @@
 #include "Lum_TlmTypeID.h"
 #include "Orb_Debug.h"
 #include "Orb_Exception.h"
+#include "Port_MsgManData.h"
 #include "Port_Stream.h"
 
 #include <pybind11/pybind11.h>
@@ -544,8 +546,12 @@ bool ListContains(ListRef const &list, py::handle key) {
 // Walking every block of a view or of a subtree in pre-order
 
 struct BlockWalk {
+  // A block of the path down to the current one: its slot and deletion count
+  // tell whether it still exists, without a handle's name and reference.
   struct Frame {
-    Handle block;
+    Orb_Block *block;
+    std::uint32_t id;
+    std::uint32_t generation;
     std::size_t next;
   };
   DatabasePtr db;
@@ -563,18 +569,19 @@ py::object BlockWalkNext(BlockWalk &walk) {
     if (!walk.root)
       throw py::stop_iteration();
     walk.rootHandle.Check();
-    walk.stack.push_back({walk.rootHandle, 0});
+    walk.stack.push_back({walk.root, walk.rootHandle.id, walk.rootHandle.generation, 0});
     return py::cast(BlockRef(walk.rootHandle));
   }
   while (!walk.stack.empty()) {
     BlockWalk::Frame &frame = walk.stack.back();
     // A block deleted during the walk ends it with StaleObjectError.
-    auto *block = static_cast<Orb_Block *>(frame.block.Check());
-    auto const children = block->GetBlocks();
+    if (walk.db->Generation(Orb_Kind::Block, frame.id) != frame.generation)
+      throw StaleError("the block walk is stale: a block it was in was deleted");
+    auto const children = frame.block->GetBlocks();
     if (frame.next < children.size()) {
       Orb_Block *child = children[frame.next++];
       BlockRef ref(walk.db, child);
-      walk.stack.push_back({ref, 0});
+      walk.stack.push_back({child, ref.id, ref.generation, 0});
       return py::cast(std::move(ref));
     }
     walk.stack.pop_back();
@@ -865,6 +872,60 @@ py::object CreateTypedBlock(BlockRef const &ref, Text const &name, TypeBlockRef 
     child = block->CreateTypedBlock(childName, typeBlock, graft, pins);
   }
   return Wrap(ref.db, child->GetOrbBlock());
+}
+
+// ---------------------------------------------------------------------------
+// Checking
+
+using Problem = Lum_TdmVerifier::Problem;
+
+char const *ProblemKindName(Lum_TdmVerifier::Kind kind) {
+  switch (kind) {
+  case Lum_TdmVerifier::Kind::ForeignMark:
+    return "foreign_mark";
+  case Lum_TdmVerifier::Kind::StampTooOld:
+    return "stamp_too_old";
+  case Lum_TdmVerifier::Kind::StampTooNew:
+    return "stamp_too_new";
+  case Lum_TdmVerifier::Kind::NoDevice:
+    return "no_device";
+  case Lum_TdmVerifier::Kind::LibraryUnloadable:
+    return "library_unloadable";
+  case Lum_TdmVerifier::Kind::LibraryNotListed:
+    return "library_not_listed";
+  case Lum_TdmVerifier::Kind::TypeBlockMissing:
+    return "type_block_missing";
+  case Lum_TdmVerifier::Kind::PinUnmatched:
+    return "pin_unmatched";
+  case Lum_TdmVerifier::Kind::PinCollision:
+    return "pin_collision";
+  case Lum_TdmVerifier::Kind::BlockOfUnloadableLibrary:
+    return "block_of_unloadable_library";
+  }
+  return "unknown";
+}
+
+std::vector<Problem> CheckFile(Text const &path, std::vector<std::string> const &libPath) {
+  AddSearchDirectories(libPath);
+  py::gil_scoped_release release;
+  return Lum_TdmVerifier::CheckFile(path.value);
+}
+
+std::vector<Problem> CheckDatabase(DatabasePtr const &db) {
+  Orb_Model *host = db->Model().GetOrbModel();
+  std::vector<Problem> problems;
+  py::gil_scoped_release release;
+  Port_MsgCapture const quiet;
+  Lum_TdmVerifier([&problems](Problem const &problem) {
+    problems.push_back(problem);
+  }).CheckModel(*host);
+  return problems;
+}
+
+std::vector<Problem> CheckView(ViewRef const &ref) {
+  Orb_View *view = ref.Get();
+  py::gil_scoped_release release;
+  return Lum_TdmVerifier::Check(view);
 }
 
 // ---------------------------------------------------------------------------
@@ -1430,6 +1491,55 @@ PYBIND11_MODULE(_lumtdm, m) {
              return "<lumtdm.TypePin '" + pin->GetParent()->GetUniqueTag().str() + "." +
                     pin->GetName() + "'>";
            }));
+
+  // ---- checking
+  py::class_<Problem>(m, "Problem",
+                      "A problem that makes opening a database fail, as the checking call finds "
+                      "it without binding anything.",
+                      py::is_final())
+      .def_property_readonly(
+          "kind", [](Problem const &p) { return std::string(ProblemKindName(p.kind)); },
+          "foreign_mark, stamp_too_old, stamp_too_new, no_device, library_unloadable, "
+          "library_not_listed, type_block_missing, pin_unmatched, pin_collision or "
+          "block_of_unloadable_library.")
+      .def_property_readonly(
+          "path", [](Problem const &p) { return ToPy(p.path); },
+          "The object: 'manager/design', the view, '<view>:top/child' for a block, "
+          "'<view>:top/child pin P' for a pin.")
+      .def_property_readonly(
+          "view", [](Problem const &p) { return ToPy(p.view); },
+          "The view's path ('' for a design's problem).")
+      .def_property_readonly(
+          "key", [](Problem const &p) { return ToPy(p.key); },
+          "What problems group by: the stored mark or stamp, the library name, or the "
+          "stored type 'library:type block'.")
+      .def_property_readonly(
+          "mapped_to", [](Problem const &p) { return ToPy(p.mappedTo); },
+          "For a pin, the type pin its stored pin map names, if any.")
+      .def_property_readonly(
+          "exception", [](Problem const &p) { return ToPy(p.exception); },
+          "The class of the exception the open would raise for it ('' if none).")
+      .def_property_readonly(
+          "object_name", [](Problem const &p) { return ToPy(p.objectName); },
+          "That exception's object name.")
+      .def_property_readonly(
+          "message", [](Problem const &p) { return ToPy(p.message); }, "That exception's message.")
+      .def("__repr__", [](Problem const &p) {
+        return "<lumtdm.Problem " + std::string(ProblemKindName(p.kind)) + " at " + p.path + ">";
+      });
+  m.def("check", Locked(+[](Text const &path, std::vector<std::string> const &libPath) {
+          return CheckFile(path, libPath);
+        }),
+        py::arg("path"), py::arg("lib_path") = std::vector<std::string>(),
+        "Reads a database file without binding it and returns every Problem that makes "
+        "opening it fail (an empty list when it opens). OrbError for a file that cannot be "
+        "read.");
+  py::class_<Database, DatabasePtr>(m.attr("Database"))
+      .def("check", Locked(+[](DatabasePtr const &d) { return CheckDatabase(d); }),
+           "Every Problem that would make opening this database, as it now stands, fail.");
+  py::class_<ViewRef, Handle>(m.attr("View"))
+      .def("check", Locked(+[](ViewRef const &r) { return CheckView(r); }),
+           "Every Problem that would make opening this view, as it now stands, fail.");
 
   // ---- module functions
   m.def("open", Locked(+[](Text const &path, std::vector<std::string> const &libPath) {

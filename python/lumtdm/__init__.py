@@ -19,7 +19,7 @@ The classes cannot be subclassed: the library's virtual hooks (type block
 initialisation, library loading, graft hooks) are not open to Python.
 
 Calls into the library are serialised; the long ones (open, save, commit,
-close, library loading, grafting, count_by_type) let other Python threads
+close, checks, library loading, grafting, count_by_type) let other Python threads
 run meanwhile.
 """
 
@@ -45,12 +45,14 @@ from ._lumtdm import (  # noqa: F401
     ObjectList,
     OrbError,
     Pin,
+    Problem,
     Signal,
     StaleObjectError,
     TypeBlock,
     TypeLibrary,
     TypePin,
     View,
+    check,
     create,
     format_version,
     library_search_path,

@@ -308,3 +308,19 @@ def test_running_out_of_memory_raises_memory_error():
     result = subprocess.run([sys.executable, "-c", script], capture_output=True, text=True,
                             timeout=300)
     assert result.returncode == 0 and result.stdout.startswith("ok"), result.stderr
+
+
+def test_check_lists_what_would_stop_an_open(demo_db, demo_dir):
+    assert lumtdm.check(demo_db.path, lib_path=[str(demo_dir)]) == []
+    assert demo_db.check() == [] and demo_db.lookup(VIEW).check() == []
+    foreign = demo_db.lookup("demo").create_design("foreign")
+    foreign.properties["TDS_DESIGN_TYPE"] = "SOMEONE_ELSE"
+    demo_db.lookup(VIEW + "/chip/u1").properties["TDS_BLOCK_TYPE"] = "GATES:NOPE"
+    found = sorted((p.kind, p.path, p.exception) for p in demo_db.check())
+    demo_db.save(commit=False)
+    assert sorted((p.kind, p.path, p.exception) for p in lumtdm.check(demo_db.path)) == found
+    assert found == [
+        ("foreign_mark", "demo/foreign", "Lum_ExceptionDesignLoad"),
+        ("type_block_missing", VIEW + ":chip/u1", "Lum_ExceptionCorruptDatabase")]
+    with pytest.raises(lumtdm.OrbError):
+        lumtdm.check(demo_db.path + ".missing")
