@@ -14,6 +14,7 @@
 #include "Lum_TdmSignal.h"
 #include "Lum_TdmView.h"
 
+#include "Lum_TdmSchema.h"
 #include "Lum_Tlm.h"
 
 #include <benchmark/benchmark.h>
@@ -42,9 +43,9 @@ void WriteDesign(std::int64_t blocks, Typing typing, std::string const &path) {
   bool const inert = typing == Typing::Inert;
   Lum_TdmModel model("bench", "bench", path.c_str());
   Lum_TdmView *view = model.CreateDesignMgr("dm")->CreateDesign("chip")->CreateView("netlist");
-  view->CreatePropertyString("TDS_DEVICE_PM", "pm");
-  view->CreatePropertyString("TDS_DEVICE_PART", "part");
-  view->CreatePropertyStringList("TDS_VIEW_TYPE_LIBS")->AppendString("BENCHT 1.0");
+  view->CreatePropertyString(Lum_TdmSchema::kDevicePm, "pm");
+  view->CreatePropertyString(Lum_TdmSchema::kDevicePart, "part");
+  view->CreatePropertyStringList(Lum_TdmSchema::kTypeLibraries)->AppendString("BENCHT 1.0");
   Lum_TdmBlock *top = view->CreateTopBlock("top");
   Orb_Signal *clock = top->CreateSignal("clk")->GetOrbSignal();
   for (std::int64_t i = 0; i < blocks; ++i) {
@@ -58,10 +59,10 @@ void WriteDesign(std::int64_t blocks, Typing typing, std::string const &path) {
     }
     if (typing == Typing::None)
       continue;
-    block->CreatePropertyString(inert ? "XDS_BLOCK_TYPE" : "TDS_BLOCK_TYPE",
+    block->CreatePropertyString(inert ? "XDS_BLOCK_TYPE" : Lum_TdmSchema::kBlockType,
                                 ("BENCHT:T" + std::to_string(i % kTypeBlocks)).c_str());
     Orb_Property *pinMap =
-        block->CreatePropertyList(inert ? "XDS_BLOCK_PIN_MAP" : "TDS_BLOCK_PIN_MAP");
+        block->CreatePropertyList(inert ? "XDS_BLOCK_PIN_MAP" : Lum_TdmSchema::kBlockPinMap);
     for (int p = kPinsPerBlock - 2; p < kPinsPerBlock; ++p)
       pinMap->CreatePropertyString(("X" + std::to_string(p)).c_str(),
                                    ("P" + std::to_string(p)).c_str());

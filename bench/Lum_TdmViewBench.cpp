@@ -8,6 +8,7 @@
 #include "Lum_TdmPin.h"
 #include "Lum_TdmView.h"
 
+#include "Lum_TdmSchema.h"
 #include "Lum_Tlm.h"
 
 #include <benchmark/benchmark.h>
@@ -30,9 +31,9 @@ std::string BenchPath() {
 void WriteDesign(std::int64_t blocks, std::string const &path) {
   Lum_TdmModel model("bench", "bench", path.c_str());
   Lum_TdmView *view = model.CreateDesignMgr("dm")->CreateDesign("chip")->CreateView("netlist");
-  view->CreatePropertyString("TDS_DEVICE_PM", "pm");
-  view->CreatePropertyString("TDS_DEVICE_PART", "part");
-  view->CreatePropertyStringList("TDS_VIEW_TYPE_LIBS")->AppendString("BENCHLIB");
+  view->CreatePropertyString(Lum_TdmSchema::kDevicePm, "pm");
+  view->CreatePropertyString(Lum_TdmSchema::kDevicePart, "part");
+  view->CreatePropertyStringList(Lum_TdmSchema::kTypeLibraries)->AppendString("BENCHLIB");
   Lum_TdmBlock *top = view->CreateTopBlock("top");
   for (std::int64_t i = 0; i < blocks; ++i) {
     Lum_TdmBlock *block = top->CreateBlock(("b" + std::to_string(i)).c_str(), 0);

@@ -19,6 +19,7 @@
 #include "Lum_TdmPin.h"
 #include "Lum_TdmView.h"
 
+#include "Lum_TdmSchema.h"
 #include "Lum_Tlm.h"
 #include "Orb_Templates.h"
 
@@ -71,9 +72,9 @@ inline Lum_TdmView *MakeView(Lum_TdmModel &model) {
   Lum_TdmView *view = model.CreateDesignMgr(Orb_HostWorkload::kDesignMgr)
                           ->CreateDesign(Orb_HostWorkload::kDesign)
                           ->CreateView(Orb_HostWorkload::kView);
-  view->CreatePropertyString("TDS_DEVICE_PM", "pm");
-  view->CreatePropertyString("TDS_DEVICE_PART", "part");
-  view->CreatePropertyStringList("TDS_VIEW_TYPE_LIBS")->AppendString("CELLS 1.0");
+  view->CreatePropertyString(Lum_TdmSchema::kDevicePm, "pm");
+  view->CreatePropertyString(Lum_TdmSchema::kDevicePart, "part");
+  view->CreatePropertyStringList(Lum_TdmSchema::kTypeLibraries)->AppendString("CELLS 1.0");
   return view;
 }
 

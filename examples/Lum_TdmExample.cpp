@@ -16,6 +16,7 @@
 #include "Lum_TdmSignal.h"
 #include "Lum_TdmView.h"
 
+#include "Lum_TdmSchema.h"
 #include "Lum_Tlm.h"
 
 #include <cstdio>
@@ -47,9 +48,9 @@ void WriteDesign(std::string const &path) {
   Lum_TdmDesignMgr *designMgr = model.CreateDesignMgr("work");
   Lum_TdmDesign *design = designMgr->CreateDesign("counter");
   Lum_TdmView *view = design->CreateView("netlist");
-  view->CreatePropertyString("TDS_DEVICE_PM", "generic");
-  view->CreatePropertyString("TDS_DEVICE_PART", "part0");
-  view->CreatePropertyStringList("TDS_VIEW_TYPE_LIBS")->AppendString("CELLS");
+  view->CreatePropertyString(Lum_TdmSchema::kDevicePm, "generic");
+  view->CreatePropertyString(Lum_TdmSchema::kDevicePart, "part0");
+  view->CreatePropertyStringList(Lum_TdmSchema::kTypeLibraries)->AppendString("CELLS");
 
   Lum_TdmBlock *top = view->CreateTopBlock("counter");
   Lum_TdmPin *clock = top->CreatePin("clk", Orb_Pin::PIN_INPUT);

@@ -3,11 +3,13 @@
 // pin maps, new pins, deletions, pin manifestation, commits, and saves with
 // a reopen. Every call succeeds or throws an allowed exception; a failed
 // rebinding leaves the block as it was; a refused creation creates nothing;
-// every save reopens with the same typing.
+// every commit that succeeds is saved, and every save reopens with the same
+// typing: nothing the library accepted may lead to a file its open refuses.
 
 #include "Lum_FuzzSupport.h"
 
 #include "Lum_Exception.h"
+#include "Lum_TdmSchema.h"
 #include "Lum_TdmTypePinMap.h"
 
 #include <fuzzer/FuzzedDataProvider.h>
@@ -45,9 +47,9 @@ PM_PIC Personality() { return PM_PIC("pm1", "part1", nullptr); }
 std::unique_ptr<Lum_TdmModel> MakeDesign() {
   auto model = std::make_unique<Lum_TdmModel>("fuzz", "fuzzdb", "");
   Lum_TdmView *view = model->CreateDesignMgr("dm")->CreateDesign("top")->CreateView("netlist");
-  view->CreatePropertyString("TDS_DEVICE_PM", "pm1");
-  view->CreatePropertyString("TDS_DEVICE_PART", "part1");
-  Orb_Property *libraries = view->CreatePropertyStringList("TDS_VIEW_TYPE_LIBS");
+  view->CreatePropertyString(Lum_TdmSchema::kDevicePm, "pm1");
+  view->CreatePropertyString(Lum_TdmSchema::kDevicePart, "part1");
+  Orb_Property *libraries = view->CreatePropertyStringList(Lum_TdmSchema::kTypeLibraries);
   libraries->AppendString("LIBT 2.1");
   libraries->AppendString(Lum_TlmLibrary::LOCAL_LIBRARY_NAME);
   Lum_TlmBlock *loc =
@@ -89,7 +91,8 @@ public:
   void Run() {
     for (int step = 0; step < 32 && m_In.remaining_bytes() > 0; ++step)
       Step();
-    LumFuzz::CommitSaveReopen(*m_pModel, LumFuzz::TheScratch().File("final.odb"));
+    LumFuzz::CommitSaveReopen(*m_pModel, LumFuzz::TheScratch().File("final.odb"),
+                              LumFuzz::Reopen::Always);
   }
 
 private:
@@ -143,7 +146,7 @@ private:
     std::vector<Lum_TdmBlock *> blocks;
     CollectBlocks(ViewOf(*m_pModel)->GetBlock(), blocks);
     Lum_TdmBlock *block = blocks[m_In.ConsumeIntegralInRange<std::size_t>(0, blocks.size() - 1)];
-    switch (m_In.ConsumeIntegralInRange(0, 9)) {
+    switch (m_In.ConsumeIntegralInRange(0, 11)) {
     case 0:
     case 1: {
       if (blocks.size() > 24)
@@ -216,11 +219,32 @@ private:
       });
       return;
     case 8:
-      LumFuzz::Attempt("commit", [&] { ViewOf(*m_pModel)->CommitAll(); });
+      // The commit, saved and reopened beside: the session goes on with
+      // this model.
+      LumFuzz::CommitSaveReopen(*m_pModel, LumFuzz::TheScratch().File("commit.odb"),
+                                LumFuzz::Reopen::Always);
       return;
+    case 9: {
+      // A pin removed after the binding.
+      auto const pins = block->GetPins();
+      if (!pins.empty())
+        block->DeletePin(pins[m_In.ConsumeIntegralInRange<std::size_t>(0, pins.size() - 1)]);
+      return;
+    }
+    case 10: {
+      // An existing pin connected after the binding.
+      auto const pins = block->GetPins();
+      Lum_TdmBlock *parent = block->GetParent();
+      if (pins.empty() || !parent || parent->GetSignals().empty())
+        return;
+      Orb_Pin *pin = pins[m_In.ConsumeIntegralInRange<std::size_t>(0, pins.size() - 1)];
+      if (!pin->GetSignal())
+        pin->Connect(parent->GetOrbBlock()->GetSignals().front());
+      return;
+    }
     default:
-      if (auto reopened =
-              LumFuzz::CommitSaveReopen(*m_pModel, LumFuzz::TheScratch().File("step.odb")))
+      if (auto reopened = LumFuzz::CommitSaveReopen(
+              *m_pModel, LumFuzz::TheScratch().File("step.odb"), LumFuzz::Reopen::Always))
         m_pModel = std::move(reopened);
       return;
     }

@@ -23,6 +23,7 @@ extern "C" int LLVMFuzzerTestOneInput(std::uint8_t const *data, std::size_t size
     LumFuzz::CheckEmptyAfterRefusal(model);
     return 0;
   }
-  LumFuzz::CommitSaveReopen(model, LumFuzz::TheScratch().File("saved.odb"));
+  LumFuzz::CommitSaveReopen(model, LumFuzz::TheScratch().File("saved.odb"),
+                            LumFuzz::Reopen::UnlessPinsWereHeldBack);
   return 0;
 }

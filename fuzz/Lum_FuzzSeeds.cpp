@@ -4,6 +4,7 @@
 // use; the structured targets get fixed byte patterns.
 
 #include "Lum_FuzzSupport.h"
+#include "Lum_TdmSchema.h"
 
 #include <cstdint>
 #include <cstdio>
@@ -22,13 +23,13 @@ void WriteTypedDesign(std::string const &path, bool dontCreatePins) {
   Lum_TdmModel model("seed", "seeddb", "");
   Lum_TdmDesign *design = model.CreateDesignMgr("dm")->CreateDesign("top");
   Lum_TdmView *view = design->CreateView("netlist");
-  view->CreatePropertyString("TDS_DEVICE_PM", "pm1");
-  view->CreatePropertyString("TDS_DEVICE_PART", "part1");
-  Orb_Property *libraries = view->CreatePropertyStringList("TDS_VIEW_TYPE_LIBS");
+  view->CreatePropertyString(Lum_TdmSchema::kDevicePm, "pm1");
+  view->CreatePropertyString(Lum_TdmSchema::kDevicePart, "part1");
+  Orb_Property *libraries = view->CreatePropertyStringList(Lum_TdmSchema::kTypeLibraries);
   libraries->AppendString("LIBT 2.1 q1");
   libraries->AppendString(Lum_TlmLibrary::LOCAL_LIBRARY_NAME);
   if (dontCreatePins)
-    view->CreatePropertyString("LUM_DONT_CREATE_UNUSED_PINS", "");
+    view->CreatePropertyString(Lum_TdmSchema::kDontCreateUnusedPins, "");
   Lum_TlmLibrary *local =
       Lum_TlmLibrary::GetLocalLibrary(model.GetOrbModel(), PM_PIC("pm1", "part1", nullptr));
   Lum_TlmBlock *loc = local->CreateTypeBlock("LOC");
@@ -41,20 +42,21 @@ void WriteTypedDesign(std::string const &path, bool dontCreatePins) {
   Lum_TdmBlock *reg = top->CreateBlock("u1", 0);
   for (char const *name : {"DATA0", "CLK", "DATA1"})
     reg->CreatePin(name, Orb_Pin::PIN_INPUT)->GetOrbPin()->Connect(signal->GetOrbSignal());
-  reg->CreatePropertyString("TDS_BLOCK_TYPE", "LIBT:REG");
-  Orb_Property *pinMap = reg->CreatePropertyList("TDS_BLOCK_PIN_MAP");
+  reg->CreatePropertyString(Lum_TdmSchema::kBlockType, "LIBT:REG");
+  Orb_Property *pinMap = reg->CreatePropertyList(Lum_TdmSchema::kBlockPinMap);
   pinMap->CreatePropertyString("DATA0", "D0");
   pinMap->CreatePropertyString("DATA1", "D1");
-  top->CreateBlock("u2", 0)->CreatePropertyString("TDS_BLOCK_TYPE", "LIBT:ABC");
+  top->CreateBlock("u2", 0)->CreatePropertyString(Lum_TdmSchema::kBlockType, "LIBT:ABC");
   Lum_TdmBlock *localBlock = top->CreateBlock("u3", 0);
   localBlock->CreatePin("LP", Orb_Pin::PIN_INPUT);
   localBlock->CreatePropertyString(
-      "TDS_BLOCK_TYPE", (std::string(Lum_TlmLibrary::LOCAL_LIBRARY_NAME) + ":LOC").c_str());
+      Lum_TdmSchema::kBlockType,
+      (std::string(Lum_TlmLibrary::LOCAL_LIBRARY_NAME) + ":LOC").c_str());
   Lum_TdmBlock *grafted = top->CreateBlock("u4", 0);
   grafted->CreatePin("D0", Orb_Pin::PIN_INPUT);
   Ora_GraftMgr graft(false, false);
   graft.Graft(LumFuzz::TheLibrary().Reg()->GetHier("netlist"), grafted->GetOrbBlock());
-  grafted->CreatePropertyString("TDS_BLOCK_TYPE", "LIBT:REG");
+  grafted->CreatePropertyString(Lum_TdmSchema::kBlockType, "LIBT:REG");
   design->CreateView("schematic")->CreateTopBlock("top")->CreateBlock("x", 0);
   model.Save(path.c_str());
 }

@@ -4,6 +4,7 @@
 // same typing.
 
 #include "Lum_FuzzSupport.h"
+#include "Lum_TdmSchema.h"
 
 #include <cstddef>
 #include <cstdint>
@@ -16,9 +17,9 @@ std::string WriteDesign() {
   std::string path = LumFuzz::TheScratch().File("design.odb");
   Lum_TdmModel model("fuzz", "fuzzdb", "");
   Lum_TdmView *view = model.CreateDesignMgr("dm")->CreateDesign("top")->CreateView("netlist");
-  view->CreatePropertyString("TDS_DEVICE_PM", "pm1");
-  view->CreatePropertyString("TDS_DEVICE_PART", "part1");
-  Orb_Property *libraries = view->CreatePropertyStringList("TDS_VIEW_TYPE_LIBS");
+  view->CreatePropertyString(Lum_TdmSchema::kDevicePm, "pm1");
+  view->CreatePropertyString(Lum_TdmSchema::kDevicePart, "part1");
+  Orb_Property *libraries = view->CreatePropertyStringList(Lum_TdmSchema::kTypeLibraries);
   libraries->AppendString("FZ 1.0");
   libraries->AppendString("LIBT 2.1");
   Lum_TdmBlock *top = view->CreateTopBlock("top");
@@ -29,8 +30,8 @@ std::string WriteDesign() {
     if (name[0] != 'Y')
       pin->GetOrbPin()->Connect(signal->GetOrbSignal());
   }
-  cell->CreatePropertyString("TDS_BLOCK_TYPE", "FZ:CELL");
-  top->CreateBlock("u2", 0)->CreatePropertyString("TDS_BLOCK_TYPE", "LIBT:ABC");
+  cell->CreatePropertyString(Lum_TdmSchema::kBlockType, "FZ:CELL");
+  top->CreateBlock("u2", 0)->CreatePropertyString(Lum_TdmSchema::kBlockType, "LIBT:ABC");
   model.Save(path.c_str());
   return path;
 }
@@ -53,7 +54,8 @@ extern "C" int LLVMFuzzerTestOneInput(std::uint8_t const *data, std::size_t size
     if (!LumFuzz::Attempt("open", [&] { model.Open(design.c_str()); }))
       LumFuzz::CheckEmptyAfterRefusal(model);
     else
-      LumFuzz::CommitSaveReopen(model, LumFuzz::TheScratch().File("saved.odb"));
+      LumFuzz::CommitSaveReopen(model, LumFuzz::TheScratch().File("saved.odb"),
+                                LumFuzz::Reopen::UnlessPinsWereHeldBack);
   }
   LumFuzz::Check(!Lum_TlmCatalog::IsLoaded("FZ"), "the library FZ stays loaded");
   return 0;

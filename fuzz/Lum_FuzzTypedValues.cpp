@@ -7,6 +7,7 @@
 
 #include "Lum_FuzzSupport.h"
 
+#include "Lum_TdmSchema.h"
 #include "Orb_Exception.h"
 
 #include <fuzzer/FuzzedDataProvider.h>
@@ -35,7 +36,7 @@ Choices const kVersions = {"3.1",
                            " 3.1"};
 Choices const kLibraryEntries = {"LIBT 2.1", "LIBT",  "LIBT 9.9 q1 q2", "NOPE 1.0",
                                  "",         " LIBT", "LIBT:REG",       "libt 2.1"};
-Choices const kDesignTypes = {"TDS_DESIGN_TYPE_USER", "TDS_DESIGN_TYPE_LIBRARY", "",
+Choices const kDesignTypes = {Lum_TdmSchema::kDesignTypeUser, Lum_TdmSchema::kDesignTypeLibrary, "",
                               "TDS_DESIGN_TYPE_USER ", "tds_design_type_user"};
 Choices const kBlockTypes = {"LIBT:REG",   "LIBT:ABC", "LIBT:",     "LIBT",      ":REG",
                              "LIBT:REG:X", "NOPE:REG", "LIBT:NOPE", "LOCAL:LOC", ""};
@@ -79,25 +80,25 @@ bool WriteDesign(FuzzedDataProvider &in, std::string const &path) {
   Lum_TdmDesign *design = model.CreateDesignMgr("dm")->CreateDesign("top");
   Lum_TdmView *view = design->CreateView("netlist");
   std::string value;
-  design->DeleteProperty("TDS_DESIGN_TYPE");
+  design->DeleteProperty(Lum_TdmSchema::kDesignType);
   if (Value(in, kDesignTypes, value))
-    design->CreatePropertyString("TDS_DESIGN_TYPE", value.c_str());
-  view->CreatePropertyString("TDS_DEVICE_PM", "pm1");
-  view->CreatePropertyString("TDS_DEVICE_PART", "part1");
-  view->DeleteProperty("TDS_TDM_VERSION");
+    design->CreatePropertyString(Lum_TdmSchema::kDesignType, value.c_str());
+  view->CreatePropertyString(Lum_TdmSchema::kDevicePm, "pm1");
+  view->CreatePropertyString(Lum_TdmSchema::kDevicePart, "part1");
+  view->DeleteProperty(Lum_TdmSchema::kVersion);
   if (Value(in, kVersions, value))
-    view->CreatePropertyString("TDS_TDM_VERSION", value.c_str());
+    view->CreatePropertyString(Lum_TdmSchema::kVersion, value.c_str());
   if (in.ConsumeBool())
-    view->CreatePropertyString("LUM_DONT_CREATE_UNUSED_PINS", "");
+    view->CreatePropertyString(Lum_TdmSchema::kDontCreateUnusedPins, "");
   if (in.ConsumeBool()) {
-    Orb_Property *libraries = view->CreatePropertyStringList("TDS_VIEW_TYPE_LIBS");
+    Orb_Property *libraries = view->CreatePropertyStringList(Lum_TdmSchema::kTypeLibraries);
     for (int n = in.ConsumeIntegralInRange<int>(0, 3); n > 0; --n)
       libraries->AppendString((Value(in, kLibraryEntries, value)
                                    ? value
                                    : std::string(Lum_TlmLibrary::LOCAL_LIBRARY_NAME))
                                   .c_str());
   } else if (Value(in, kLibraryEntries, value)) {
-    view->CreatePropertyString("TDS_VIEW_TYPE_LIBS", value.c_str());
+    view->CreatePropertyString(Lum_TdmSchema::kTypeLibraries, value.c_str());
   }
   if (in.ConsumeBool()) {
     Lum_TlmLibrary *local =
@@ -126,9 +127,9 @@ bool WriteDesign(FuzzedDataProvider &in, std::string const &path) {
         pin->GetOrbPin()->Connect(outer->GetOrbSignal());
     }
     if (Value(in, kBlockTypes, value))
-      block->CreatePropertyString("TDS_BLOCK_TYPE", Localized(value).c_str());
+      block->CreatePropertyString(Lum_TdmSchema::kBlockType, Localized(value).c_str());
     if (in.ConsumeBool()) {
-      Orb_Property *pinMap = block->CreatePropertyList("TDS_BLOCK_PIN_MAP");
+      Orb_Property *pinMap = block->CreatePropertyList(Lum_TdmSchema::kBlockPinMap);
       for (int m = in.ConsumeIntegralInRange<int>(0, 4); m > 0; --m) {
         std::string const member = PinName(in);
         pinMap->CreatePropertyString(member.c_str(), PinName(in).c_str());
@@ -160,6 +161,7 @@ extern "C" int LLVMFuzzerTestOneInput(std::uint8_t const *data, std::size_t size
     LumFuzz::CheckEmptyAfterRefusal(model);
     return 0;
   }
-  LumFuzz::CommitSaveReopen(model, LumFuzz::TheScratch().File("saved.odb"));
+  LumFuzz::CommitSaveReopen(model, LumFuzz::TheScratch().File("saved.odb"),
+                            LumFuzz::Reopen::UnlessPinsWereHeldBack);
   return 0;
 }

@@ -5,6 +5,7 @@
 #include "Orb_Templates.h"
 
 #include <cstdint>
+#include <string>
 #include <vector>
 
 class Lum_TdmTypePinMap;
@@ -177,6 +178,8 @@ protected:
   virtual void DbgImpl() const;
 
 private:
+  friend class Lum_TdmView;
+
   void CommitTypeProperties();
   void ResolveTypeBlock();
   // Matches the pins to the type block's pins (null clears every type pin),
@@ -191,6 +194,16 @@ private:
   // block belongs to no library of the view, or a connected pin has no type
   // pin of its name. Changes nothing.
   void VerifyTypeBlock(Lum_TlmBlock const *typeBlock) const;
+  // Throws Lum_ExceptionInvalidTypeBlock (the pin's name) when the next open
+  // would refuse what a commit stores for this block: a connected pin that
+  // finds no type pin, or (unless the view forbids creating pins) a type pin
+  // that no pin took but whose name a pin holds. Changes nothing.
+  void VerifyCommit(bool viewForbidsCreating) const;
+  // VerifyCommit over this block and every block under it.
+  void VerifyCommitTree() const;
+  // Commits the block and its subtree, as TraverseAndCommitToOrb without the
+  // check.
+  void CommitSubtree();
 
   Lum_TlmBlock const *m_pTypeBlock;
 };

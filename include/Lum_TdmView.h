@@ -122,4 +122,7 @@ private:
   // Set when building the list failed: TDS_VIEW_TYPE_LIBS is left as stored.
   mutable bool m_LibraryListFailed;
   mutable std::unordered_map<std::string, Lum_TlmBlock const *> m_TypeBlocks;
+  // Set while a commit walks the view's blocks, all of which it checked
+  // before writing anything.
+  mutable bool m_CommitVerified = false;
 };

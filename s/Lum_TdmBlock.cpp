@@ -1,7 +1,9 @@
 #include "Lum_TdmBlock.h"
 
+#include "Lum_TdmClient.h"
 #include "Lum_TdmCommit.h"
 #include "Lum_TdmDbg.h"
+#include "Lum_TdmLoadRules.h"
 #include "Lum_TdmModel.h"
 #include "Lum_TdmNetwork.h"
 #include "Lum_TdmPin.h"
@@ -11,6 +13,7 @@
 #include "Lum_TdmView.h"
 
 #include "Lum_Exception.h"
+#include "Lum_TdmSchema.h"
 #include "Lum_Tlm.h"
 #include "Lum_TlmTypeID.h"
 #include "Ora_GraftMgr.h"
@@ -34,25 +37,15 @@ namespace {
 char const kSourcePath[] = "../s/Lum_TdmBlock";
 char const kRevision[] = "$Revision: 1.1 $";
 
-char const kBlockTypeProperty[] = "TDS_BLOCK_TYPE";
-char const kPinMapProperty[] = "TDS_BLOCK_PIN_MAP";
-char const kDontCreatePinsProperty[] = "LUM_DONT_CREATE_UNUSED_PINS";
+using Lum_TdmSchema::kBlockPinMap;
+using Lum_TdmSchema::kBlockType;
+using Lum_TdmSchema::kDontCreateUnusedPins;
 
 // A pin whose name differs from its type pin's. A pin without a type pin is
 // not one: it has nothing to record.
 bool IsMappedPin(Lum_TdmPin const *pin) {
   Lum_TlmPin const *typePin = pin->GetTypePin();
   return typePin && std::strcmp(pin->GetName(), typePin->GetName()) != 0;
-}
-
-// The client of a host object in `context`, specialized when it has none.
-template <class Client, class Host>
-Client *ClientOf(Orb_Context *context, Orb_BridgeHandle const &bridge, Host *object) {
-  Orb_ClientObject *client = bridge[object->GetBridgeId()];
-  if (!client)
-    client = context->Specialize(object);
-  assert(client && "the client model made no client for a host object");
-  return static_cast<Client *>(client);
 }
 
 // Calls `visit` with each host object of `objects` (a block's children or
@@ -65,7 +58,7 @@ Client *FindClient(Orb_Context *context, Range const &objects, Visit const &visi
   using Host = std::remove_pointer_t<typename Range::value_type>;
   Orb_BridgeHandle const bridge = context->GetBridgeHandle(Host::kKind);
   for (std::size_t i = 0; i < objects.size(); ++i) {
-    Client *client = ClientOf<Client>(context, bridge, objects[i]);
+    Client *client = Lum_TdmClient::Of<Client>(context, bridge, objects[i]);
     if (visit(client))
       return client;
   }
@@ -139,6 +132,36 @@ private:
   Lum_TdmModel *m_pModel;
 };
 
+// The type block that the next open binds a block bound to `typeBlock` to.
+Lum_TlmBlock const *ReopenedTypeBlock(Lum_TlmBlock const *typeBlock) {
+  // The stored tag holds the block's name: a hierarchy block of a type
+  // block, which is named like it, comes back as the type block.
+  Lum_TlmBlock const *named =
+      typeBlock->GetLibrary()->GetTypeBlock(Port::StringBase<char>(typeBlock->GetName()));
+  return named ? named : typeBlock;
+}
+
+char const *RefusedPin(Lum_TdmLoadRules::Refusal const &refusal) {
+  return refusal.unmatched ? refusal.unmatched->GetName() : refusal.collision->GetName();
+}
+
+std::string RefusalMessage(Lum_TdmLoadRules::Refusal const &refusal, char const *block,
+                           Lum_TlmBlock const *typeBlock) {
+  if (refusal.unmatched) {
+    std::string const pin = refusal.unmatched->GetName();
+    return "Pin <" + pin + "> of block <" + block +
+           "> is connected but has no type pin of type block <" + typeBlock->GetName() +
+           ">: the next open would refuse it. Bind it to a type pin (SetTypeBlock with a pin "
+           "map), rename it after a type pin, or leave it unconnected.";
+  }
+  std::string const pin = refusal.collision->GetName();
+  return "Pin <" + pin + "> of block <" + block + "> holds the name of type pin <" + pin +
+         "> of type block <" + typeBlock->GetName() +
+         ">, which no pin is bound to: the next open would have to create that type pin and "
+         "could not. Bind a pin to <" +
+         pin + ">, rename pin <" + pin + ">, or give the block every pin of its type block.";
+}
+
 } // namespace
 
 // The block adds one pointer to its host base; whatever else a binding needs
@@ -162,32 +185,26 @@ void Lum_TdmBlock::InitTypeBlock() {}
 // Binding on load
 
 void Lum_TdmBlock::ResolveTypeBlock() {
-  Orb_Property const *stored = GetPropertyByName(kBlockTypeProperty);
+  Orb_Property const *stored = GetPropertyByName(kBlockType);
   if (!stored)
     return;
   std::string const storedType(stored->GetValue());
   Lum_TdmView const *view = GetView();
   Lum_TlmBlock const *typeBlock = view->FindTypeBlock(storedType);
   if (!typeBlock) {
-    // The library name is the text before the first ":", the type block's
-    // name all that follows; without ":" the type block's name is empty.
-    std::size_t const colon = storedType.find(':');
-    std::string const libraryName = storedType.substr(0, colon);
-    std::string const typeBlockName =
-        colon == std::string::npos ? std::string() : storedType.substr(colon + 1);
+    std::string libraryName;
+    std::string typeBlockName;
+    Lum_TdmLoadRules::SplitStoredType(storedType, libraryName, typeBlockName);
     Lum_TlmLibrary const *library = view->GetLibrary(Port::StringBase<char>(libraryName.c_str()));
     if (!library)
       throw Lum_ExceptionCorruptDatabase("Lum", kSourcePath, kRevision, __LINE__,
-                                         libraryName.c_str(),
-                                         "Could not locate the specified library.", false);
+                                         libraryName.c_str(), Lum_TdmLoadRules::kLibraryNotFound,
+                                         false);
     typeBlock = library->GetTypeBlock(Port::StringBase<char>(typeBlockName.c_str()));
-    if (!typeBlock) {
-      Port::StringBase<char> message;
-      message.doFormat("\nCouldn't find type block <%s> in library <%s>.\n", typeBlockName.c_str(),
-                       libraryName.c_str());
-      throw Lum_ExceptionCorruptDatabase("Lum", kSourcePath, kRevision, __LINE__,
-                                         typeBlockName.c_str(), message.c_str(), false);
-    }
+    if (!typeBlock)
+      throw Lum_ExceptionCorruptDatabase(
+          "Lum", kSourcePath, kRevision, __LINE__, typeBlockName.c_str(),
+          Lum_TdmLoadRules::TypeBlockMissingMessage(typeBlockName, libraryName).c_str(), false);
     view->NoteTypeBlock(storedType, typeBlock);
   }
   m_pTypeBlock = typeBlock;
@@ -199,13 +216,7 @@ void Lum_TdmBlock::ReconcilePins(Lum_TlmBlock const *typeBlock) {
   Orb_Context *context = GetContext();
   auto const pins = GetOrbBlock()->GetPins();
   Orb_BridgeHandle const bridge = context->GetBridgeHandle(Orb_Kind::Pin);
-  auto clientOf = [&](Orb_Pin *pin) {
-    Orb_ClientObject *client = bridge[pin->GetBridgeId()];
-    if (!client)
-      client = context->Specialize(pin);
-    assert(client && "the client model made no client for a pin");
-    return static_cast<Lum_TdmPin *>(client);
-  };
+  auto clientOf = [&](Orb_Pin *pin) { return Lum_TdmClient::Of<Lum_TdmPin>(context, bridge, pin); };
 
   if (!typeBlock) {
     for (std::size_t i = 0; i < pins.size(); ++i)
@@ -213,22 +224,16 @@ void Lum_TdmBlock::ReconcilePins(Lum_TlmBlock const *typeBlock) {
     return;
   }
 
-  // Name map from TDS_BLOCK_PIN_MAP: design pin name to type pin name, the
-  // last member of a name winning. The views point into the property, which
-  // nothing touches before the map is dropped.
-  std::unordered_map<std::string_view, char const *> nameMap;
-  if (Orb_Property const *pinMap = GetPropertyByName(kPinMapProperty)) {
-    nameMap.reserve(pinMap->GetMembers().size());
-    for (auto const &member : pinMap->GetMembers())
-      nameMap[std::string_view(member->GetName())] = member->GetStringValue();
-  }
+  // The map's views point into the property, which nothing touches before
+  // the map is dropped.
+  Lum_TdmLoadRules::NameMap nameMap;
+  Lum_TdmLoadRules::ReadPinMap(GetOrbBlock(), nameMap);
 
-  // The second phase gives a block with fewer pins than its type block, in a
-  // view that allows it, the type pins nobody took. The first phase creates
-  // no pin, so whether it will run is known now, and the taken type pins are
-  // noted only then.
-  bool const createMissing = typeBlock->GetNumPins() > GetNumPins() &&
-                             !GetOrbBlock()->GetView()->GetPropertyByName(kDontCreatePinsProperty);
+  // The second phase creates what the first phase left untaken. The first
+  // phase creates no pin, so whether the second will run is known now, and
+  // the taken type pins are noted only then.
+  bool const createMissing = Lum_TdmLoadRules::CreatesMissing(
+      typeBlock, GetOrbBlock(), Lum_TdmLoadRules::ForbidsCreating(GetOrbBlock()->GetView()));
   std::vector<Lum_TlmPin const *> taken;
   if (createMissing)
     taken.reserve(pins.size());
@@ -236,16 +241,11 @@ void Lum_TdmBlock::ReconcilePins(Lum_TlmBlock const *typeBlock) {
   // First phase: every pin takes the type pin of its (mapped) name.
   for (std::size_t i = 0; i < pins.size(); ++i) {
     Orb_Pin *pin = pins[i];
-    char const *typePinName = pin->GetName();
-    if (!nameMap.empty()) {
-      auto const mapped = nameMap.find(std::string_view(pin->GetNameString()));
-      if (mapped != nameMap.end())
-        typePinName = mapped->second;
-    }
-    Lum_TlmPin const *typePin = typeBlock->GetPinByName(typePinName);
-    if (!typePin && pin->GetSignal())
+    Lum_TlmPin const *typePin =
+        typeBlock->GetPinByName(Lum_TdmLoadRules::TypePinName(pin, nameMap));
+    if (Lum_TdmLoadRules::IsUnmatched(pin, typePin))
       throw Lum_ExceptionCorruptDatabase("Lum", kSourcePath, kRevision, __LINE__, pin->GetName(),
-                                         "Could not locate the specified pin.", false);
+                                         Lum_TdmLoadRules::kPinNotFound, false);
     clientOf(pin)->SetTypePin(typePin);
     if (createMissing && typePin)
       taken.push_back(typePin);
@@ -255,25 +255,17 @@ void Lum_TdmBlock::ReconcilePins(Lum_TlmBlock const *typeBlock) {
 
   // Second phase: creation in the type block's pin order, then the sort.
   nameMap.clear();
-  std::sort(taken.begin(), taken.end());
-  std::size_t const typePinCount = typeBlock->GetPins().size();
-  for (std::size_t i = 0; i < typePinCount; ++i) {
-    Lum_TlmPin const *typePin = typeBlock->GetPin(i);
-    if (std::binary_search(taken.begin(), taken.end(), typePin))
-      continue;
-    if (GetOrbBlock()->GetPinByName(typePin->GetName())) {
-      Port::StringBase<char> message;
-      message.doFormat("While trying to patch up design block <%s> with new type pin <%s>\nof "
-                       "type block <%s>, found that the block already had a pin by that\nname.  "
-                       "This could have been due to an earlier and inappropriate\nclient call to "
-                       "pin->SetName().\n",
-                       GetName(), typePin->GetName(), typeBlock->GetName());
-      throw Lum_ExceptionCorruptDatabase("Lum", kSourcePath, kRevision, __LINE__,
-                                         GetOrbBlock()->GetView()->GetParent()->GetName(),
-                                         message.c_str(), false);
-    }
-    CreatePin(typePin->GetName(), typePin->GetDirection())->SetTypePin(typePin);
-  }
+  Lum_TdmLoadRules::ForEachUntaken(
+      typeBlock, GetOrbBlock(), taken, [&](Lum_TlmPin const *typePin, bool collides) {
+        if (collides)
+          throw Lum_ExceptionCorruptDatabase(
+              "Lum", kSourcePath, kRevision, __LINE__,
+              GetOrbBlock()->GetView()->GetParent()->GetName(),
+              Lum_TdmLoadRules::PatchUpMessage(GetName(), typePin->GetName(), typeBlock->GetName())
+                  .c_str(),
+              false);
+        CreatePin(typePin->GetName(), typePin->GetDirection())->SetTypePin(typePin);
+      });
   SortPinsByName();
 }
 
@@ -303,8 +295,8 @@ Lum_TdmBlock *Lum_TdmBlock::CreateTypedBlock(char const *name, Lum_TlmBlock cons
                                         "Null type block specified in CreateTypedBlock.", false);
   if (!IsOfViewLibrary(typeBlock))
     throw Lum_ExceptionCorruptDatabase("Lum", kSourcePath, kRevision, __LINE__,
-                                       typeBlock->GetName(),
-                                       "Could not locate the specified library.", false);
+                                       typeBlock->GetName(), Lum_TdmLoadRules::kLibraryNotFound,
+                                       false);
 
   Lum_TdmBlock *child = CreateBlock(name, 0);
   if (pins) {
@@ -351,7 +343,7 @@ Lum_TdmBlock *Lum_TdmBlock::CreateUntypedBlock(char const *name, Lum_TlmBlock co
   association += typeBlock->GetName();
   association += ' ';
   association += UT_TIMESTAMP().getTimeStampString();
-  child->CreatePropertyString("TDS_LIBRARY_ASSOC", association.c_str());
+  child->CreatePropertyString(Lum_TdmSchema::kLibraryAssociation, association.c_str());
 
   Port::StringBase<char> const viewName(GetView()->GetName());
   if (typeBlock->HasHier(viewName)) {
@@ -370,8 +362,8 @@ void Lum_TdmBlock::VerifyTypeBlock(Lum_TlmBlock const *typeBlock) const {
   assert(typeBlock && "VerifyTypeBlock needs a type block");
   if (!IsOfViewLibrary(typeBlock))
     throw Lum_ExceptionCorruptDatabase("Lum", kSourcePath, kRevision, __LINE__,
-                                       typeBlock->GetName(),
-                                       "Could not locate the specified library.", false);
+                                       typeBlock->GetName(), Lum_TdmLoadRules::kLibraryNotFound,
+                                       false);
   Orb_Block const *typeHost = typeBlock->GetOrbBlock();
   for (Orb_Pin const *pin : GetOrbBlock()->GetPins())
     if (pin->GetSignal() && !typeHost->GetPinByName(pin->GetName()))
@@ -403,14 +395,14 @@ void Lum_TdmBlock::SetTypeBlock(Lum_TlmBlock const *typeBlock) {
   std::vector<std::pair<Orb_Pin *, Lum_TlmPin const *>> before;
   before.reserve(pins.size());
   for (Orb_Pin *pin : pins)
-    before.emplace_back(pin, ClientOf<Lum_TdmPin>(context, bridge, pin)->GetTypePin());
+    before.emplace_back(pin, Lum_TdmClient::Of<Lum_TdmPin>(context, bridge, pin)->GetTypePin());
   try {
     ReconcilePins(typeBlock);
   } catch (...) {
     std::unordered_set<Orb_Pin const *> kept;
     kept.reserve(before.size());
     for (auto const &[pin, typePin] : before) {
-      ClientOf<Lum_TdmPin>(context, bridge, pin)->SetTypePin(typePin);
+      Lum_TdmClient::Of<Lum_TdmPin>(context, bridge, pin)->SetTypePin(typePin);
       kept.insert(pin);
     }
     std::vector<Orb_Pin *> created;
@@ -434,7 +426,7 @@ void Lum_TdmBlock::SetTypeBlock(Lum_TlmBlock const *typeBlock, Lum_TdmTypePinMap
   if (!typeBlock) {
     m_pTypeBlock = nullptr;
     for (Orb_Pin *pin : pins)
-      ClientOf<Lum_TdmPin>(context, bridge, pin)->SetTypePin(nullptr);
+      Lum_TdmClient::Of<Lum_TdmPin>(context, bridge, pin)->SetTypePin(nullptr);
     InitTypeBlock();
     return;
   }
@@ -442,8 +434,8 @@ void Lum_TdmBlock::SetTypeBlock(Lum_TlmBlock const *typeBlock, Lum_TdmTypePinMap
     VerifyTypeBlock(typeBlock);
   } catch (Port::Exception const &) {
     throw Lum_ExceptionCorruptDatabase("Lum", kSourcePath, kRevision, __LINE__,
-                                       typeBlock->GetName(),
-                                       "Could not locate the specified library.", false);
+                                       typeBlock->GetName(), Lum_TdmLoadRules::kLibraryNotFound,
+                                       false);
   }
   if (pinMap.GetNumPins() > GetNumPins())
     throw Lum_ExceptionCorruptDatabase("Lum", kSourcePath, kRevision, __LINE__,
@@ -456,13 +448,23 @@ void Lum_TdmBlock::SetTypeBlock(Lum_TlmBlock const *typeBlock, Lum_TdmTypePinMap
   std::vector<std::pair<Lum_TdmPin *, Lum_TlmPin const *>> mapped;
   mapped.reserve(pins.size());
   for (Orb_Pin *hostPin : pins) {
-    Lum_TdmPin *pin = ClientOf<Lum_TdmPin>(context, bridge, hostPin);
+    Lum_TdmPin *pin = Lum_TdmClient::Of<Lum_TdmPin>(context, bridge, hostPin);
     Lum_TlmPin const *typePin = pinMap.GetPinMapping(pin);
     if (!typePin || typePin->GetParent() != typeBlock)
       throw Lum_ExceptionCorruptDatabase("Lum", kSourcePath, kRevision, __LINE__, pin->GetName(),
                                          "Invalid type pin specified in type pin map.", false);
     mapped.emplace_back(pin, typePin);
   }
+  // The commit stores the map: the next open must take it. The view's
+  // LUM_DONT_CREATE_UNUSED_PINS does not count, as the commit removes it.
+  std::size_t next = 0; // the host pins come in the order `mapped` has them
+  Lum_TlmBlock const *reopened = ReopenedTypeBlock(typeBlock);
+  Lum_TdmLoadRules::Refusal const refusal = Lum_TdmLoadRules::Predict(
+      GetOrbBlock(), reopened, Lum_TdmLoadRules::CreatesMissing(reopened, GetOrbBlock(), false),
+      [&](Orb_Pin *) { return reopened->GetPinByName(mapped[next++].second->GetName()); });
+  if (refusal)
+    throw Lum_ExceptionCorruptDatabase("Lum", kSourcePath, kRevision, __LINE__, RefusedPin(refusal),
+                                       RefusalMessage(refusal, GetName(), reopened).c_str(), false);
   for (auto const &[pin, typePin] : mapped)
     pin->SetTypePin(typePin);
   m_pTypeBlock = typeBlock;
@@ -614,17 +616,17 @@ void Lum_TdmBlock::NormalizePins() { SortPinsByName(); }
 // Commit
 
 void Lum_TdmBlock::CommitTypeProperties() {
-  Orb_Property *stored = GetPropertyByName(kBlockTypeProperty);
+  Orb_Property *stored = GetPropertyByName(kBlockType);
   if (m_pTypeBlock) {
     Port::StringBase<char> const tag = m_pTypeBlock->GetUniqueTag();
     if (stored && stored->GetKind() == Orb_Property::STRING)
       stored->SetStringValue(tag.str());
     else
-      CreatePropertyString(kBlockTypeProperty, tag.c_str());
+      CreatePropertyString(kBlockType, tag.c_str());
   } else if (stored) {
     DeleteProperty(stored);
   }
-  if (Orb_Property *pinMap = GetPropertyByName(kPinMapProperty))
+  if (Orb_Property *pinMap = GetPropertyByName(kBlockPinMap))
     DeleteProperty(pinMap);
   if (!m_pTypeBlock)
     return;
@@ -635,18 +637,14 @@ void Lum_TdmBlock::CommitTypeProperties() {
   Orb_Context *context = GetContext();
   Orb_BridgeHandle const bridge = context->GetBridgeHandle(Orb_Kind::Pin);
   auto clientOf = [&](Orb_Pin *pin) {
-    Orb_ClientObject *client = bridge[pin->GetBridgeId()];
-    if (!client)
-      client = context->Specialize(pin);
-    assert(client && "the client model made no client for a pin");
-    return static_cast<Lum_TdmPin const *>(client);
+    return static_cast<Lum_TdmPin const *>(Lum_TdmClient::Of<Lum_TdmPin>(context, bridge, pin));
   };
   std::size_t first = 0;
   while (first < pins.size() && !IsMappedPin(clientOf(pins[first])))
     ++first;
   if (first == pins.size())
     return;
-  Orb_Property *pinMap = CreatePropertyList(kPinMapProperty);
+  Orb_Property *pinMap = CreatePropertyList(kBlockPinMap);
   for (std::size_t i = first; i < pins.size(); ++i) {
     Lum_TdmPin const *pin = clientOf(pins[i]);
     if (IsMappedPin(pin))
@@ -656,7 +654,66 @@ void Lum_TdmBlock::CommitTypeProperties() {
 
 void Lum_TdmBlock::CommitToOrb() { CommitTypeProperties(); }
 
+void Lum_TdmBlock::VerifyCommit(bool viewForbidsCreating) const {
+  if (!m_pTypeBlock)
+    return;
+  // What the commit stores: each pin's type pin by name (through the pin
+  // map when the names differ), nothing for a pin without one, which the
+  // open then looks up by its own name.
+  Orb_Context *context = GetContext();
+  Orb_BridgeHandle const bridge = context->GetBridgeHandle(Orb_Kind::Pin);
+  Lum_TlmBlock const *reopened = ReopenedTypeBlock(m_pTypeBlock);
+  Lum_TdmLoadRules::Refusal const refusal = Lum_TdmLoadRules::Predict(
+      GetOrbBlock(), reopened,
+      Lum_TdmLoadRules::CreatesMissing(reopened, GetOrbBlock(), viewForbidsCreating),
+      [&](Orb_Pin *pin) {
+        Lum_TlmPin const *typePin =
+            Lum_TdmClient::Of<Lum_TdmPin>(context, bridge, pin)->GetTypePin();
+        return reopened->GetPinByName(typePin ? typePin->GetName() : pin->GetName());
+      });
+  if (refusal)
+    throw Lum_ExceptionInvalidTypeBlock(
+        "Lum", kSourcePath, kRevision, __LINE__, RefusedPin(refusal),
+        RefusalMessage(refusal, GetName(), reopened).c_str(), false);
+}
+
+void Lum_TdmBlock::VerifyCommitTree() const {
+  bool const forbidden = Lum_TdmLoadRules::ForbidsCreating(GetOrbBlock()->GetView());
+  Orb_Context *context = GetContext();
+  Orb_BridgeHandle const bridge = context->GetBridgeHandle(Orb_Kind::Block);
+  VerifyCommit(forbidden);
+  // A stack of its own, as a hierarchy may be deep.
+  std::vector<Orb_Block *> stack{GetOrbBlock()};
+  while (!stack.empty()) {
+    Orb_Block *block = stack.back();
+    stack.pop_back();
+    for (Orb_Block *child : block->GetBlocks()) {
+      Lum_TdmClient::Of<Lum_TdmBlock>(context, bridge, child)->VerifyCommit(forbidden);
+      stack.push_back(child);
+    }
+  }
+}
+
 void Lum_TdmBlock::TraverseAndCommitToOrb() {
+  // A commit of this subtree alone checks it first; within a view's commit
+  // the view has checked every block.
+  Lum_TdmView const *view = GetView();
+  bool const outermost = !view->m_CommitVerified;
+  if (outermost)
+    VerifyCommitTree();
+  view->m_CommitVerified = true;
+  try {
+    CommitSubtree();
+  } catch (...) {
+    if (outermost)
+      view->m_CommitVerified = false;
+    throw;
+  }
+  if (outermost)
+    view->m_CommitVerified = false;
+}
+
+void Lum_TdmBlock::CommitSubtree() {
   CommitToOrb();
   Orb_Block const *host = GetOrbBlock();
   Lum_TdmCommitEach<Lum_TdmPin>(GetContext(), Orb_Kind::Pin, host->GetPins());

@@ -2,9 +2,8 @@
 
 // The commit walk over one kind of children.
 
-#include "Orb_Derived.h"
+#include "Lum_TdmClient.h"
 
-#include <cassert>
 #include <vector>
 
 // Commits each host child in host order through its client, which is
@@ -16,10 +15,6 @@ void Lum_TdmCommitEach(Orb_Context *context, Orb_Kind kind, Children const &chil
     return;
   Orb_BridgeHandle const bridge = context->GetBridgeHandle(kind);
   for (std::size_t i = 0; i < children.size(); ++i) {
-    Orb_ClientObject *client = bridge[children[i]->GetBridgeId()];
-    if (!client)
-      client = context->Specialize(children[i]);
-    assert(client && "the client model made no client for a host object");
-    static_cast<Client *>(client)->TraverseAndCommitToOrb();
+    Lum_TdmClient::Of<Client>(context, bridge, children[i])->TraverseAndCommitToOrb();
   }
 }

@@ -1,9 +1,11 @@
 #include "Lum_TdmDesign.h"
 
 #include "Lum_TdmDbg.h"
+#include "Lum_TdmLoadRules.h"
 #include "Lum_TdmModel.h"
 
 #include "Lum_Exception.h"
+#include "Lum_TdmSchema.h"
 #include "Lum_Tlm.h"
 
 #include <cstring>
@@ -13,16 +15,16 @@ namespace {
 char const kSourcePath[] = "../s/Lum_TdmDesign";
 char const kRevision[] = "$Revision: 1.1 $";
 
-char const kDesignType[] = "TDS_DESIGN_TYPE";
-char const kUserDesign[] = "TDS_DESIGN_TYPE_USER";
+using Lum_TdmSchema::kDesignType;
+using Lum_TdmSchema::kDesignTypeUser;
 
 bool IsUserMark(Orb_Property const *mark) {
-  return !mark || std::strcmp(mark->GetStringValue(), kUserDesign) == 0;
+  return !mark || std::strcmp(mark->GetStringValue(), kDesignTypeUser) == 0;
 }
 
 // The mark as the dumps show it: an absent mark reads as a user design.
 char const *ShownMark(Orb_Property const *mark) {
-  return mark ? mark->GetStringValue() : kUserDesign;
+  return mark ? mark->GetStringValue() : kDesignTypeUser;
 }
 
 } // namespace
@@ -36,7 +38,7 @@ Lum_TdmDesign::Lum_TdmDesign(Lum_TdmModel *model, Orb_Design *design, bool isNew
     CommitToOrb();
   } else if (!IsUserMark(GetPropertyByName(kDesignType))) {
     throw Lum_ExceptionDesignLoad("Lum", kSourcePath, kRevision, __LINE__, GetName(),
-                                  "Attempt to specialize non-Tdm design.", false);
+                                  Lum_TdmLoadRules::kForeignDesign, false);
   }
 }
 
@@ -54,7 +56,7 @@ bool Lum_TdmDesign::IsTypeBlockDesign(Orb_Design const &design) {
 
 void Lum_TdmDesign::CommitToOrb() {
   if (!GetPropertyByName(kDesignType))
-    CreatePropertyString(kDesignType, kUserDesign);
+    CreatePropertyString(kDesignType, kDesignTypeUser);
 }
 
 void Lum_TdmDesign::TraverseAndCommitToOrb() { CommitToOrb(); }

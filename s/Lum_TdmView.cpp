@@ -1,21 +1,23 @@
 #include "Lum_TdmView.h"
 
 #include "Lum_TdmBlock.h"
+#include "Lum_TdmClient.h"
 #include "Lum_TdmCommit.h"
 #include "Lum_TdmDbg.h"
 #include "Lum_TdmDesign.h"
+#include "Lum_TdmLoadRules.h"
 #include "Lum_TdmModel.h"
 #include "Lum_TdmNetwork.h"
 #include "Lum_TdmPin.h"
 #include "Lum_TdmSignal.h"
 
 #include "Lum_Exception.h"
+#include "Lum_TdmSchema.h"
 #include "Lum_Tlm.h"
 #include "Lum_TlmTypeID.h"
 #include "PM_PIC.h"
 #include "Port_MsgManData.h"
 
-#include <cassert>
 #include <cstdint>
 #include <string>
 #include <vector>
@@ -25,29 +27,16 @@ namespace {
 char const kSourcePath[] = "../s/Lum_TdmView";
 char const kRevision[] = "$Revision: 1.1 $";
 
-// The format this software writes.
-constexpr unsigned kTdmVersion = 3;
-constexpr unsigned kTdmRevision = 1;
 // Marks the version fields while the constructor runs.
 constexpr std::uint32_t kUnsetVersion = 0xFFFF;
 
-char const kVersionProperty[] = "TDS_TDM_VERSION";
-char const kLibrariesProperty[] = "TDS_VIEW_TYPE_LIBS";
-char const kDevicePmProperty[] = "TDS_DEVICE_PM";
-char const kDevicePartProperty[] = "TDS_DEVICE_PART";
-char const kDontCreatePinsProperty[] = "LUM_DONT_CREATE_UNUSED_PINS";
-
-// The entries of TDS_VIEW_TYPE_LIBS: a string list, or a lone string taken
-// as one entry.
-std::vector<std::string> LibraryEntries(Orb_Property const *property) {
-  if (!property)
-    return {};
-  if (property->GetKind() == Orb_Property::STRING_LIST)
-    return property->GetStrings();
-  if (property->GetKind() == Orb_Property::STRING)
-    return {std::string(property->GetValue())};
-  return {};
-}
+using Lum_TdmSchema::kDevicePart;
+using Lum_TdmSchema::kDevicePm;
+using Lum_TdmSchema::kDontCreateUnusedPins;
+using Lum_TdmSchema::kFormatRevision;
+using Lum_TdmSchema::kFormatVersion;
+using Lum_TdmSchema::kTypeLibraries;
+using Lum_TdmSchema::kVersion;
 
 } // namespace
 
@@ -55,8 +44,8 @@ Lum_TdmView::Lum_TdmView(Lum_TdmModel *model, Orb_View *view, bool isNew)
     : Orb_ViewT<Lum_TdmTraits>(model, view), m_Version(kUnsetVersion), m_Revision(kUnsetVersion),
       m_LibraryListFailed(false) {
   if (isNew) {
-    m_Version = kTdmVersion;
-    m_Revision = kTdmRevision;
+    m_Version = kFormatVersion;
+    m_Revision = kFormatRevision;
     WriteTdmProperties();
   } else {
     CheckTdmVersion();
@@ -76,8 +65,8 @@ Lum_TdmView::~Lum_TdmView() {
 }
 
 void Lum_TdmView::GetTdmVersion(unsigned int &version, unsigned int &revision) {
-  version = kTdmVersion;
-  revision = kTdmRevision;
+  version = kFormatVersion;
+  revision = kFormatRevision;
 }
 
 void Lum_TdmView::GetTdmLoadedDesignVersion(unsigned int &version, unsigned int &revision) const {
@@ -90,62 +79,48 @@ char const *Lum_TdmView::GetDesignMgrName() const {
 }
 
 void Lum_TdmView::CheckTdmVersion() {
-  m_Version = 0;
-  m_Revision = 0;
-  Orb_Property const *stamp = GetPropertyByName(kVersionProperty);
-  if (!stamp)
-    return;
-  // Fields the parse does not reach stay 0; negative numbers wrap to their
-  // unsigned 32-bit value.
-  int version = 0;
-  int revision = 0;
-  Port::sscanf(stamp->GetStringValue(), "%d.%d", &version, &revision);
-  m_Version = static_cast<std::uint32_t>(version);
-  m_Revision = static_cast<std::uint32_t>(revision);
-
-  bool const tooOld = m_Version == 0 && m_Revision <= 2;
-  bool const tooNew =
-      m_Version > kTdmVersion || (m_Version == kTdmVersion && m_Revision > kTdmRevision);
-  if (tooOld) {
+  Lum_TdmLoadRules::Stamp const stamp =
+      Lum_TdmLoadRules::ReadStamp(GetPropertyByName(kVersion), m_Version, m_Revision);
+  if (stamp == Lum_TdmLoadRules::Stamp::TooOld) {
     Port_MsgManData::createObject("Lum", kSourcePath, __LINE__, kRevision)
         .issueError("Tdm version is %d and the revision is %d. This is an old design that is no "
                     "longer supported by the software.  Please convert your design.\n",
                     static_cast<int>(m_Version), static_cast<int>(m_Revision));
     throw Lum_ExceptionCorruptDatabase("Lum", kSourcePath, kRevision, __LINE__, GetDesignMgrName(),
-                                       "Old design that requires conversion.", false);
+                                       Lum_TdmLoadRules::kOldStamp, false);
   }
-  if (tooNew) {
+  if (stamp == Lum_TdmLoadRules::Stamp::TooNew) {
     Port_MsgManData::createObject("Lum", kSourcePath, __LINE__, kRevision)
         .issueError("Tdm version is %d and the revision is %d.\nThis design was created by "
                     "software with a newer version than this software.\nPlease use this design "
                     "with the newer software.\n",
                     static_cast<int>(m_Version), static_cast<int>(m_Revision));
     throw Lum_ExceptionCorruptDatabase("Lum", kSourcePath, kRevision, __LINE__, GetDesignMgrName(),
-                                       "New design that requires newer software.", false);
+                                       Lum_TdmLoadRules::kNewStamp, false);
   }
 }
 
 void Lum_TdmView::WriteTdmProperties() {
-  if (GetPropertyByName(kDontCreatePinsProperty))
-    DeleteProperty(kDontCreatePinsProperty);
+  if (GetPropertyByName(kDontCreateUnusedPins))
+    DeleteProperty(kDontCreateUnusedPins);
 
   Port::StringBase<char> stamp;
-  stamp.doFormat("%d.%d", kTdmVersion, kTdmRevision);
-  Orb_Property *stampProperty = GetPropertyByName(kVersionProperty);
+  stamp.doFormat("%d.%d", kFormatVersion, kFormatRevision);
+  Orb_Property *stampProperty = GetPropertyByName(kVersion);
   if (stampProperty && stampProperty->GetKind() == Orb_Property::STRING)
     stampProperty->SetStringValue(stamp.str());
   else
-    CreatePropertyString(kVersionProperty, stamp.c_str());
+    CreatePropertyString(kVersion, stamp.c_str());
 
   // A list that failed to build lacks the libraries after the failing entry:
   // writing it would drop them from the database.
   if (!m_pLibrary || m_LibraryListFailed)
     return;
-  Orb_Property *libraries = GetPropertyByName(kLibrariesProperty);
+  Orb_Property *libraries = GetPropertyByName(kTypeLibraries);
   if (libraries && libraries->GetKind() == Orb_Property::STRING_LIST)
     libraries->ClearStrings();
   else
-    libraries = CreatePropertyStringList(kLibrariesProperty);
+    libraries = CreatePropertyStringList(kTypeLibraries);
   for (Lum_TlmLibrary const *library : *m_pLibrary) {
     unsigned version = 0;
     unsigned revision = 0;
@@ -173,16 +148,11 @@ bool Lum_TdmView::IsLocalLibrary(Lum_TlmLibrary const *library) {
 }
 
 void Lum_TdmView::GetDevicePic(PM_PIC &personality) const {
-  Orb_Property const *pm = GetPropertyByName(kDevicePmProperty);
-  Orb_Property const *part = GetPropertyByName(kDevicePartProperty);
-  if (!pm || !part) {
-    std::string const message =
-        std::string("The view has no ") + (pm ? kDevicePartProperty : kDevicePmProperty) +
-        " property: the device personality is needed to load its type libraries.";
+  if (char const *missing = Lum_TdmLoadRules::MissingDevice(GetOrbView()))
     throw Lum_ExceptionInvalidLibrary("Lum", kSourcePath, kRevision, __LINE__, GetName(),
-                                      message.c_str(), false);
-  }
-  personality = PM_PIC(pm->GetStringValue(), part->GetStringValue(), nullptr);
+                                      Lum_TdmLoadRules::NoDeviceMessage(missing).c_str(), false);
+  personality = PM_PIC(GetPropertyByName(kDevicePm)->GetStringValue(),
+                       GetPropertyByName(kDevicePart)->GetStringValue(), nullptr);
 }
 
 void Lum_TdmView::AppendLibrary(Lum_TlmLibrary const *library) const {
@@ -215,18 +185,15 @@ void Lum_TdmView::BuildLibraryList() const {
   // The personality is built only when a library has to be loaded.
   PM_PIC personality("", "", nullptr);
   bool havePersonality = false;
-  for (std::string const &text : LibraryEntries(GetPropertyByName(kLibrariesProperty))) {
-    // The name is the first field; leading blanks are skipped.
-    Port::StringBase<char> const entry(text);
-    std::size_t begin = 0;
-    std::size_t end = 0;
-    if (!entry.NextTokenRange(0, " ", begin, end)) {
+  for (std::string const &text :
+       Lum_TdmLoadRules::LibraryEntries(GetPropertyByName(kTypeLibraries))) {
+    std::string name;
+    if (!Lum_TdmLoadRules::LibraryName(text, name)) {
       Port_MsgManData::debugStub("Warning:  view <%s> lists a type library without a name; the "
                                  "entry is ignored.\n",
                                  GetName());
       continue;
     }
-    std::string const name = text.substr(begin, end - begin);
     if (name == Lum_TlmLibrary::LOCAL_LIBRARY_NAME) {
       AddLocalLibrary();
       continue;
@@ -317,10 +284,21 @@ void Lum_TdmView::CommitToOrb() {
 void Lum_TdmView::CommitAll() { TraverseAndCommitToOrb(); }
 
 void Lum_TdmView::TraverseAndCommitToOrb() {
-  CommitToOrb();
-  Lum_TdmCommitEach<Lum_TdmNetwork>(GetContext(), Orb_Kind::Network, GetOrbView()->GetNetworks());
-  if (Lum_TdmBlock *top = GetBlock())
-    top->TraverseAndCommitToOrb();
+  // Nothing is written unless the next open takes every block as stored.
+  Lum_TdmBlock *top = GetBlock();
+  if (top)
+    top->VerifyCommitTree();
+  m_CommitVerified = true;
+  try {
+    CommitToOrb();
+    Lum_TdmCommitEach<Lum_TdmNetwork>(GetContext(), Orb_Kind::Network, GetOrbView()->GetNetworks());
+    if (top)
+      top->TraverseAndCommitToOrb();
+  } catch (...) {
+    m_CommitVerified = false;
+    throw;
+  }
+  m_CommitVerified = false;
   if (Lum_TdmDesign::IsUserDesign(*GetOrbView()->GetParent()))
     GetParent()->TraverseAndCommitToOrb();
 }
@@ -335,17 +313,6 @@ std::uint64_t Lum_TdmView::DbgClassSize() const { return sizeof(Lum_TdmView); }
 std::uint64_t Lum_TdmView::DbgSecondarySize() const { return 0; }
 
 namespace {
-
-// The client of a host object read from a bridge table fetched once for the
-// whole walk; an object without one is specialized on the spot.
-template <class Client, class Host>
-Client const *MeasuredClient(Orb_Context *context, Orb_BridgeHandle const &bridge, Host *object) {
-  Orb_ClientObject *client = bridge[object->GetBridgeId()];
-  if (!client)
-    client = context->Specialize(object);
-  assert(client && "the client model made no client for a host object");
-  return static_cast<Client const *>(client);
-}
 
 // Adds one object of `bytes` to a kind's counters and to the total.
 void Count(std::uint64_t bytes, std::uint64_t &kindBytes, std::uint64_t &kindCount,
@@ -376,17 +343,18 @@ std::uint64_t Lum_TdmView::DbgGetSize(std::uint64_t &blockBytes, std::uint64_t &
     auto const *block = static_cast<Lum_TdmBlock const *>(hostBlock);
     Count(block->DbgMySize(), blockBytes, blockCount, total);
     for (Orb_Pin *pin : block->GetPins())
-      Count(MeasuredClient<Lum_TdmPin>(context, pins, pin)->DbgMySize(), pinBytes, pinCount, total);
+      Count(Lum_TdmClient::Of<Lum_TdmPin>(context, pins, pin)->DbgMySize(), pinBytes, pinCount,
+            total);
   }
 
   // Signals are counted through their networks.
   Orb_BridgeHandle const networks = context->GetBridgeHandle(Orb_Kind::Network);
   Orb_BridgeHandle const signals = context->GetBridgeHandle(Orb_Kind::Signal);
   for (Orb_Network *network : GetNetworks()) {
-    Count(MeasuredClient<Lum_TdmNetwork>(context, networks, network)->DbgMySize(), networkBytes,
+    Count(Lum_TdmClient::Of<Lum_TdmNetwork>(context, networks, network)->DbgMySize(), networkBytes,
           networkCount, total);
     for (Orb_Signal *signal : network->GetSignals())
-      Count(MeasuredClient<Lum_TdmSignal>(context, signals, signal)->DbgMySize(), signalBytes,
+      Count(Lum_TdmClient::Of<Lum_TdmSignal>(context, signals, signal)->DbgMySize(), signalBytes,
             signalCount, total);
   }
   return total;

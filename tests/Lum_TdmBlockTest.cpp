@@ -2,6 +2,7 @@
 
 #include "Lum_TdmTestSupport.h"
 
+#include "Lum_TdmSchema.h"
 #include "Lum_TdmTypePinMap.h"
 #include "Lum_TlmTypeID.h"
 #include "Ora_GraftMgr.h"
@@ -10,6 +11,7 @@
 #include <gtest/gtest.h>
 
 #include <cstring>
+#include <functional>
 #include <map>
 #include <optional>
 #include <regex>
@@ -76,14 +78,14 @@ protected:
   std::string WriteDesign(StoredBlock const &stored, bool dontCreatePins = false,
                           bool withLocalLibrary = false) {
     TypedDesign design;
-    Orb_Property *libs = design.m_pView->CreatePropertyStringList("TDS_VIEW_TYPE_LIBS");
+    Orb_Property *libs = design.m_pView->CreatePropertyStringList(Lum_TdmSchema::kTypeLibraries);
     libs->AppendString("LIBT 2.1");
     if (withLocalLibrary) {
       libs->AppendString(Lum_TlmLibrary::LOCAL_LIBRARY_NAME);
       Lum_TlmLibrary::GetLocalLibrary(design.Host(), PM_PIC("pm1", "part1", nullptr));
     }
     if (dontCreatePins)
-      design.m_pView->CreatePropertyString("LUM_DONT_CREATE_UNUSED_PINS", "");
+      design.m_pView->CreatePropertyString(Lum_TdmSchema::kDontCreateUnusedPins, "");
     Lum_TdmBlock *top = design.m_pView->CreateTopBlock("top");
     Lum_TdmSignal *signal = top->CreateSignal("s");
     Lum_TdmBlock *u1 = top->CreateBlock("u1", 0);
@@ -93,9 +95,9 @@ protected:
         pin->GetOrbPin()->Connect(signal->GetOrbSignal());
     }
     if (stored.type)
-      u1->CreatePropertyString("TDS_BLOCK_TYPE", stored.type);
+      u1->CreatePropertyString(Lum_TdmSchema::kBlockType, stored.type);
     if (!stored.pinMap.empty()) {
-      Orb_Property *pinMap = u1->CreatePropertyList("TDS_BLOCK_PIN_MAP");
+      Orb_Property *pinMap = u1->CreatePropertyList(Lum_TdmSchema::kBlockPinMap);
       for (auto const &[name, value] : stored.pinMap)
         pinMap->CreatePropertyString(name, value);
     }
@@ -127,8 +129,8 @@ TEST_F(TdmBlockTest, TypedDesignSurvivesSaveAndReopen) {
   EXPECT_EQ(u1->GetPinByName("EN")->GetDirection(), Orb_Pin::PIN_BIDIRECTIONAL);
   Lum_TdmView *view = FirstView(*model);
   view->CommitAll();
-  EXPECT_EQ(PropertyValue(u1, "TDS_BLOCK_TYPE"), "LIBT:REG");
-  EXPECT_EQ(Members(u1, "TDS_BLOCK_PIN_MAP"), "DATA0=D0|DATA1=D1");
+  EXPECT_EQ(PropertyValue(u1, Lum_TdmSchema::kBlockType), "LIBT:REG");
+  EXPECT_EQ(Members(u1, Lum_TdmSchema::kBlockPinMap), "DATA0=D0|DATA1=D1");
   std::string const once = m_Dir.File("once.odb"), twice = m_Dir.File("twice.odb");
   model->Save(once.c_str());
   view->CommitAll();
@@ -143,22 +145,22 @@ TEST_F(TdmBlockTest, UntypedBlocksCarryNoTyping) {
   TypedDesign design;
   Lum_TdmModel &model = design.Model();
   Orb_Block *hostChild = design.m_pView->CreateTopBlock("top")->GetOrbBlock()->CreateBlock("c", 0);
-  for (char const *name : {"TDS_BLOCK_TYPE", "TDS_LIBRARY_ASSOC"})
+  for (char const *name : {Lum_TdmSchema::kBlockType, Lum_TdmSchema::kLibraryAssociation})
     hostChild->CreatePropertyString(name, "LIBT:REG");
-  hostChild->CreatePropertyList("TDS_BLOCK_PIN_MAP")->CreatePropertyString("P", "D0");
+  hostChild->CreatePropertyList(Lum_TdmSchema::kBlockPinMap)->CreatePropertyString("P", "D0");
   hostChild->CreatePin("P", Orb_Pin::PIN_INPUT);
   delete model.GetClient(hostChild);
   model.FireSpecialize(hostChild, true);
   auto *child = static_cast<Lum_TdmBlock *>(model.GetClient(hostChild));
-  EXPECT_EQ(PropertyValue(child, "TDS_BLOCK_TYPE"), "<absent>");
-  EXPECT_EQ(Members(child, "TDS_BLOCK_PIN_MAP"), "<absent>");
-  EXPECT_EQ(PropertyValue(child, "TDS_LIBRARY_ASSOC"), "LIBT:REG");
+  EXPECT_EQ(PropertyValue(child, Lum_TdmSchema::kBlockType), "<absent>");
+  EXPECT_EQ(Members(child, Lum_TdmSchema::kBlockPinMap), "<absent>");
+  EXPECT_EQ(PropertyValue(child, Lum_TdmSchema::kLibraryAssociation), "LIBT:REG");
   auto loaded = OpenModel(WriteDesign({nullptr, {{"P", true}}, {{"P", "D0"}}}));
   Lum_TdmBlock *u1 = U1(*loaded);
   EXPECT_EQ(PinText(u1), "P!");
-  u1->CreatePropertyString("TDS_BLOCK_TYPE", "LIBT:REG");
+  u1->CreatePropertyString(Lum_TdmSchema::kBlockType, "LIBT:REG");
   FirstView(*loaded)->CommitAll();
-  EXPECT_EQ(Members(u1, "TDS_BLOCK_PIN_MAP") + PropertyValue(u1, "TDS_BLOCK_TYPE"),
+  EXPECT_EQ(Members(u1, Lum_TdmSchema::kBlockPinMap) + PropertyValue(u1, Lum_TdmSchema::kBlockType),
             "<absent><absent>");
 }
 
@@ -187,7 +189,7 @@ TEST_F(TdmBlockTest, ReconciledPinsEndAsExpected) {
     Lum_TdmBlock *u1 = U1(*model);
     EXPECT_EQ(PinText(u1), c.pins);
     FirstView(*model)->CommitAll();
-    EXPECT_EQ(Members(u1, "TDS_BLOCK_PIN_MAP"), c.members);
+    EXPECT_EQ(Members(u1, Lum_TdmSchema::kBlockPinMap), c.members);
   }
 }
 
@@ -300,10 +302,10 @@ TEST(TdmCommitOrderTest, CommitWalksInOrderRebuildingDiscardedClients) {
   EXPECT_EQ(g_Commits, "netlist,N1,N2,T,P1,S1,C1,Q1,C2,top");
   EXPECT_NE(dynamic_cast<Recording<Lum_TdmBlock> *>(model.GetClient(c1)), nullptr);
   g_Commits.clear();
-  design.m_pDesign->CreatePropertyString("TDS_DESIGN_TYPE", "OTHER");
+  design.m_pDesign->CreatePropertyString(Lum_TdmSchema::kDesignType, "OTHER");
   view->CommitAll();
   EXPECT_EQ(g_Commits, "netlist,N1,N2,T,P1,S1,C1,Q1,C2") << "a foreign design is not committed";
-  EXPECT_EQ(PropertyValue(design.m_pDesign, "TDS_DESIGN_TYPE"), "OTHER");
+  EXPECT_EQ(PropertyValue(design.m_pDesign, Lum_TdmSchema::kDesignType), "OTHER");
 }
 
 int g_Inits = 0;
@@ -352,9 +354,10 @@ protected:
     hier->CreatePin("D0", Orb_Pin::PIN_INPUT)->GetOrbPin()->ConnectInner(n1->GetOrbSignal());
     Lum_TlmBlock *a1 = hier->CreateBlock("a1", 0);
     a1->CreatePin("A", Orb_Pin::PIN_INPUT)->GetOrbPin()->Connect(n1->GetOrbSignal());
-    a1->CreatePropertyString("TDS_BLOCK_TYPE", "LIBC:AND");
+    a1->CreatePropertyString(Lum_TdmSchema::kBlockType, "LIBC:AND");
 
-    m_Design.m_pView->CreatePropertyStringList("TDS_VIEW_TYPE_LIBS")->AppendString("LIBC 1.0");
+    m_Design.m_pView->CreatePropertyStringList(Lum_TdmSchema::kTypeLibraries)
+        ->AppendString("LIBC 1.0");
     m_pTop = m_Design.m_pView->CreateTopBlock("top");
   }
 
@@ -445,13 +448,13 @@ TEST_F(TdmCallerTest, UntypedCopy) {
   EXPECT_EQ(PinText(u), "D0!,D1!,CLK!,Q!");
   EXPECT_EQ(PropertyValue(u->GetPinByName("D0"), "LOC"), "P1");
   EXPECT_NE(u->GetBlockByName("a1"), nullptr);
-  std::string const association = PropertyValue(u, "TDS_LIBRARY_ASSOC");
+  std::string const association = PropertyValue(u, Lum_TdmSchema::kLibraryAssociation);
   EXPECT_TRUE(std::regex_match(association,
                                std::regex("LIBC:REG \\d{4}-\\d\\d-\\d\\dT\\d\\d:\\d\\d:\\d\\dZ")))
       << association;
   EXPECT_EQ(g_Inits, 0);
   m_Design.m_pView->CommitAll();
-  EXPECT_EQ(PropertyValue(u, "TDS_LIBRARY_ASSOC"), association);
+  EXPECT_EQ(PropertyValue(u, Lum_TdmSchema::kLibraryAssociation), association);
 }
 
 // Adds AND2 (A, B, Y, Z) and a wire.
@@ -518,7 +521,7 @@ TEST_F(TdmRebindTest, FailuresChangeNothing) {
     if (Lum_TdmPin *a = v->GetPinByName("A"))
       a->GetOrbPin()->Connect(m_pWire);
     if (c.stored.first)
-      v->CreatePropertyList("TDS_BLOCK_PIN_MAP")
+      v->CreatePropertyList(Lum_TdmSchema::kBlockPinMap)
           ->CreatePropertyString(c.stored.first, c.stored.second);
     std::string const before = State(v);
     int const inits = g_Inits;
@@ -543,7 +546,7 @@ TEST_F(TdmRebindTest, RebindingSurvivesReopen) {
   EXPECT_EQ(g_Inits, 1);
   Lum_TdmBlock *u = AndChild("u");
   m_Design.m_pView->CommitAll();
-  ASSERT_EQ(PropertyValue(u, "TDS_BLOCK_TYPE"), "LIBC:AND");
+  ASSERT_EQ(PropertyValue(u, Lum_TdmSchema::kBlockType), "LIBC:AND");
   u->SetTypeBlock(nullptr, Lum_TdmTypePinMap());
   EXPECT_EQ(State(u), "- A=- B=- Y=-");
   EXPECT_EQ(g_Inits, 3);
@@ -569,7 +572,94 @@ TEST_F(TdmRebindTest, RebindingSurvivesReopen) {
   EXPECT_EQ(State(top->GetBlockByName("x")), "AND2 A=AND2.A B=AND2.B Y=AND2.Y X=-");
   EXPECT_EQ(State(top->GetBlockByName("empty")), "EMPTY");
   EXPECT_EQ(State(top->GetBlockByName("u")), "- A=- B=- Y=-");
-  EXPECT_EQ(PropertyValue(top->GetBlockByName("u"), "TDS_BLOCK_TYPE"), "<absent>");
+  EXPECT_EQ(PropertyValue(top->GetBlockByName("u"), Lum_TdmSchema::kBlockType), "<absent>");
+}
+
+// What would make the next open refuse a saved design is refused before anything changes: a
+// rebind through a map (at the call), a pin connected or deleted after the binding (at the
+// commit, of the view or of the block alone, which then writes nothing: not even the rebinding
+// of the sibling it reaches first). Once mended, the design commits and reopens.
+TEST_F(TdmRebindTest, NothingSavedIsRefusedByTheNextOpen) {
+  Lum_TlmBlock *ab = m_Library.AddTypeBlock("AB", {"A", "B"});
+  Lum_TlmBlock *abc = m_Library.AddTypeBlock("ABC3", {"A", "B", "C"});
+  auto const to = [abc](char const *name) { return abc->GetPinByName(name); };
+  auto const and2 = [this](char const *name) { return m_pAnd2->GetPinByName(name); };
+  auto const collision = [](char const *kind, char const *type) {
+    return std::string(kind) +
+           "|A|Pin <A> of block <c> holds the name of type pin <A> of type block <" + type +
+           ">, which no pin is bound to: the next open would have to create that type pin and "
+           "could not. Bind a pin to <A>, rename pin <A>, or give the block every pin of its type "
+           "block.";
+  };
+  std::string const unmatched =
+      "InvalidTypeBlock|X|Pin <X> of block <c> is connected but has no type pin of type block "
+      "<AND>: the next open would refuse it. Bind it to a type pin (SetTypeBlock with a pin map), "
+      "rename it after a type pin, or leave it unconnected.";
+  auto const connectX = [this](Lum_TdmBlock *c) {
+    c->CreatePin("X", Orb_Pin::PIN_INPUT)->GetOrbPin()->Connect(m_pWire);
+  };
+  auto const deleteX = [](Lum_TdmBlock *c) { c->DeletePin(c->GetPinByName("X")->GetOrbPin()); };
+  auto const commitView = [this](Lum_TdmBlock *) { m_Design.m_pView->CommitAll(); };
+  struct Case {
+    char const *what;
+    std::function<void(Lum_TdmBlock *)> prepare, refused, mend;
+    std::string failure;
+  } const cases[] = {
+      {"rebind A>B, B>C leaves A untaken",
+       [&](Lum_TdmBlock *c) {
+         c->SetTypeBlock(nullptr);
+         c->DeletePin(c->GetPinByName("Y")->GetOrbPin());
+         c->SetTypeBlock(ab);
+       },
+       [&](Lum_TdmBlock *c) {
+         c->SetTypeBlock(abc, Map({{"A", to("B")}, {"B", to("C")}}));
+       },
+       [&](Lum_TdmBlock *c) {
+         c->SetTypeBlock(abc, Map({{"A", to("A")}, {"B", to("B")}}));
+       },
+       collision("CorruptDatabase", "ABC3")},
+      {"pin added and connected after binding", connectX, commitView, deleteX, unmatched},
+      {"the same, committing the block alone", connectX,
+       [this](Lum_TdmBlock *) { m_pTop->TraverseAndCommitToOrb(); }, deleteX, unmatched},
+      {"pin deleted after a rebind A>B, B>Y, Y>A",
+       [&](Lum_TdmBlock *c) {
+         c->CreatePin("Z", Orb_Pin::PIN_INPUT);
+         c->SetTypeBlock(
+             m_pAnd2,
+             Map({{"A", and2("B")}, {"B", and2("Y")}, {"Y", and2("A")}, {"Z", and2("Z")}}));
+         m_Design.m_pView->CommitAll();
+         c->DeletePin(c->GetPinByName("Y")->GetOrbPin());
+       },
+       commitView,
+       [&](Lum_TdmBlock *c) {
+         c->CreatePin("Y", Orb_Pin::PIN_INPUT);
+         c->SetTypeBlock(nullptr);
+         c->SetTypeBlock(
+             m_pAnd2,
+             Map({{"A", and2("B")}, {"B", and2("Y")}, {"Y", and2("A")}, {"Z", and2("Z")}}));
+       },
+       collision("InvalidTypeBlock", "AND2")},
+  };
+  for (Case const &test : cases) {
+    SCOPED_TRACE(test.what);
+    Lum_TdmBlock *d = AndChild("d");
+    Lum_TdmBlock *c = AndChild("c");
+    m_Design.m_pView->CommitAll();
+    test.prepare(c);
+    d->SetTypeBlock(m_pAnd2);
+    std::string const state = State(c);
+    EXPECT_EQ(Failure([&] { test.refused(c); }), test.failure);
+    EXPECT_EQ(State(c), state);
+    EXPECT_EQ(PropertyValue(d, Lum_TdmSchema::kBlockType), "LIBC:AND");
+    test.mend(c);
+    m_Design.m_pView->CommitAll();
+    auto reopened = SaveAndReopen(Model(), m_Dir.File("mended.odb"));
+    Lum_TdmBlock *top = FirstView(*reopened)->GetBlock();
+    EXPECT_EQ(State(top->GetBlockByName("d")), "AND2 A=AND2.A B=AND2.B Y=AND2.Y Z=AND2.Z");
+    EXPECT_STREQ(top->GetBlockByName("c")->GetTypeBlock()->GetName(), c->GetTypeBlock()->GetName());
+    m_pTop->DeleteBlock(d->GetOrbBlock());
+    m_pTop->DeleteBlock(c->GetOrbBlock());
+  }
 }
 
 // Children and pins by type and by identifier; the block's own type, resolved per context.

@@ -4,6 +4,7 @@
 
 #include "Lum_TdmTypePinMap.h"
 
+#include "Lum_TdmSchema.h"
 #include "Orb_Debug.h"
 #include "Port_Stream.h"
 
@@ -90,15 +91,15 @@ TEST_F(TdmDbgTest, ClassLinesAndTheDesignMark) {
   EXPECT_THAT(capture.Take(), HasSubstr(R + "Data for class <Lum_TdmNetwork>:\n" + R));
 
   Lum_TdmDesign *d = design.m_pDesign;
-  for (char const *mark : {"TDS_DESIGN_TYPE_USER", "", "FOREIGN"}) {
-    std::string const shown = *mark ? mark : "TDS_DESIGN_TYPE_USER";
-    d->DeleteProperty("TDS_DESIGN_TYPE");
+  for (char const *mark : {Lum_TdmSchema::kDesignTypeUser, "", "FOREIGN"}) {
+    std::string const shown = *mark ? mark : Lum_TdmSchema::kDesignTypeUser;
+    d->DeleteProperty(Lum_TdmSchema::kDesignType);
     if (*mark)
-      d->CreatePropertyString("TDS_DESIGN_TYPE", mark);
+      d->CreatePropertyString(Lum_TdmSchema::kDesignType, mark);
     d->Dbg();
     EXPECT_THAT(capture.Take(), HasSubstr("Design type = <" + shown + ">\n")) << mark;
     EXPECT_THAT(HostDump(d->GetOrbDesign()), HasSubstr("Design type = <" + shown + ">\n")) << mark;
-    EXPECT_EQ(PropertyValue(d, "TDS_DESIGN_TYPE"), *mark ? mark : "<absent>");
+    EXPECT_EQ(PropertyValue(d, Lum_TdmSchema::kDesignType), *mark ? mark : "<absent>");
   }
 }
 
@@ -107,10 +108,10 @@ TEST_F(TdmDbgTest, ViewShowsItsLibraryListOnceBuilt) {
   std::unique_ptr<Lum_TdmModel> model;
   {
     TypedDesign design;
-    Orb_Property *libs = design.m_pView->CreatePropertyStringList("TDS_VIEW_TYPE_LIBS");
+    Orb_Property *libs = design.m_pView->CreatePropertyStringList(Lum_TdmSchema::kTypeLibraries);
     libs->AppendString("LIBE");
     libs->AppendString("LIBD");
-    design.m_pView->CreatePropertyString("TDS_TDM_VERSION", "2.5");
+    design.m_pView->CreatePropertyString(Lum_TdmSchema::kVersion, "2.5");
     model = SaveAndReopen(design.Model(), m_Dir.File("v.odb"));
   }
   Lum_TdmView *view = FirstView(*model);
@@ -137,11 +138,12 @@ TEST_F(TdmDbgTest, TypesAndCallbackDumps) {
   std::unique_ptr<Lum_TdmModel> model;
   {
     TypedDesign design;
-    design.m_pView->CreatePropertyStringList("TDS_VIEW_TYPE_LIBS")->AppendString("LIBD 1.0");
+    design.m_pView->CreatePropertyStringList(Lum_TdmSchema::kTypeLibraries)
+        ->AppendString("LIBD 1.0");
     Lum_TdmBlock *u1 = design.m_pView->CreateTopBlock("top")->CreateBlock("u1", 0);
     u1->CreatePin("A", Orb_Pin::PIN_INPUT);
     u1->CreatePin("B", Orb_Pin::PIN_INPUT);
-    u1->CreatePropertyString("TDS_BLOCK_TYPE", "LIBD:AND2");
+    u1->CreatePropertyString(Lum_TdmSchema::kBlockType, "LIBD:AND2");
     model = SaveAndReopen(design.Model(), m_Dir.File("typed.odb"));
   }
   Lum_TdmView *view = FirstView(*model);

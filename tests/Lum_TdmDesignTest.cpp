@@ -1,5 +1,6 @@
 // The design mark: written on creation and at commit, checked on load.
 
+#include "Lum_TdmSchema.h"
 #include "Lum_TdmTestSupport.h"
 
 #include <gtest/gtest.h>
@@ -18,19 +19,21 @@ protected:
 // marks it, and the mark is stored.
 TEST_F(TdmDesignTest, NewDesignIsMarkedAndUnmarkedOneMarkedByCommit) {
   TypedDesign design;
-  EXPECT_EQ(PropertyValue(design.m_pDesign, "TDS_DESIGN_TYPE"), "TDS_DESIGN_TYPE_USER");
+  EXPECT_EQ(PropertyValue(design.m_pDesign, Lum_TdmSchema::kDesignType),
+            Lum_TdmSchema::kDesignTypeUser);
   EXPECT_TRUE(design.m_pDesign->IsUserDesign());
-  design.m_pDesign->DeleteProperty("TDS_DESIGN_TYPE");
+  design.m_pDesign->DeleteProperty(Lum_TdmSchema::kDesignType);
   auto reopened = SaveAndReopen(design.Model(), m_Dir.File("unmarked.odb"));
   Lum_TdmView *view = FirstView(*reopened);
   Lum_TdmDesign *loaded = view->GetParent();
-  EXPECT_EQ(PropertyValue(loaded, "TDS_DESIGN_TYPE"), "<absent>") << "loading writes nothing";
+  EXPECT_EQ(PropertyValue(loaded, Lum_TdmSchema::kDesignType), "<absent>")
+      << "loading writes nothing";
   EXPECT_TRUE(loaded->IsUserDesign());
   view->CommitAll();
-  EXPECT_EQ(PropertyValue(loaded, "TDS_DESIGN_TYPE"), "TDS_DESIGN_TYPE_USER");
+  EXPECT_EQ(PropertyValue(loaded, Lum_TdmSchema::kDesignType), Lum_TdmSchema::kDesignTypeUser);
   auto again = SaveAndReopen(*reopened, m_Dir.File("d2.odb"));
-  EXPECT_EQ(PropertyValue(FirstView(*again)->GetParent(), "TDS_DESIGN_TYPE"),
-            "TDS_DESIGN_TYPE_USER");
+  EXPECT_EQ(PropertyValue(FirstView(*again)->GetParent(), Lum_TdmSchema::kDesignType),
+            Lum_TdmSchema::kDesignTypeUser);
 }
 
 // A mark given before the library's creation event is kept, even a foreign
@@ -39,29 +42,29 @@ TEST_F(TdmDesignTest, ExistingMarkIsNeverOverwritten) {
   Orb_Model host("h", "h", "", false);
   EarlierSubscriber first(&host);
   first.m_OnDesign = [](Orb_Design *design) {
-    design->CreatePropertyString("TDS_DESIGN_TYPE", "TDS_DESIGN_TYPE_LIBRARY");
+    design->CreatePropertyString(Lum_TdmSchema::kDesignType, Lum_TdmSchema::kDesignTypeLibrary);
   };
   Lum_TdmModel model(&host);
   Port_MsgCapture capture;
   Orb_Design *design = host.CreateDesignMgr("dm")->CreateDesign("d");
   ASSERT_NE(model.GetClient(design), nullptr);
-  EXPECT_STREQ(design->GetPropertyByName("TDS_DESIGN_TYPE")->GetStringValue(),
-               "TDS_DESIGN_TYPE_LIBRARY");
+  EXPECT_STREQ(design->GetPropertyByName(Lum_TdmSchema::kDesignType)->GetStringValue(),
+               Lum_TdmSchema::kDesignTypeLibrary);
   EXPECT_TRUE(capture.GetReports().empty());
   EXPECT_FALSE(Lum_TdmDesign::IsUserDesign(*design));
 }
 
-// Any mark other than exactly "TDS_DESIGN_TYPE_USER" is refused on load, and
+// Any mark other than exactly Lum_TdmSchema::kDesignTypeUser is refused on load, and
 // the refused open leaves no client and no host object behind.
 TEST_F(TdmDesignTest, LoadRefusesForeignMarks) {
-  for (char const *mark : {"TDS_DESIGN_TYPE_LIBRARY", "", "tds_design_type_user",
+  for (char const *mark : {Lum_TdmSchema::kDesignTypeLibrary, "", "tds_design_type_user",
                            "TDS_DESIGN_TYPE_USER ", " TDS_DESIGN_TYPE_USER"}) {
     SCOPED_TRACE(std::string("mark <") + mark + ">");
     std::string const path = m_Dir.File("d.odb");
     {
       TypedDesign design;
       design.m_pView->CreateTopBlock("top")->CreatePin("p", Orb_Pin::PIN_INPUT);
-      design.m_pDesign->CreatePropertyString("TDS_DESIGN_TYPE", mark);
+      design.m_pDesign->CreatePropertyString(Lum_TdmSchema::kDesignType, mark);
       design.Model().Save(path.c_str());
     }
     Lum_TdmModel reopened("r", "r", "");
@@ -84,10 +87,10 @@ TEST_F(TdmDesignTest, LoadRefusesForeignMarks) {
 TEST_F(TdmDesignTest, StaticTestsNeedNoClient) {
   Orb_Model host("h", "h", "", false);
   Orb_Design *design = host.CreateDesignMgr("dm")->CreateDesign("d");
-  for (char const *mark : {"", "TDS_DESIGN_TYPE_LIBRARY", "TDS_DESIGN_TYPE_USER"}) {
+  for (char const *mark : {"", Lum_TdmSchema::kDesignTypeLibrary, Lum_TdmSchema::kDesignTypeUser}) {
     if (*mark)
-      design->CreatePropertyString("TDS_DESIGN_TYPE", mark);
-    bool const library = std::string(mark) == "TDS_DESIGN_TYPE_LIBRARY";
+      design->CreatePropertyString(Lum_TdmSchema::kDesignType, mark);
+    bool const library = std::string(mark) == Lum_TdmSchema::kDesignTypeLibrary;
     EXPECT_EQ(Lum_TdmDesign::IsUserDesign(*design), !library) << mark;
     EXPECT_EQ(Lum_TdmDesign::IsTypeBlockDesign(*design), library) << mark;
   }

@@ -5,6 +5,7 @@
 
 #include "Lum_TdmTestSupport.h"
 
+#include "Lum_TdmSchema.h"
 #include "Lum_Tlm.h"
 #include "Ora_GraftMgr.h"
 
@@ -36,7 +37,8 @@ public:
     Lum_TlmCatalog::AddSearchDirectory(m_Dir.Path().c_str());
 
     TypedDesign design;
-    Orb_Property *libraries = design.m_pView->CreatePropertyStringList("TDS_VIEW_TYPE_LIBS");
+    Orb_Property *libraries =
+        design.m_pView->CreatePropertyStringList(Lum_TdmSchema::kTypeLibraries);
     libraries->AppendString("LIBT 2.1");
     libraries->AppendString("CELLS 1.0");
     libraries->AppendString(Lum_TlmLibrary::LOCAL_LIBRARY_NAME);
@@ -49,18 +51,18 @@ public:
     Lum_TdmBlock *u1 = top->CreateBlock("u1", 0);
     for (char const *name : {"DATA0", "CLK"})
       u1->CreatePin(name, Orb_Pin::PIN_INPUT)->GetOrbPin()->Connect(signal->GetOrbSignal());
-    u1->CreatePropertyString("TDS_BLOCK_TYPE", "LIBT:REG");
-    u1->CreatePropertyList("TDS_BLOCK_PIN_MAP")->CreatePropertyString("DATA0", "D0");
+    u1->CreatePropertyString(Lum_TdmSchema::kBlockType, "LIBT:REG");
+    u1->CreatePropertyList(Lum_TdmSchema::kBlockPinMap)->CreatePropertyString("DATA0", "D0");
     Lum_TdmBlock *u2 = top->CreateBlock("u2", 0);
     u2->CreatePin("A", Orb_Pin::PIN_INPUT)->GetOrbPin()->Connect(signal->GetOrbSignal());
-    u2->CreatePropertyString("TDS_BLOCK_TYPE", "CELLS:NAND");
+    u2->CreatePropertyString(Lum_TdmSchema::kBlockType, "CELLS:NAND");
     Lum_TdmBlock *u3 = top->CreateBlock("u3", 0);
-    u3->CreatePropertyString("TDS_BLOCK_TYPE",
+    u3->CreatePropertyString(Lum_TdmSchema::kBlockType,
                              (std::string(Lum_TlmLibrary::LOCAL_LIBRARY_NAME) + ":LOC").c_str());
     Lum_TdmBlock *u4 = top->CreateBlock("u4", 0);
     u4->CreatePin("D0", Orb_Pin::PIN_INPUT);
     Ora_GraftMgr(false, false).Graft(hier->GetOrbBlock(), u4->GetOrbBlock());
-    u4->CreatePropertyString("TDS_BLOCK_TYPE", "LIBT:REG");
+    u4->CreatePropertyString(Lum_TdmSchema::kBlockType, "LIBT:REG");
     design.m_pDesign->CreateView("schematic")->CreateTopBlock("s");
     design.Model().Save(Path().c_str());
   }

@@ -14,6 +14,7 @@
 #include "Lum_TdmView.h"
 
 #include "Lum_Exception.h"
+#include "Lum_TdmSchema.h"
 #include "Lum_Tlm.h"
 #include "Port_MsgManData.h"
 
@@ -88,8 +89,8 @@ struct TypedDesign {
     m_pDesignMgr = m_Model->CreateDesignMgr("dm");
     m_pDesign = m_pDesignMgr->CreateDesign("top");
     m_pView = m_pDesign->CreateView("netlist");
-    m_pView->CreatePropertyString("TDS_DEVICE_PM", "pm1");
-    m_pView->CreatePropertyString("TDS_DEVICE_PART", "part1");
+    m_pView->CreatePropertyString(Lum_TdmSchema::kDevicePm, "pm1");
+    m_pView->CreatePropertyString(Lum_TdmSchema::kDevicePart, "part1");
   }
 
   Lum_TdmModel &Model() { return *m_Model; }

@@ -3,6 +3,7 @@
 #include "Lum_TdmTestSupport.h"
 
 #include "Lum_Exception.h"
+#include "Lum_TdmSchema.h"
 #include "Lum_TlmTypeID.h"
 #include "Port_Stream.h"
 
@@ -58,32 +59,32 @@ TEST_F(TdmViewStampTest, NewViewIsStamped) {
   Orb_Model host("h", "h", "", false);
   EarlierSubscriber first(&host);
   first.m_OnView = [](Orb_View *view) {
-    view->CreatePropertyString("LUM_DONT_CREATE_UNUSED_PINS", "yes");
+    view->CreatePropertyString(Lum_TdmSchema::kDontCreateUnusedPins, "yes");
   };
   Lum_TdmModel model(&host);
   Orb_View *hostView = host.CreateDesignMgr("dm")->CreateDesign("d")->CreateView("v");
   auto *view = static_cast<Lum_TdmView *>(model.GetClient(hostView));
-  EXPECT_EQ(PropertyValue(view, "TDS_TDM_VERSION"), "3.1");
-  EXPECT_EQ(view->GetPropertyByName("LUM_DONT_CREATE_UNUSED_PINS"), nullptr);
-  EXPECT_EQ(view->GetPropertyByName("TDS_VIEW_TYPE_LIBS"), nullptr);
+  EXPECT_EQ(PropertyValue(view, Lum_TdmSchema::kVersion), "3.1");
+  EXPECT_EQ(view->GetPropertyByName(Lum_TdmSchema::kDontCreateUnusedPins), nullptr);
+  EXPECT_EQ(view->GetPropertyByName(Lum_TdmSchema::kTypeLibraries), nullptr);
 }
 
 // An older stamp stays until the commit, which writes the current one.
 TEST_F(TdmViewStampTest, CommitRewritesAnOlderStamp) {
   TypedDesign design;
-  design.m_pView->CreatePropertyString("TDS_TDM_VERSION", "2.5");
-  design.m_pView->CreatePropertyString("LUM_DONT_CREATE_UNUSED_PINS", "");
+  design.m_pView->CreatePropertyString(Lum_TdmSchema::kVersion, "2.5");
+  design.m_pView->CreatePropertyString(Lum_TdmSchema::kDontCreateUnusedPins, "");
   auto reopened = SaveAndReopen(design.Model(), m_Dir.File("d.odb"));
   Lum_TdmView *view = FirstView(*reopened);
-  EXPECT_EQ(PropertyValue(view, "TDS_TDM_VERSION"), "2.5");
-  EXPECT_NE(view->GetPropertyByName("LUM_DONT_CREATE_UNUSED_PINS"), nullptr);
+  EXPECT_EQ(PropertyValue(view, Lum_TdmSchema::kVersion), "2.5");
+  EXPECT_NE(view->GetPropertyByName(Lum_TdmSchema::kDontCreateUnusedPins), nullptr);
   view->CommitAll();
-  EXPECT_EQ(view->GetPropertyByName("LUM_DONT_CREATE_UNUSED_PINS"), nullptr);
+  EXPECT_EQ(view->GetPropertyByName(Lum_TdmSchema::kDontCreateUnusedPins), nullptr);
   unsigned version = 0, revision = 0;
   view->GetTdmLoadedDesignVersion(version, revision);
   EXPECT_EQ(version * 10 + revision, 25u);
   auto again = SaveAndReopen(*reopened, m_Dir.File("d2.odb"));
-  EXPECT_EQ(PropertyValue(FirstView(*again), "TDS_TDM_VERSION"), "3.1");
+  EXPECT_EQ(PropertyValue(FirstView(*again), Lum_TdmSchema::kVersion), "3.1");
 }
 
 // Each stored stamp is accepted with its numbers, or reported and refused as too old or too new.
@@ -104,9 +105,9 @@ TEST_F(TdmViewStampTest, LoadClassifiesTheStamp) {
     {
       TypedDesign design;
       if (c.stamp)
-        design.m_pView->CreatePropertyString("TDS_TDM_VERSION", c.stamp);
+        design.m_pView->CreatePropertyString(Lum_TdmSchema::kVersion, c.stamp);
       else
-        design.m_pView->DeleteProperty("TDS_TDM_VERSION");
+        design.m_pView->DeleteProperty(Lum_TdmSchema::kVersion);
       design.Model().Save(path.c_str());
     }
     Lum_TdmModel model("r", "r", "");
@@ -141,7 +142,7 @@ class TdmViewLibraryTest : public ::testing::Test {
 protected:
   HookedView *View() { return static_cast<HookedView *>(m_Design.m_pView); }
   void SetLibs(std::vector<char const *> const &entries) {
-    Orb_Property *libs = View()->CreatePropertyStringList("TDS_VIEW_TYPE_LIBS");
+    Orb_Property *libs = View()->CreatePropertyStringList(Lum_TdmSchema::kTypeLibraries);
     for (char const *entry : entries)
       libs->AppendString(entry);
   }
@@ -163,11 +164,12 @@ protected:
 
 // No TDS_VIEW_TYPE_LIBS: an empty list, no personality needed, an empty list written.
 TEST_F(TdmViewLibraryTest, AbsentListIsEmpty) {
-  View()->DeleteProperty("TDS_DEVICE_PM");
+  View()->DeleteProperty(Lum_TdmSchema::kDevicePm);
   EXPECT_EQ(View()->GetLibrary("LIBA"), nullptr);
   View()->CommitAll();
-  ASSERT_EQ(ListValue(View(), "TDS_VIEW_TYPE_LIBS"), "");
-  EXPECT_EQ(View()->GetPropertyByName("TDS_VIEW_TYPE_LIBS")->GetKind(), Orb_Property::STRING_LIST);
+  ASSERT_EQ(ListValue(View(), Lum_TdmSchema::kTypeLibraries), "");
+  EXPECT_EQ(View()->GetPropertyByName(Lum_TdmSchema::kTypeLibraries)->GetKind(),
+            Orb_Property::STRING_LIST);
 }
 
 // Entries match by exact first field; blanks warn; a duplicate counts twice; the commit writes
@@ -184,7 +186,7 @@ TEST_F(TdmViewLibraryTest, ListIsReadByNameAndWrittenInFull) {
   EXPECT_EQ(Lum_TlmCatalog::GetReferenceCount("LIBA"), 2u);
   EXPECT_EQ(Registrations("LIBA"), registered + 2);
   view->CommitAll();
-  EXPECT_EQ(ListValue(view, "TDS_VIEW_TYPE_LIBS"),
+  EXPECT_EQ(ListValue(view, Lum_TdmSchema::kTypeLibraries),
             "LIBA 1.2|LIBB 2.0 fast|LIBC 3.4 rev2|LIBD 7.11 q1 q2|LIBA 1.2");
   m_Reopened.reset();
   EXPECT_EQ(Lum_TlmCatalog::GetReferenceCount("LIBA"), 0u);
@@ -225,7 +227,7 @@ TEST_F(TdmViewLibraryTest, FailureMidListKeepsEarlierLibraries) {
   EXPECT_EQ(Lum_TlmCatalog::GetReferenceCount("LIBA"), 1u);
   // The commit keeps the stored list: writing the partial one would drop LIBC.
   view->CommitAll();
-  EXPECT_EQ(ListValue(view, "TDS_VIEW_TYPE_LIBS"), "LIBA|NOSUCHLIB|LIBC");
+  EXPECT_EQ(ListValue(view, Lum_TdmSchema::kTypeLibraries), "LIBA|NOSUCHLIB|LIBC");
   m_Reopened.reset();
   EXPECT_EQ(Lum_TlmCatalog::GetReferenceCount("LIBA"), 0u);
 }
@@ -246,7 +248,7 @@ TEST_F(TdmViewLibraryTest, ViewOutlivesItsLibraries) {
                                                                      PM_PIC("", "", nullptr)));
   EXPECT_EQ(Registrations(local), 0u);
   view->CommitAll();
-  EXPECT_EQ(ListValue(view, "TDS_VIEW_TYPE_LIBS"),
+  EXPECT_EQ(ListValue(view, Lum_TdmSchema::kTypeLibraries),
             std::string("DOOMED 1.0|") + local + " 1.0|LIBA 1.2");
   doomed.reset();
   m_Reopened.reset();
@@ -256,12 +258,13 @@ TEST_F(TdmViewLibraryTest, ViewOutlivesItsLibraries) {
 // Loading needs the device personality; its absence names the property.
 TEST_F(TdmViewLibraryTest, MissingPersonalityIsReported) {
   SetLibs({"LIBA"});
-  View()->DeleteProperty("TDS_DEVICE_PART");
+  View()->DeleteProperty(Lum_TdmSchema::kDevicePart);
   HookedView *view = Reopen();
   EXPECT_EQ(Failure([&] { view->CommitAll(); }),
             "InvalidLibrary|netlist|The view has no TDS_DEVICE_PART property: the device "
             "personality is needed to load its type libraries.");
-  EXPECT_EQ(ListValue(view, "TDS_VIEW_TYPE_LIBS"), "LIBA") << "a failed commit writes nothing";
+  EXPECT_EQ(ListValue(view, Lum_TdmSchema::kTypeLibraries), "LIBA")
+      << "a failed commit writes nothing";
 }
 
 // A block of class size 0.

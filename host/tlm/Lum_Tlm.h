@@ -6,6 +6,7 @@
 // top block of the design's view "type"; the design's other views with a top
 // block are the type block's hierarchies, keyed by view name.
 
+#include "Lum_TdmSchema.h"
 #include "Orb_Templates.h"
 #include "PM_PIC.h"
 #include "Port_String.h"
@@ -37,9 +38,9 @@ struct Lum_TlmTraits {
 // Names and values the component stores in its host models.
 namespace Lum_TlmNames {
 constexpr char const *kTypeViewName = "type";
-constexpr char const *kDesignTypeProperty = "TDS_DESIGN_TYPE";
-constexpr char const *kDesignTypeLibrary = "TDS_DESIGN_TYPE_LIBRARY";
-constexpr char const *kDesignTypeUser = "TDS_DESIGN_TYPE_USER";
+constexpr char const *kDesignTypeProperty = Lum_TdmSchema::kDesignType;
+constexpr char const *kDesignTypeLibrary = Lum_TdmSchema::kDesignTypeLibrary;
+constexpr char const *kDesignTypeUser = Lum_TdmSchema::kDesignTypeUser;
 constexpr char const *kVersionProperty = "TLM_VERSION";
 constexpr char const *kFirstQualifierProperty = "TLM_QUALIFIER_1";
 constexpr char const *kSecondQualifierProperty = "TLM_QUALIFIER_2";

@@ -15,6 +15,7 @@
 #include "Lum_TdmTypePinMap.h"
 #include "Lum_TdmView.h"
 
+#include "Lum_TdmSchema.h"
 #include "Lum_Tlm.h"
 #include "Orb_Model.h"
 #include "Port_Exception.h"
@@ -81,12 +82,12 @@ void WriteCores(std::string const &path) {
   inside->GetPinByName("B")->ConnectInner(b);
   inside->GetPinByName("Y")->ConnectInner(y);
   Orb_Block *g1 = inside->CreateBlock("g1");
-  g1->CreatePropertyString("TDS_BLOCK_TYPE", "GATES:NAND2");
+  g1->CreatePropertyString(Lum_TdmSchema::kBlockType, "GATES:NAND2");
   g1->CreatePin("A", Orb_Pin::PIN_INPUT)->Connect(a);
   g1->CreatePin("B", Orb_Pin::PIN_INPUT)->Connect(b);
   g1->CreatePin("Y", Orb_Pin::PIN_OUTPUT)->Connect(mid);
   Orb_Block *g2 = inside->CreateBlock("g2");
-  g2->CreatePropertyString("TDS_BLOCK_TYPE", "GATES:INV");
+  g2->CreatePropertyString(Lum_TdmSchema::kBlockType, "GATES:INV");
   g2->CreatePin("A", Orb_Pin::PIN_INPUT)->Connect(mid);
   g2->CreatePin("Y", Orb_Pin::PIN_OUTPUT)->Connect(y);
   library->Save(path.c_str());
@@ -134,10 +135,10 @@ Built WriteDesign(std::string const &path) {
   Lum_TdmModel model("demo", "demo", path.c_str());
   Lum_TdmDesign *design = model.CreateDesignMgr("demo")->CreateDesign("chip");
   Lum_TdmView *view = design->CreateView(kViewName);
-  view->CreatePropertyString("TDS_DEVICE_PM", kPersonality);
-  view->CreatePropertyString("TDS_DEVICE_PART", kPart);
+  view->CreatePropertyString(Lum_TdmSchema::kDevicePm, kPersonality);
+  view->CreatePropertyString(Lum_TdmSchema::kDevicePart, kPart);
   // The view loads its libraries from this list when first asked for one.
-  Orb_Property *libraries = view->CreatePropertyStringList("TDS_VIEW_TYPE_LIBS");
+  Orb_Property *libraries = view->CreatePropertyStringList(Lum_TdmSchema::kTypeLibraries);
   libraries->AppendString("GATES");
   libraries->AppendString("CORES");
   Lum_TlmBlock const *nand = TypeBlock(view, "GATES", "NAND2");

@@ -7,6 +7,7 @@
 #include "Lum_TdmModel.h"
 #include "Lum_TdmView.h"
 
+#include "Lum_TdmSchema.h"
 #include "Lum_Tlm.h"
 #include "Orb_Model.h"
 #include "Orb_Property.h"
@@ -58,7 +59,7 @@ void CountBlocks(Lum_TdmModel &model, Orb_Block *block, Counts &counts) {
 }
 
 void PrintLibraries(Lum_TdmView const *view) {
-  Orb_Property const *recorded = view->GetPropertyByName("TDS_VIEW_TYPE_LIBS");
+  Orb_Property const *recorded = view->GetPropertyByName(Lum_TdmSchema::kTypeLibraries);
   if (!recorded || recorded->GetStrings().empty()) {
     std::printf("    type libraries: none recorded\n");
     return;
@@ -98,11 +99,11 @@ int RunInfo(std::string const &path, CommonOptions const &options) {
     unsigned version = 0;
     unsigned revision = 0;
     view->GetTdmLoadedDesignVersion(version, revision);
-    Orb_Property const *stamp = view->GetPropertyByName("TDS_TDM_VERSION");
+    Orb_Property const *stamp = view->GetPropertyByName(Lum_TdmSchema::kVersion);
     std::printf("    stamp: %u.%u%s\n", version, revision,
                 stamp ? "" : " (no TDS_TDM_VERSION: read as 0.0)");
-    Orb_Property const *pm = view->GetPropertyByName("TDS_DEVICE_PM");
-    Orb_Property const *part = view->GetPropertyByName("TDS_DEVICE_PART");
+    Orb_Property const *pm = view->GetPropertyByName(Lum_TdmSchema::kDevicePm);
+    Orb_Property const *part = view->GetPropertyByName(Lum_TdmSchema::kDevicePart);
     std::printf("    device: %s, part %s\n", pm ? pm->GetStringValue() : "(none)",
                 part ? part->GetStringValue() : "(none)");
     PrintLibraries(view);

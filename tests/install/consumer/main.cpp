@@ -1,6 +1,7 @@
 // Uses the installed libraries the way a tool does: builds a typed design,
-// saves it, reopens it, and catches the library's exceptions by their own
-// types (which needs their type information exported from the libraries).
+// saves it, checks and reopens it, and catches the library's exceptions by
+// their own types (which needs their type information exported from the
+// libraries).
 //
 // Usage: consumer DIRECTORY
 
@@ -9,9 +10,11 @@
 #include "Lum_TdmDesignMgr.h"
 #include "Lum_TdmModel.h"
 #include "Lum_TdmPin.h"
+#include "Lum_TdmVerifier.h"
 #include "Lum_TdmView.h"
 
 #include "Lum_Exception.h"
+#include "Lum_TdmSchema.h"
 #include "Orb_Exception.h"
 
 #include <cstdio>
@@ -32,8 +35,8 @@ void Check(bool ok, char const *what) {
 void Write(std::string const &path) {
   Lum_TdmModel model("tool", "tool_db", path.c_str());
   Lum_TdmView *view = model.CreateDesignMgr("work")->CreateDesign("counter")->CreateView("netlist");
-  view->CreatePropertyString("TDS_DEVICE_PM", "generic");
-  view->CreatePropertyString("TDS_DEVICE_PART", "part0");
+  view->CreatePropertyString(Lum_TdmSchema::kDevicePm, "generic");
+  view->CreatePropertyString(Lum_TdmSchema::kDevicePart, "part0");
   Lum_TdmBlock *top = view->CreateTopBlock("counter");
   top->CreatePin("clk", Orb_Pin::PIN_INPUT);
   Lum_TdmBlock *bit = top->CreateBlock("bit0", 0);
@@ -41,6 +44,22 @@ void Write(std::string const &path) {
   bit->CreatePin("Q", Orb_Pin::PIN_OUTPUT);
   view->CommitAll();
   model.Save(path.c_str());
+}
+
+// The checking call finds nothing in the saved design, and names a block
+// typed from a library its view does not list.
+void CheckWithoutOpening(std::string const &path) {
+  Check(Lum_TdmVerifier::CheckFile(path).empty(), "the saved design checks clean");
+  Lum_TdmModel model("tool", "tool_db", path.c_str());
+  model.Open(path.c_str());
+  Lum_TdmView *view =
+      model.GetDesignMgrByName("work")->GetDesignByName("counter")->GetViewByName("netlist");
+  view->GetBlock()->GetBlock(0)->CreatePropertyString(Lum_TdmSchema::kBlockType, "CELLS:DFF");
+  std::vector<Lum_TdmVerifier::Problem> const problems = Lum_TdmVerifier::Check(view->GetOrbView());
+  Check(problems.size() == 1 && problems[0].kind == Lum_TdmVerifier::Kind::LibraryNotListed &&
+            problems[0].path == "work/counter/netlist:counter/bit0" &&
+            problems[0].key == "CELLS:DFF" && problems[0].objectName == "CELLS",
+        "a block of an unlisted library is reported");
 }
 
 void Reopen(std::string const &path) {
@@ -68,9 +87,9 @@ void CatchByType() {
   Check(caught, "a duplicate design throws Orb_Exception");
 
   Lum_TdmView *view = designMgr->GetDesignByName("counter")->CreateView("netlist");
-  view->CreatePropertyString("TDS_DEVICE_PM", "generic");
-  view->CreatePropertyString("TDS_DEVICE_PART", "part0");
-  view->CreatePropertyStringList("TDS_VIEW_TYPE_LIBS")->AppendString("NO_SUCH_LIBRARY");
+  view->CreatePropertyString(Lum_TdmSchema::kDevicePm, "generic");
+  view->CreatePropertyString(Lum_TdmSchema::kDevicePart, "part0");
+  view->CreatePropertyStringList(Lum_TdmSchema::kTypeLibraries)->AppendString("NO_SUCH_LIBRARY");
   caught = false;
   try {
     std::vector<Lum_TlmLibrary const *> libraries;
@@ -91,6 +110,7 @@ int main(int argc, char **argv) {
   std::string const path = std::string(argv[1]) + "/consumer.odb";
   try {
     Write(path);
+    CheckWithoutOpening(path);
     Reopen(path);
     CatchByType();
   } catch (std::exception const &e) {
