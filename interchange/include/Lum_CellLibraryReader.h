@@ -45,6 +45,8 @@ constexpr char const *kSupplyPins = "LIB_SUPPLY_PINS"; // type block: "VDD:prima
 constexpr char const *kFunction = "LIB_FUNCTION";      // type pin: `function` as written
 constexpr char const *kClock = "LIB_CLOCK";            // type pin: "true" when a clock pin
 constexpr char const *kSourceFormat = "LIB_SOURCE";    // type library: "liberty" or "json"
+constexpr char const *kRevision = "LIB_REVISION";      // type library: Liberty `revision`
+constexpr char const *kDate = "LIB_DATE";              // type library: Liberty `date`
 } // namespace Lum_CellLibraryNames
 
 class LUM_INTERCHANGE_API Lum_CellLibraryReader {

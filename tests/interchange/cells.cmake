@@ -1,2 +1,5 @@
 # Cell-library reader tests.
-list(APPEND LUM_INTERCHANGE_TEST_SOURCES)
+list(APPEND LUM_INTERCHANGE_TEST_SOURCES
+  Lum_CellLibraryReaderTest.cpp
+  Lum_CellLibrarySaveTest.cpp
+)

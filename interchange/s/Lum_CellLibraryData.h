@@ -1,0 +1,41 @@
+#pragma once
+
+// What the cell-library readers extract from a file, before it becomes a
+// type library: cells with their logic pins in port order and the few
+// properties users query afterwards.
+
+#include <cstddef>
+#include <string>
+#include <vector>
+
+enum class Lum_CellPinDirection { Input, Output, Inout };
+
+struct Lum_CellPinData {
+  std::string name; // a bus bit is "B[3]"
+  Lum_CellPinDirection direction = Lum_CellPinDirection::Input;
+  std::string function; // empty when the file gives none
+  std::string clock;
+};
+
+struct Lum_CellData {
+  std::string name;
+  std::size_t line = 0;
+  std::size_t column = 0;
+  std::string area;
+  std::string dontUse;
+  std::string supplyPins; // "VDD:primary_power VSS:primary_ground"
+  std::size_t supplyPinCount = 0;
+  std::size_t buses = 0;
+  std::size_t internalPins = 0;
+  std::vector<Lum_CellPinData> pins;
+};
+
+struct Lum_CellLibraryData {
+  std::string name; // the file's own name for the library
+  std::size_t line = 0;
+  std::size_t column = 0;
+  std::string format; // "liberty" or "json"
+  std::string revision;
+  std::string date;
+  std::vector<Lum_CellData> cells;
+};
