@@ -48,7 +48,7 @@ struct Lum_NetlistVector {
   std::int32_t offset = 0;
   bool upto = false;
   bool isSigned = false;
-  bool hidden = false; // a generated name
+  bool hidden = false;                                            // a generated name
   Lum_NetlistDirection direction = Lum_NetlistDirection::Unknown; // ports only
 
   std::int64_t IndexOf(std::uint32_t position) const {
@@ -84,8 +84,8 @@ struct Lum_NetlistCell {
 
 struct Lum_NetlistModule {
   Lum_NetlistName name = 0;
-  bool blackbox = false; // a cell definition, not a design module
-  bool top = false;      // marked as the top by the file
+  bool blackbox = false;                              // a cell definition, not a design module
+  bool top = false;                                   // marked as the top by the file
   std::uint32_t numBits = Lum_NetlistBits::kFirstNet; // bit ids in use: 0 .. numBits - 1
   std::uint32_t line = 0;
   std::uint32_t column = 0;
@@ -134,8 +134,8 @@ public:
   std::vector<std::uint32_t> BottomUp() const;
 
   std::vector<Lum_NetlistModule> modules;
-  std::string path;       // the file it was read from, for messages
-  bool fromJson = false;  // positions are JSON paths, not lines
+  std::string path;      // the file it was read from, for messages
+  bool fromJson = false; // positions are JSON paths, not lines
 
 private:
   std::deque<std::string> m_Texts;

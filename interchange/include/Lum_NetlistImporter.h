@@ -34,8 +34,8 @@ constexpr char const *kCellType = "NL_CELL_TYPE";
 } // namespace Lum_NetlistProperties
 
 struct Lum_NetlistImportOptions {
-  std::string top;                   // empty: the netlist's own top
-  std::string viewName = "netlist";  // also the name of the modules' hierarchies
+  std::string top;                  // empty: the netlist's own top
+  std::string viewName = "netlist"; // also the name of the modules' hierarchies
   std::string personality = "generic";
   std::string part = "generic";
   // Libraries the view draws from, by name, in lookup order; each must be
@@ -49,9 +49,9 @@ struct Lum_NetlistImportOptions {
 
 struct Lum_NetlistImportSummary {
   std::string top;
-  std::uint64_t modules = 0;    // design modules, the top included
-  std::uint64_t nets = 0;       // signals made
-  std::uint64_t untyped = 0;    // instances of unknown cells (--blackbox-unknown)
+  std::uint64_t modules = 0; // design modules, the top included
+  std::uint64_t nets = 0;    // signals made
+  std::uint64_t untyped = 0; // instances of unknown cells (--blackbox-unknown)
   std::uint64_t moduleInstances = 0;
   std::map<std::string, std::uint64_t> instancesByLibrary; // leaf instances in the design
 };

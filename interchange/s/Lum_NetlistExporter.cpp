@@ -3,6 +3,7 @@
 #include "Lum_NetlistImporter.h"
 #include "Lum_NetlistNames.h"
 #include "Lum_TdmBlock.h"
+#include "Lum_TdmPin.h"
 #include "Lum_TdmView.h"
 
 #include "Lum_Tlm.h"
@@ -64,8 +65,8 @@ public:
 
 private:
   struct Pending {
-    Lum_TdmBlock *block;     // the contents
-    Orb_Block const *meta;   // NL_PORTS and NL_NETNAMES
+    Lum_TdmBlock *block;   // the contents
+    Orb_Block const *meta; // NL_PORTS and NL_NETNAMES
     Lum_NetlistName name;
   };
 
@@ -78,9 +79,8 @@ private:
       return {m_Netlist.Intern(type.empty() ? std::string("$untyped") : type), nullptr};
     }
     Orb_Block const *host = typeBlock->GetOrbBlock();
-    bool const local =
-        std::strcmp(typeBlock->GetLibrary()->GetLibraryName(), Lum_TlmLibrary::LOCAL_LIBRARY_NAME) ==
-        0;
+    bool const local = std::strcmp(typeBlock->GetLibrary()->GetLibraryName(),
+                                   Lum_TlmLibrary::LOCAL_LIBRARY_NAME) == 0;
     std::string name = PropertyValue(host, kModuleName);
     if (name.empty())
       name = typeBlock->GetName();
@@ -203,8 +203,12 @@ private:
     };
     std::vector<Port> ports;
     std::unordered_map<std::string, std::size_t> portIndex;
-    for (Orb_Pin const *pin : host->GetPins()) {
-      auto const [base, index] = Lum_NetlistNames::SplitBitName(pin->GetName());
+    for (std::size_t i = 0; i < child->GetPins().size(); ++i) {
+      // A typed pin stands for its type pin, whatever its own name.
+      Lum_TdmPin const *client = child->GetPin(i);
+      Orb_Pin const *pin = client->GetOrbPin();
+      auto const [base, index] = Lum_NetlistNames::SplitBitName(
+          client->GetTypePin() ? client->GetTypePin()->GetName() : pin->GetName());
       auto const [found, isNew] = portIndex.emplace(base, ports.size());
       if (isNew)
         ports.push_back({base, DirectionOf(pin->GetDirection()), {}});
@@ -251,8 +255,8 @@ private:
       connection.bits = module.AddBits(portBits);
       module.connections.push_back(connection);
     }
-    cell.numConnections = static_cast<std::uint32_t>(module.connections.size()) -
-                          cell.firstConnection;
+    cell.numConnections =
+        static_cast<std::uint32_t>(module.connections.size()) - cell.firstConnection;
     cell.firstParameter = static_cast<std::uint32_t>(module.parameters.size());
     for (char const *name : {kParameters, kStringParameters})
       if (Orb_Property const *list = host->GetPropertyByName(name))
@@ -263,8 +267,7 @@ private:
           parameter.isString = name == kStringParameters;
           module.parameters.push_back(parameter);
         }
-    cell.numParameters = static_cast<std::uint32_t>(module.parameters.size()) -
-                         cell.firstParameter;
+    cell.numParameters = static_cast<std::uint32_t>(module.parameters.size()) - cell.firstParameter;
     module.cells.push_back(cell);
   }
 

@@ -435,9 +435,9 @@ private:
     for (Lum_NetlistVector const &port : module.ports) {
       Lum_NetlistBit const *bits = module.Bits(port.bits);
       for (std::uint32_t p = 0; p < port.bits.width; ++p, ++pin)
-        pins[pin]->ConnectInner(Signal(block, signals, bits[p],
-                                       Lum_NetlistNames::BitName(m_Netlist.Text(port.name), port,
-                                                                 p)));
+        pins[pin]->ConnectInner(
+            Signal(block, signals, bits[p],
+                   Lum_NetlistNames::BitName(m_Netlist.Text(port.name), port, p)));
     }
     for (Lum_NetlistCell const &cell : module.cells) {
       CellType const &type = m_Types.at(cell.type);
@@ -450,10 +450,9 @@ private:
         Lum_NetlistBit const *bits = module.Bits(connection.bits);
         for (std::uint32_t p = 0; p < connection.bits.width; ++p) {
           Lum_NetlistBit const bit = bits[p];
-          Orb_Signal *signal =
-              Lum_NetlistBits::IsConstant(bit) || signals[bit]
-                  ? Signal(block, signals, bit, std::string())
-                  : Signal(block, signals, bit, "$n" + std::to_string(bit));
+          Orb_Signal *signal = Lum_NetlistBits::IsConstant(bit) || signals[bit]
+                                   ? Signal(block, signals, bit, std::string())
+                                   : Signal(block, signals, bit, "$n" + std::to_string(bit));
           childPins[port->pins[p]]->Connect(signal);
         }
       }
@@ -472,8 +471,8 @@ private:
     else
       ++m_Summary.untyped;
     if (client && type.kind != CellType::kUnknown)
-      return client->CreateTypedBlock(name.c_str(), type.typeBlock, type.kind == CellType::kModule,
-                                      true)
+      return client
+          ->CreateTypedBlock(name.c_str(), type.typeBlock, type.kind == CellType::kModule, true)
           ->GetOrbBlock();
     Orb_Block *child = block->CreateBlock(name.c_str());
     if (type.kind == CellType::kUnknown)

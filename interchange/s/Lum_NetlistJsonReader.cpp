@@ -190,11 +190,11 @@ private:
           m_Declared[id] = true;
       } else if (bit.type() == od::json_type::string) {
         std::string_view const text = bit.get_string();
-        if (text.size() != 1 || (text[0] != '0' && text[0] != '1' && text[0] != 'x' &&
-                                 text[0] != 'z'))
+        if (text.size() != 1 ||
+            (text[0] != '0' && text[0] != '1' && text[0] != 'x' && text[0] != 'z'))
           throw Refusal{"a bit is a number or one of \"0\", \"1\", \"x\", \"z\", not \"" +
                         std::string(text) + "\""};
-        id = text[0] == '0' ? Lum_NetlistBits::kZero
+        id = text[0] == '0'   ? Lum_NetlistBits::kZero
              : text[0] == '1' ? Lum_NetlistBits::kOne
              : text[0] == 'x' ? Lum_NetlistBits::kUndefined
                               : Lum_NetlistBits::kFloating;
@@ -224,8 +224,8 @@ private:
     return value.get_int64();
   }
 
-  Lum_NetlistVector ReadVector(Lum_NetlistModule &module, std::string_view name,
-                               od::object object, bool port) {
+  Lum_NetlistVector ReadVector(Lum_NetlistModule &module, std::string_view name, od::object object,
+                               bool port) {
     Lum_NetlistVector vector;
     vector.name = m_Netlist.Intern(name);
     vector.hidden = !name.empty() && name[0] == '$';
@@ -309,10 +309,9 @@ private:
     }
     if (!sawType)
       throw Refusal{"no \"type\""};
-    cell.numConnections = static_cast<std::uint32_t>(module.connections.size()) -
-                          cell.firstConnection;
-    cell.numParameters = static_cast<std::uint32_t>(module.parameters.size()) -
-                         cell.firstParameter;
+    cell.numConnections =
+        static_cast<std::uint32_t>(module.connections.size()) - cell.firstConnection;
+    cell.numParameters = static_cast<std::uint32_t>(module.parameters.size()) - cell.firstParameter;
     for (auto const &[port, direction] : directions)
       for (std::uint32_t i = cell.firstConnection; i < module.connections.size(); ++i)
         if (module.connections[i].port == port)

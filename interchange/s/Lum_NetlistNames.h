@@ -73,8 +73,7 @@ inline std::string PortMeta(Lum_NetlistVector const &port) {
 // "<width> <offset> <upto> <signed> <hidden>"
 inline std::string NetMeta(Lum_NetlistVector const &net) {
   return std::to_string(net.bits.width) + " " + std::to_string(net.offset) + " " +
-         (net.upto ? "1" : "0") + " " + (net.isSigned ? "1" : "0") + " " +
-         (net.hidden ? "1" : "0");
+         (net.upto ? "1" : "0") + " " + (net.isSigned ? "1" : "0") + " " + (net.hidden ? "1" : "0");
 }
 
 // Reads a value PortMeta or NetMeta wrote into `vector` (its width into

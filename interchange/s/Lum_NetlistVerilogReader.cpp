@@ -5,9 +5,9 @@
 #include <algorithm>
 #include <array>
 #include <cctype>
+#include <cstdint>
 #include <cstdio>
 #include <cstdlib>
-#include <cstdint>
 #include <fstream>
 #include <iterator>
 #include <sstream>
@@ -18,9 +18,9 @@
 namespace {
 
 // Bounds that keep memory and time linear whatever the input.
-constexpr std::size_t kMaxToken = 1U << 16;       // bytes of a name or a number
-constexpr std::uint64_t kMaxWidth = 1U << 20;     // bits of one constant or range
-constexpr int kMaxNesting = 64;                   // concatenations within concatenations
+constexpr std::size_t kMaxToken = 1U << 16;   // bytes of a name or a number
+constexpr std::uint64_t kMaxWidth = 1U << 20; // bits of one constant or range
+constexpr int kMaxNesting = 64;               // concatenations within concatenations
 
 // ---------------------------------------------------------------------------
 // Lexer: a table of character classes drives it.
@@ -60,10 +60,9 @@ public:
   Lexer(std::string_view text, std::string const &path) : m_Text(text), m_Path(path) {}
 
   [[noreturn]] void Fail(std::uint32_t line, std::uint32_t column, std::string const &what) const {
-    throw Lum_ExceptionInvalidFormat(__FILE__, __LINE__, m_Path, line, column,
-                                     "line " + std::to_string(line) + ", column " +
-                                         std::to_string(column),
-                                     what);
+    throw Lum_ExceptionInvalidFormat(
+        __FILE__, __LINE__, m_Path, line, column,
+        "line " + std::to_string(line) + ", column " + std::to_string(column), what);
   }
 
   Token Next() {
@@ -95,8 +94,8 @@ public:
         // An escaped name runs to the next white space.
         ++m_Pos;
         std::size_t const begin = m_Pos;
-        while (m_Pos < m_Text.size() && kClasses[static_cast<unsigned char>(m_Text[m_Pos])] !=
-                                            kSpace &&
+        while (m_Pos < m_Text.size() &&
+               kClasses[static_cast<unsigned char>(m_Text[m_Pos])] != kSpace &&
                m_Text[m_Pos] != '\n')
           ++m_Pos;
         if (m_Pos == begin)
@@ -136,8 +135,8 @@ public:
     std::size_t const start = m_Pos;
     if (m_Pos < m_Text.size() && (m_Text[m_Pos] == 's' || m_Text[m_Pos] == 'S'))
       ++m_Pos;
-    if (m_Pos < m_Text.size() && std::string_view("bBoOdDhH").find(m_Text[m_Pos]) !=
-                                     std::string_view::npos)
+    if (m_Pos < m_Text.size() &&
+        std::string_view("bBoOdDhH").find(m_Text[m_Pos]) != std::string_view::npos)
       ++m_Pos;
     else
       Fail(at.line, at.column, "a based number needs b, o, d or h after '");
@@ -345,10 +344,10 @@ private:
   }
   [[noreturn]] void Refuse(std::string const &expected) const {
     static std::unordered_set<std::string_view> const kBehavioural = {
-        "always",   "always_ff", "always_comb", "always_latch", "initial", "final",
-        "function", "task",      "generate",    "genvar",       "integer", "real",
-        "if",       "else",      "case",        "casez",        "casex",   "for",
-        "while",    "repeat",    "forever",     "begin",        "end",     "fork",
+        "always",   "always_ff", "always_comb", "always_latch", "initial",    "final",
+        "function", "task",      "generate",    "genvar",       "integer",    "real",
+        "if",       "else",      "case",        "casez",        "casex",      "for",
+        "while",    "repeat",    "forever",     "begin",        "end",        "fork",
         "join",     "primitive", "specify",     "parameter",    "localparam", "defparam"};
     if (m_Token.kind == TokenKind::End)
       Fail(m_Token, expected + ", found the end of the file");
@@ -359,9 +358,7 @@ private:
     Fail(m_Token, expected + ", found '" + std::string(m_Token.text) + "'");
   }
 
-  bool IsPunct(char c) const {
-    return m_Token.kind == TokenKind::Punct && m_Token.text[0] == c;
-  }
+  bool IsPunct(char c) const { return m_Token.kind == TokenKind::Punct && m_Token.text[0] == c; }
   bool IsKeyword(std::string_view word) const {
     return m_Token.kind == TokenKind::Name && !m_Token.escaped && m_Token.text == word;
   }
@@ -593,7 +590,8 @@ private:
 
   void ParseDeclaration() {
     bool const port = IsDirection();
-    Lum_NetlistDirection const direction = port ? DirectionKeyword() : Lum_NetlistDirection::Unknown;
+    Lum_NetlistDirection const direction =
+        port ? DirectionKeyword() : Lum_NetlistDirection::Unknown;
     Lum_NetlistBit tie = Lum_Netlist::kNone;
     if (IsKeyword("supply0"))
       tie = Lum_NetlistBits::kZero;
@@ -665,8 +663,8 @@ private:
     if (a == b)
       return;
     if (Lum_NetlistBits::IsConstant(a) && Lum_NetlistBits::IsConstant(b))
-      Fail(at, std::string("a net is tied to both ") + Lum_NetlistBits::ConstantChar(a) +
-                   " and " + Lum_NetlistBits::ConstantChar(b));
+      Fail(at, std::string("a net is tied to both ") + Lum_NetlistBits::ConstantChar(a) + " and " +
+                   Lum_NetlistBits::ConstantChar(b));
     if (Lum_NetlistBits::IsConstant(b) || (!Lum_NetlistBits::IsConstant(a) && b < a))
       std::swap(a, b);
     m_Parent[b] = a;

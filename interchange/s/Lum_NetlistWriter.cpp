@@ -6,11 +6,11 @@
 #include <cctype>
 #include <cerrno>
 #include <cstdint>
+#include <cstdio>
 #include <cstdlib>
+#include <cstring>
 #include <deque>
 #include <fcntl.h>
-#include <cstdio>
-#include <cstring>
 #include <fstream>
 #include <sstream>
 #include <unistd.h>
@@ -84,13 +84,13 @@ void JsonVector(std::ostream &out, Lum_Netlist const &netlist, Lum_NetlistModule
 
 bool IsKeyword(std::string_view name) {
   static std::unordered_set<std::string_view> const kKeywords = {
-      "always",  "and",      "assign",    "begin",   "buf",        "case",     "casex",
-      "casez",   "default",  "defparam",  "else",    "end",        "endcase",  "endfunction",
-      "endmodule", "endtask", "for",      "function", "generate",  "genvar",   "if",
-      "initial", "inout",    "input",     "integer", "localparam", "module",   "nand",
-      "nor",     "not",      "or",        "output",  "parameter",  "real",     "reg",
-      "signed",  "supply0",  "supply1",   "task",    "tri",        "wire",     "xnor",
-      "xor",     "wand",     "wor",       "while",   "endgenerate", "specify", "endspecify"};
+      "always",    "and",     "assign",   "begin",    "buf",         "case",    "casex",
+      "casez",     "default", "defparam", "else",     "end",         "endcase", "endfunction",
+      "endmodule", "endtask", "for",      "function", "generate",    "genvar",  "if",
+      "initial",   "inout",   "input",    "integer",  "localparam",  "module",  "nand",
+      "nor",       "not",     "or",       "output",   "parameter",   "real",    "reg",
+      "signed",    "supply0", "supply1",  "task",     "tri",         "wire",    "xnor",
+      "xor",       "wand",    "wor",      "while",    "endgenerate", "specify", "endspecify"};
   return kKeywords.count(name) != 0;
 }
 
@@ -399,7 +399,7 @@ Lum_NetlistWriter::Format Lum_NetlistWriter::FormatOf(std::string const &path) {
   std::size_t const dot = path.rfind('.');
   std::string const extension = dot == std::string::npos ? "" : path.substr(dot);
   return extension == ".v" || extension == ".vg" || extension == ".sv" ? Format::Verilog
-                                                                         : Format::Json;
+                                                                       : Format::Json;
 }
 
 void Lum_NetlistWriter::Save(Lum_Netlist const &netlist, std::string const &path, Format format) {

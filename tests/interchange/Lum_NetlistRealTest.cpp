@@ -73,8 +73,7 @@ std::vector<std::string> Normalised(std::string const &file, std::string const &
 
 TEST_P(RealNetlists, ImportReopenExportReadsBackTheSameInYosys) {
   RealNetlist const &real = GetParam();
-  std::string const path =
-      nltest::RealDir() + "/netlists/" + real.design + "/" + Name(real);
+  std::string const path = nltest::RealDir() + "/netlists/" + real.design + "/" + Name(real);
   if (!std::filesystem::exists(path))
     GTEST_SKIP() << path << " is not beside the repository";
   if (!s_Sg13g2 || !nltest::HaveYosys())
@@ -111,8 +110,8 @@ TEST_P(RealNetlists, ImportReopenExportReadsBackTheSameInYosys) {
     std::vector<std::string> const back =
         Normalised(stem + written, stem + written + ".yosys.json");
     EXPECT_TRUE(original == back) << written << " lacks:\n"
-                              << nltest::Difference(original, back) << written << " adds:\n"
-                              << nltest::Difference(back, original);
+                                  << nltest::Difference(original, back) << written << " adds:\n"
+                                  << nltest::Difference(back, original);
   }
 }
 
