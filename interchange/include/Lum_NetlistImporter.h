@@ -53,7 +53,9 @@ struct Lum_NetlistImportSummary {
   std::uint64_t nets = 0;    // signals made
   std::uint64_t untyped = 0; // instances of unknown cells (--blackbox-unknown)
   std::uint64_t moduleInstances = 0;
-  std::map<std::string, std::uint64_t> instancesByLibrary; // leaf instances in the design
+  // Instances of library cells by library, each module's counted once
+  // however often the module is used.
+  std::map<std::string, std::uint64_t> instancesByLibrary;
 };
 
 // Builds a design database from a netlist: a design manager and a design

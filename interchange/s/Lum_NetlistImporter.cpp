@@ -21,6 +21,8 @@ namespace {
 
 using namespace Lum_NetlistProperties;
 constexpr std::uint32_t kNone = Lum_Netlist::kNone;
+// Levels of module instances below the top that an import accepts.
+constexpr std::uint32_t kMaxDepth = 1000;
 
 Orb_Pin::PIN_DIRECTION PinDirection(Lum_NetlistDirection direction) {
   switch (direction) {
@@ -152,6 +154,19 @@ private:
     for (std::uint32_t module : m_Netlist.BottomUp())
       if (used[module])
         order.push_back(module);
+    // Each level is grafted into the one above: bound the depth, so that a
+    // pathological nesting is refused instead of copied without end.
+    std::vector<std::uint32_t> depth(m_Netlist.modules.size(), 0);
+    for (std::uint32_t module : order) {
+      for (Lum_NetlistCell const &cell : m_Netlist.modules[module].cells) {
+        std::uint32_t const child = m_Netlist.FindModule(cell.type);
+        if (child != kNone && !m_Netlist.modules[child].blackbox)
+          depth[module] = std::max(depth[module], depth[child] + 1);
+      }
+      if (depth[module] > kMaxDepth)
+        FailFile("modules nest deeper than " + std::to_string(kMaxDepth) + " levels below " +
+                 std::string(m_Netlist.Text(m_Netlist.modules[module].name)));
+    }
     return order;
   }
 

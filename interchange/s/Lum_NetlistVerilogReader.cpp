@@ -342,16 +342,22 @@ private:
   [[noreturn]] void Fail(Token const &at, std::string const &what) const {
     m_Lexer.Fail(at.line, at.column, what);
   }
-  [[noreturn]] void Refuse(std::string const &expected) const {
+  bool IsBehavioural() const {
+    return m_Token.kind == TokenKind::Name && !m_Token.escaped && Behavioural().count(m_Token.text);
+  }
+  static std::unordered_set<std::string_view> const &Behavioural() {
     static std::unordered_set<std::string_view> const kBehavioural = {
         "always",   "always_ff", "always_comb", "always_latch", "initial",    "final",
         "function", "task",      "generate",    "genvar",       "integer",    "real",
         "if",       "else",      "case",        "casez",        "casex",      "for",
         "while",    "repeat",    "forever",     "begin",        "end",        "fork",
         "join",     "primitive", "specify",     "parameter",    "localparam", "defparam"};
+    return kBehavioural;
+  }
+  [[noreturn]] void Refuse(std::string const &expected) const {
     if (m_Token.kind == TokenKind::End)
       Fail(m_Token, expected + ", found the end of the file");
-    if (m_Token.kind == TokenKind::Name && !m_Token.escaped && kBehavioural.count(m_Token.text))
+    if (IsBehavioural())
       Fail(m_Token, "'" + std::string(m_Token.text) +
                         "' is not structural: only modules, ports, wires, assign between nets "
                         "and instances can be read");
@@ -493,7 +499,7 @@ private:
         ParseDeclaration();
       else if (IsKeyword("assign"))
         ParseAssign();
-      else if (m_Token.kind == TokenKind::Name && !IsKeyword("module"))
+      else if (m_Token.kind == TokenKind::Name && !IsKeyword("module") && !IsBehavioural())
         ParseInstances();
       else
         Refuse("expected a declaration, an assign, an instance or 'endmodule'");
