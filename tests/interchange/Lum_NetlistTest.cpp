@@ -138,10 +138,9 @@ TEST_F(NetlistImport, EveryConstructBecomesBlocksPinsAndSignals) {
   auto const &parameters = r4->GetPropertyByName(Lum_NetlistProperties::kParameters)->GetMembers();
   ASSERT_EQ(parameters.size(), 1U);
   EXPECT_EQ(parameters[0]->GetValue(), "xxxx");
-  EXPECT_EQ(r4->GetPropertyByName(Lum_NetlistProperties::kStringParameters)
-                ->GetMembers()[0]
-                ->GetValue(),
-            "reg");
+  EXPECT_EQ(
+      r4->GetPropertyByName(Lum_NetlistProperties::kStringParameters)->GetMembers()[0]->GetValue(),
+      "reg");
   // The module used twice: a type block of the local library, its contents
   // grafted under each instance.
   for (char const *name : {"s1", "s2"}) {
@@ -166,8 +165,7 @@ TEST_F(NetlistImport, ExportedJsonAndVerilogReadBackAsTheSameNetlist) {
       nltest::Canonical(Lum_NetlistJsonReader::ReadText(json.str(), "out.json"));
   std::vector<std::string> const fromVerilog =
       nltest::Canonical(Lum_NetlistVerilogReader::ReadText(verilog.str(), "out.v"));
-  EXPECT_TRUE(fromJson == fromVerilog) << nltest::Difference(fromJson, fromVerilog)
-                                       << "\n--\n"
+  EXPECT_TRUE(fromJson == fromVerilog) << nltest::Difference(fromJson, fromVerilog) << "\n--\n"
                                        << nltest::Difference(fromVerilog, fromJson);
   // Positional connections come out named; escaped names and the
   // ascending bus survive.
@@ -180,7 +178,8 @@ TEST_F(NetlistImport, ExportedJsonAndVerilogReadBackAsTheSameNetlist) {
   // positional connections did not have.
   std::vector<std::string> original = nltest::Canonical(netlist);
   for (std::string &line : original)
-    for (auto const &[from, to] : {std::pair{"$0", "A"}, std::pair{"$1", "B"}, std::pair{"$2", "Y"}})
+    for (auto const &[from, to] :
+         {std::pair{"$0", "A"}, std::pair{"$1", "B"}, std::pair{"$2", "Y"}})
       for (std::size_t at = line.find(from); at != std::string::npos; at = line.find(from))
         line.replace(at, 2, to);
   std::sort(original.begin(), original.end());
@@ -229,19 +228,19 @@ struct BadInput {
 std::vector<BadInput> BadInputs() {
   std::string const deep = std::string(100, '{') + "a" + std::string(100, '}');
   return {
-      {"TruncatedJson", true, R"({"modules": {"m": {"ports": {)", "",
-       "not valid JSON"},
-      {"WrongJsonType", true, R"({"modules": {"m": {"ports": {"a": {"direction": "input", "bits": "2"}}}}})",
+      {"TruncatedJson", true, R"({"modules": {"m": {"ports": {)", "", "not valid JSON"},
+      {"WrongJsonType", true,
+       R"({"modules": {"m": {"ports": {"a": {"direction": "input", "bits": "2"}}}}})",
        "modules.m.ports.a.bits", "expected an array of bits"},
       {"UndeclaredBit", true,
        R"({"modules": {"m": {"cells": {"$abc$12": {"type": "INV", "connections": {"A": [99]}}}}}})",
        "modules.m.cells.$abc$12.connections.A", "bit 99 is declared by no port"},
-      {"BadConstant", true,
-       R"({"modules": {"m": {"netnames": {"n": {"bits": ["2"]}}}}})", "modules.m.netnames.n.bits",
-       "not \"2\""},
+      {"BadConstant", true, R"({"modules": {"m": {"netnames": {"n": {"bits": ["2"]}}}}})",
+       "modules.m.netnames.n.bits", "not \"2\""},
       {"TwoModulesOfOneName", true, R"({"modules": {"m": {}, "m": {}}})", "modules.m",
        "a second module"},
-      {"Behavioural", false, "module m(input c, d, output reg q);\n  always @(posedge c) q <= d;\nendmodule",
+      {"Behavioural", false,
+       "module m(input c, d, output reg q);\n  always @(posedge c) q <= d;\nendmodule",
        "line 2, column 3", "'always' is not structural"},
       {"Operator", false, "module m(input a, b, output y);\n  assign y = a & b;\nendmodule",
        "line 2, column 16", "unexpected character '&'"},
@@ -253,7 +252,8 @@ std::vector<BadInput> BadInputs() {
        "line 2, column 10", "1 and 2 bits"},
       {"OutOfRange", false, "module m(input [1:0] a);\n  INV i (.A(a[2]));\nendmodule",
        "line 2, column 13", "[2] is outside the range of a"},
-      {"TwoConstants", false, "module m(output y);\n  assign y = 1'b0;\n  assign y = 1'b1;\nendmodule",
+      {"TwoConstants", false,
+       "module m(output y);\n  assign y = 1'b0;\n  assign y = 1'b1;\nendmodule",
        "line 3, column 10", "tied to both 0 and 1"},
       {"UnclosedComment", false, "module m; /* never closed\nendmodule", "line 1, column 11",
        "a comment is not closed"},
