@@ -197,22 +197,24 @@ private:
     std::vector<Lum_NetlistVector> const declared =
         definition ? DeclaredPorts(m_Netlist, definition) : std::vector<Lum_NetlistVector>();
     struct Port {
-      std::string name;
+      std::string_view name;
       Lum_NetlistDirection direction;
       std::vector<std::pair<std::int64_t, Orb_Pin const *>> pins;
     };
     std::vector<Port> ports;
-    std::unordered_map<std::string, std::size_t> portIndex;
     for (std::size_t i = 0; i < child->GetPins().size(); ++i) {
       // A typed pin stands for its type pin, whatever its own name.
       Lum_TdmPin const *client = child->GetPin(i);
       Orb_Pin const *pin = client->GetOrbPin();
       auto const [base, index] = Lum_NetlistNames::SplitBitName(
           client->GetTypePin() ? client->GetTypePin()->GetName() : pin->GetName());
-      auto const [found, isNew] = portIndex.emplace(base, ports.size());
-      if (isNew)
+      // Cells have few ports: a search is cheaper than a map.
+      std::size_t at = 0;
+      while (at < ports.size() && ports[at].name != base)
+        ++at;
+      if (at == ports.size())
         ports.push_back({base, DirectionOf(pin->GetDirection()), {}});
-      ports[found->second].pins.emplace_back(index, pin);
+      ports[at].pins.emplace_back(index, pin);
     }
     cell.firstConnection = static_cast<std::uint32_t>(module.connections.size());
     for (Port &port : ports) {

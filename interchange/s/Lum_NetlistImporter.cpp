@@ -49,6 +49,8 @@ struct CellType {
   };
   std::vector<Port> ports;
   std::unordered_map<std::string, std::uint32_t> byName;
+  // Ports by the netlist's name ids, filled as connections ask.
+  mutable std::unordered_map<Lum_NetlistName, CellType::Port const *> byId;
   std::vector<std::pair<std::string, Orb_Pin::PIN_DIRECTION>> pins;
   // Unknown types: how many instances, and the first few.
   std::uint64_t count = 0;
@@ -209,7 +211,8 @@ private:
       std::string const name = pin->GetName();
       Orb_Pin::PIN_DIRECTION const direction = pin->GetDirection();
       type.pins.emplace_back(name, direction);
-      auto const [base, bit] = Lum_NetlistNames::SplitBitName(name);
+      auto const [view, bit] = Lum_NetlistNames::SplitBitName(name);
+      std::string const base(view);
       auto const found = type.byName.find(base);
       if (found == type.byName.end()) {
         AddPort(type, base,
@@ -330,6 +333,13 @@ private:
     }
   }
 
+  CellType::Port const *FindPort(CellType const &type, Lum_NetlistName id) const {
+    auto const known = type.byId.find(id);
+    if (known != type.byId.end())
+      return known->second;
+    return type.byId[id] = FindPort(type, m_Netlist.Text(id));
+  }
+
   CellType::Port const *FindPort(CellType const &type, std::string_view name) const {
     auto const found = type.byName.find(std::string(name));
     if (found != type.byName.end())
@@ -350,7 +360,7 @@ private:
       CellType const &type = m_Types.at(cell.type);
       for (std::uint32_t c = 0; c < cell.numConnections; ++c) {
         Lum_NetlistConnection const &connection = module.connections[cell.firstConnection + c];
-        CellType::Port const *port = FindPort(type, m_Netlist.Text(connection.port));
+        CellType::Port const *port = FindPort(type, connection.port);
         std::string const typeName(m_Netlist.Text(cell.type));
         if (!port)
           FailAt(module, cell, connection.port,
@@ -461,7 +471,7 @@ private:
       auto const childPins = child->GetPins();
       for (std::uint32_t c = 0; c < cell.numConnections; ++c) {
         Lum_NetlistConnection const &connection = module.connections[cell.firstConnection + c];
-        CellType::Port const *port = FindPort(type, m_Netlist.Text(connection.port));
+        CellType::Port const *port = FindPort(type, connection.port);
         Lum_NetlistBit const *bits = module.Bits(connection.bits);
         for (std::uint32_t p = 0; p < connection.bits.width; ++p) {
           Lum_NetlistBit const bit = bits[p];

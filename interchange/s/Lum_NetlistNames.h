@@ -25,22 +25,26 @@ inline std::string BitName(std::string_view name, Lum_NetlistVector const &vecto
   return text;
 }
 
-// "B[3]" -> ("B", 3); any other name -> (name, 0), and `indexed` false.
-inline std::pair<std::string, std::int64_t> SplitBitName(std::string const &name,
-                                                         bool *indexed = nullptr) {
+// "B[3]" -> ("B", 3); any other name -> (name, 0), and `indexed` false. The
+// base views the given text.
+inline std::pair<std::string_view, std::int64_t> SplitBitName(std::string_view name,
+                                                              bool *indexed = nullptr) {
   if (indexed)
     *indexed = false;
   std::size_t const open = name.rfind('[');
-  if (open == std::string::npos || open == 0 || name.back() != ']' || open + 2 >= name.size())
+  if (open == std::string_view::npos || open == 0 || name.back() != ']' || open + 2 >= name.size())
     return {name, 0};
-  std::string_view const digits(name.data() + open + 1, name.size() - open - 2);
+  std::string_view const digits = name.substr(open + 1, name.size() - open - 2);
   std::size_t const start = digits[0] == '-' ? 1 : 0;
   if (start == digits.size() || digits.size() > 10 ||
       digits.find_first_not_of("0123456789", start) != std::string_view::npos)
     return {name, 0};
   if (indexed)
     *indexed = true;
-  return {name.substr(0, open), std::stoll(std::string(digits))};
+  std::int64_t value = 0;
+  for (std::size_t i = start; i < digits.size(); ++i)
+    value = value * 10 + (digits[i] - '0');
+  return {name.substr(0, open), start ? -value : value};
 }
 
 inline char const *DirectionWord(Lum_NetlistDirection direction) {
