@@ -30,8 +30,7 @@ std::pair<std::string, std::string> SplitType(std::string const &text, char cons
   return {text.substr(0, colon), text.substr(colon + 1)};
 }
 
-Lum_TlmBlock const *FindType(Lum_TdmView const *view, std::string const &text,
-                             char const *option) {
+Lum_TlmBlock const *FindType(Lum_TdmView const *view, std::string const &text, char const *option) {
   auto const [library, cell] = SplitType(text, option);
   Lum_TlmLibrary const *found = view->GetLibrary(Port::StringBase<char>(library.c_str()));
   if (!found)
@@ -87,6 +86,10 @@ int RunRebind(std::string const &path, RebindOptions const &rebind, CommonOption
     // Check every block first; the first that cannot be rebound ends the
     // command before anything changed.
     std::vector<std::pair<Lum_TdmBlock *, Lum_TdmTypePinMap const *>> plan;
+    // Equal maps of this swap are shared under one key.
+    std::string key = rebind.from;
+    key += '>';
+    key += rebind.to;
     for (Lum_TdmBlock *block : blocks) {
       if (block->GetTypeBlock() != from)
         continue;
@@ -102,16 +105,13 @@ int RunRebind(std::string const &path, RebindOptions const &rebind, CommonOption
           name = renamed->second;
         Lum_TlmPin const *typePin = to->GetPinByName(name.c_str());
         if (!typePin)
-          throw Failure(kExitProblems,
-                        "block " + blockPath + ": pin " + Quoted(pin->GetName()) + " has no pin " +
-                            Quoted(name) + " in " + rebind.to +
-                            " (map it with --map); nothing was rebound, " + path +
-                            " is unchanged");
+          throw Failure(kExitProblems, "block " + blockPath + ": pin " + Quoted(pin->GetName()) +
+                                           " has no pin " + Quoted(name) + " in " + rebind.to +
+                                           " (map it with --map); nothing was rebound, " + path +
+                                           " is unchanged");
         map.SetPinMap(Port::StringBase<char>(pin->GetName()), typePin);
       }
-      plan.emplace_back(block, maps.GetTypePinMap(
-                                   Port::StringBase<char>((rebind.from + ">" + rebind.to).c_str()),
-                                   &map));
+      plan.emplace_back(block, maps.GetTypePinMap(Port::StringBase<char>(key.c_str()), &map));
     }
     for (auto const &[block, map] : plan) {
       try {
@@ -135,8 +135,9 @@ int RunRebind(std::string const &path, RebindOptions const &rebind, CommonOption
   try {
     model->Save(target.c_str());
   } catch (Port::Exception const &e) {
-    throw Failure(kExitUnreadable, target + ": cannot be saved: " + Describe(e, target) +
-                                       (rebind.output.empty() ? "; the database is unchanged" : ""));
+    throw Failure(kExitUnreadable,
+                  target + ": cannot be saved: " + Describe(e, target) +
+                      (rebind.output.empty() ? "; the database is unchanged" : ""));
   }
   if (!options.quiet)
     std::printf("rebound %zu block%s from %s to %s in %zu view%s, saved %s\n", rebound,
