@@ -446,8 +446,11 @@ private:
         std::string_view const name = m_Netlist.Text(net.name);
         Lum_NetlistBit const *bits = module.Bits(net.bits);
         for (std::uint32_t p = 0; p < net.bits.width; ++p) {
+          // The name is made only for a signal still to make.
+          bool const made = Lum_NetlistBits::IsConstant(bits[p]) || signals[bits[p]];
           Orb_Signal *signal =
-              Signal(block, signals, bits[p], Lum_NetlistNames::BitName(name, net, p));
+              Signal(block, signals, bits[p],
+                     made ? std::string() : Lum_NetlistNames::BitName(name, net, p));
           Orb_Property *names = signal->GetPropertyByName(kNames);
           if (!names)
             names = signal->CreatePropertyStringList(kNames);
