@@ -91,7 +91,7 @@ TEST_F(TdmNetlist, RebindSwapsEveryMatchingBlockAndTheExportShowsIt) {
   ASSERT_GT(before, 100);
   // Only under one instance first, then everywhere.
   ToolRun const some = Tdm({"rebind", "--lib-path", s_Dir->Path(), db, "--from", from, "--to", to,
-                        "--where", "serv_rf_top/cpu/*"});
+                            "--where", "serv_rf_top/cpu/*"});
   ASSERT_EQ(some.code, 0) << some.err;
   int const moved = before - count(from);
   EXPECT_GT(moved, 0);
@@ -101,8 +101,7 @@ TEST_F(TdmNetlist, RebindSwapsEveryMatchingBlockAndTheExportShowsIt) {
   ASSERT_EQ(all.code, 0) << all.err;
   EXPECT_EQ(count(from), 0);
   EXPECT_EQ(count(to), others + before);
-  ToolRun const exported =
-      Tdm({"export", "--lib-path", s_Dir->Path(), db, "--format", "verilog"});
+  ToolRun const exported = Tdm({"export", "--lib-path", s_Dir->Path(), db, "--format", "verilog"});
   ASSERT_EQ(exported.code, 0) << exported.err;
   EXPECT_THAT(exported.out, HasSubstr("sg13g2_inv_2 "));
   EXPECT_THAT(exported.out, Not(HasSubstr("sg13g2_inv_1 ")));
@@ -114,8 +113,8 @@ TEST_F(TdmNetlist, ARebindThatFailsForOneBlockLeavesTheDatabaseByteIdentical) {
   std::string const bytes = FileBytes(db);
   // A flip-flop has pins an inverter lacks.
   ToolRun const run = Tdm({"rebind", "--lib-path", s_Dir->Path(), db, "--from",
-                       std::string(kLibrary) + ":sg13g2_dfrbp_1", "--to",
-                       std::string(kLibrary) + ":sg13g2_inv_1", "--map", "D=A,Q=Y"});
+                           std::string(kLibrary) + ":sg13g2_dfrbp_1", "--to",
+                           std::string(kLibrary) + ":sg13g2_inv_1", "--map", "D=A,Q=Y"});
   EXPECT_EQ(run.code, 1);
   EXPECT_THAT(run.err, HasSubstr("tdm rebind: error: block serv_rf_top/"));
   EXPECT_THAT(run.err, HasSubstr("\" has no pin \""));
@@ -132,7 +131,8 @@ TEST_F(TdmNetlist, ImportRefusalsNameTheProblemAndWriteNothing) {
     char const *message;
   };
   for (Case const &bad : std::vector<Case>{
-           {"module m(input a);\n  always @(a) ;\nendmodule\n", {},
+           {"module m(input a);\n  always @(a) ;\nendmodule\n",
+            {},
             "bad.v\": line 2, column 3: 'always' is not structural"},
            {"module m(input a, output y);\n  FOO f1 (.A(a), .Y(y));\n  FOO f2 (.A(a));\n  BAR "
             "b (.A(a));\nendmodule\n",
@@ -140,11 +140,9 @@ TEST_F(TdmNetlist, ImportRefusalsNameTheProblemAndWriteNothing) {
             "2 cell types are in no type library: BAR (1 instance, e.g. b); FOO (2 instances, "
             "e.g. f1, f2)."},
        }) {
-    {
-      std::ofstream(netlist) << bad.text;
-    }
-    std::vector<std::string> args = {"import", netlist, "--lib",
-                                     Data("sg13g2_stdcell_typ_1p20V_25C.filtered.lib"), "-o", db};
+    { std::ofstream(netlist) << bad.text; }
+    std::vector<std::string> args = {
+        "import", netlist, "--lib", Data("sg13g2_stdcell_typ_1p20V_25C.filtered.lib"), "-o", db};
     ToolRun const run = Tdm(args);
     EXPECT_EQ(run.code, 3) << bad.message;
     EXPECT_THAT(run.err, HasSubstr(bad.message));

@@ -96,15 +96,14 @@ int RunDemoReal(DemoOptions const &demo, CommonOptions const &options) {
     Step(quiet, "yosys reads the exported netlist back against the Liberty file");
     std::string const command = "yosys -q -p " +
                                 Shell("read_liberty -lib " + liberty + "; read_verilog " +
-                                      exported + "; hierarchy -check -top " + kTop +
-                                      "; tee -o " + directory + "/yosys_stat.txt stat") +
+                                      exported + "; hierarchy -check -top " + kTop + "; tee -o " +
+                                      directory + "/yosys_stat.txt stat") +
                                 " >" + Shell(directory + "/yosys.log") + " 2>&1";
     if (std::system(command.c_str()) != 0)
-      throw Failure(kExitProblems, "yosys refused " + exported + ": see " + directory +
-                                       "/yosys.log");
+      throw Failure(kExitProblems,
+                    "yosys refused " + exported + ": see " + directory + "/yosys.log");
     if (!quiet)
-      std::printf("yosys: hierarchy checked, statistics in %s/yosys_stat.txt\n",
-                  directory.c_str());
+      std::printf("yosys: hierarchy checked, statistics in %s/yosys_stat.txt\n", directory.c_str());
   } else if (!quiet) {
     std::printf("\n(yosys is not installed: the last step, reading %s back, is skipped)\n",
                 exported.c_str());

@@ -31,9 +31,10 @@ int RunExport(std::string const &path, ExportOptions const &exported,
     std::string names;
     for (Orb_View const *view : views)
       names += (names.empty() ? "" : ", ") + ViewPath(view);
-    throw Failure(kExitUsage, path + ": " + (views.empty() ? "has no view" : "holds several views (" +
-                                                                              names +
-                                                                              "): choose one with --view"));
+    throw Failure(kExitUsage, path + ": " +
+                                  (views.empty() ? "has no view"
+                                                 : "holds several views (" + names +
+                                                       "): choose one with --view"));
   }
   auto *view = static_cast<Lum_TdmView *>(model->Specialize(views.front()));
   try {

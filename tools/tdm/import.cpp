@@ -115,8 +115,8 @@ int RunImport(ImportOptions const &import, CommonOptions const &options) {
     try {
       model.Save(import.output.c_str());
     } catch (Port::Exception const &e) {
-      throw Failure(kExitUnreadable, import.output + ": cannot be saved: " +
-                                         Describe(e, import.output));
+      throw Failure(kExitUnreadable,
+                    import.output + ": cannot be saved: " + Describe(e, import.output));
     }
   }
   // The libraries read on the fly stay beside the database.
@@ -125,8 +125,8 @@ int RunImport(ImportOptions const &import, CommonOptions const &options) {
     try {
       kept.push_back(Lum_CellLibraryReader::Save(*library, dir));
     } catch (Port::Exception const &e) {
-      throw Failure(kExitUnreadable, "the database is saved, but a type library is not: " +
-                                         Describe(e));
+      throw Failure(kExitUnreadable,
+                    "the database is saved, but a type library is not: " + Describe(e));
     }
   }
   if (!options.quiet) {
