@@ -330,3 +330,56 @@ TEST_F(NetlistImport, RefusesWhatCannotBeMapped) {
 }
 
 } // namespace
+
+namespace {
+
+// The JSON fields that carry meaning beyond bits: offsets and ascending
+// ranges, constants in net names, hidden names, port directions of cells,
+// and parameter values (bits, integers, strings that look like bits).
+TEST(NetlistJson, ReadsAndWritesTheFieldsThatCarryMeaning) {
+  char const text[] = R"({"creator": "x", "models": {}, "modules": {"top": {
+    "attributes": {"top": "00000000000000000000000000000001", "src": "a.v:1"},
+    "ports": {"d": {"direction": "input", "bits": [2, 3, 4], "offset": 2, "upto": 1,
+                    "signed": 1, "future_field": [1, 2]}},
+    "cells": {"$auto$1": {"hide_name": 1, "type": "REG",
+      "parameters": {"INIT": "01xz", "WIDTH": 3, "NAME": "10 ", "EMPTY": " "},
+      "port_directions": {"Q": "output"},
+      "connections": {"Q": [5], "D": [2, "x", 4]}}},
+    "netnames": {"d": {"bits": [2, 3, 4], "offset": 2, "upto": 1},
+                 "$q": {"hide_name": 1, "bits": [5, "1"]}}}}})";
+  Lum_Netlist const netlist = Lum_NetlistJsonReader::ReadText(text, "fields.json");
+  ASSERT_EQ(netlist.modules.size(), 1U);
+  Lum_NetlistModule const &top = netlist.modules[0];
+  EXPECT_TRUE(top.top);
+  Lum_NetlistVector const &d = top.ports[0];
+  EXPECT_EQ(d.offset, 2);
+  EXPECT_TRUE(d.upto);
+  EXPECT_TRUE(d.isSigned);
+  EXPECT_EQ(d.IndexOf(0), 4); // the first bit of d[2:4] is d[4]
+  EXPECT_TRUE(top.netNames[1].hidden);
+  EXPECT_EQ(top.Bits(top.netNames[1].bits)[1], Lum_NetlistBits::kOne);
+  Lum_NetlistConnection const &q = top.connections[0];
+  EXPECT_EQ(netlist.Text(q.port), "Q");
+  EXPECT_EQ(q.direction, Lum_NetlistDirection::Output);
+  EXPECT_EQ(top.Bits(top.connections[1].bits)[1], Lum_NetlistBits::kUndefined);
+  std::vector<std::pair<std::string, std::string>> parameters;
+  for (Lum_NetlistParameter const &parameter : top.parameters)
+    parameters.emplace_back(std::string(netlist.Text(parameter.name)),
+                            (parameter.isString ? "string " : "bits ") +
+                                std::string(netlist.Text(parameter.value)));
+  EXPECT_EQ(parameters, (std::vector<std::pair<std::string, std::string>>{
+                            {"INIT", "bits 01xz"},
+                            {"WIDTH", "bits 00000000000000000000000000000011"},
+                            {"NAME", "string 10"},
+                            {"EMPTY", "string "}}));
+  // Written again, the strings that look like bits keep their blank, and
+  // the rewritten text reads as the same netlist.
+  std::ostringstream out;
+  Lum_NetlistWriter::WriteJson(netlist, out);
+  EXPECT_THAT(out.str(), HasSubstr("\"NAME\": \"10 \""));
+  EXPECT_THAT(out.str(), HasSubstr("\"EMPTY\": \" \""));
+  EXPECT_TRUE(nltest::Canonical(Lum_NetlistJsonReader::ReadText(out.str(), "again.json")) ==
+              nltest::Canonical(netlist));
+}
+
+} // namespace
