@@ -104,11 +104,15 @@ int RunRebind(std::string const &path, RebindOptions const &rebind, CommonOption
         if (renamed != renames.end())
           name = renamed->second;
         Lum_TlmPin const *typePin = to->GetPinByName(name.c_str());
-        if (!typePin)
-          throw Failure(kExitProblems, "block " + blockPath + ": pin " + Quoted(pin->GetName()) +
-                                           " has no pin " + Quoted(name) + " in " + rebind.to +
-                                           " (map it with --map); nothing was rebound, " + path +
-                                           " is unchanged");
+        if (!typePin) {
+          std::string text = "block " + blockPath;
+          text += ": pin " + Quoted(pin->GetName());
+          text += " has no pin " + Quoted(name);
+          text += " in " + rebind.to;
+          text += " (map it with --map); nothing was rebound, " + path;
+          text += " is unchanged";
+          throw Failure(kExitProblems, text);
+        }
         map.SetPinMap(Port::StringBase<char>(pin->GetName()), typePin);
       }
       plan.emplace_back(block, maps.GetTypePinMap(Port::StringBase<char>(key.c_str()), &map));
