@@ -1,2 +1,5 @@
 # Netlist reader, writer and mapping tests.
-list(APPEND LUM_INTERCHANGE_TEST_SOURCES)
+list(APPEND LUM_INTERCHANGE_TEST_SOURCES
+  Lum_NetlistRealTest.cpp
+  Lum_NetlistTest.cpp
+)

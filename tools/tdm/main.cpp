@@ -50,6 +50,10 @@ int Main(int argc, char **argv) {
   tdm::CommitOptions commit;
   tdm::TreeOptions tree;
   tdm::LibOptions lib;
+  tdm::ImportOptions import;
+  tdm::ExportOptions exported;
+  tdm::RebindOptions rebind;
+  tdm::FindOptions find;
 
   CLI::App *demoCommand = app.add_subcommand(
       "demo", "Write two sample type libraries and a typed design database using them, commit, "
@@ -95,8 +99,64 @@ int Main(int argc, char **argv) {
   CLI::App *libCommand = tdm::AddLibCommand(app, lib, common);
   libCommand->footer(kExitCodes);
 
-  for (CLI::App *command :
-       {demoCommand, infoCommand, checkCommand, commitCommand, treeCommand, dotCommand}) {
+  demoCommand->add_flag("--real", demo.real,
+                        "The real-design walk-through: import a synthesized netlist and its "
+                        "Liberty library, check, swap cells, export and read the result back");
+
+  CLI::App *importCommand = app.add_subcommand(
+      "import", "Make a typed design database from a gate-level netlist (JSON or structural "
+                "Verilog) and its cell libraries, with a summary");
+  importCommand->add_option("NETLIST", import.netlist, "Netlist file (.json or .v)")->required();
+  importCommand
+      ->add_option("--lib", import.libraries,
+                   "Cell library: a type library (.tlm), a Liberty file (.lib) or JSON cell "
+                   "models, read on the fly and kept as .tlm beside DB; repeatable")
+      ->type_name("FILE")
+      ->allow_extra_args(false);
+  importCommand->add_option("--top", import.top, "Top module (default: the netlist's own)")
+      ->type_name("T");
+  importCommand->add_option("--pm", import.personality, "Device personality of the view")
+      ->type_name("PM");
+  importCommand->add_option("--part", import.part, "Device part of the view")->type_name("P");
+  importCommand->add_flag("--blackbox-unknown", import.blackboxUnknown,
+                          "Import cells that no library has as untyped blocks instead of failing");
+  importCommand->add_option("-o,--output", import.output, "Database to write")
+      ->type_name("DB")
+      ->required();
+
+  CLI::App *exportCommand = app.add_subcommand(
+      "export", "Write a view as a gate-level netlist, its hierarchy folded back into modules");
+  AddDatabase(exportCommand, database);
+  exportCommand->add_option("--format", exported.format, "json or verilog (default: from OUT)")
+      ->type_name("F");
+  exportCommand->add_option("-o,--output", exported.output, "File to write (default: stdout)")
+      ->type_name("OUT");
+  exportCommand->add_option("--view", exported.view, "The view to write")->type_name("V");
+
+  CLI::App *rebindCommand =
+      app.add_subcommand("rebind", "Swap the cell type of every matching block, all or nothing");
+  AddDatabase(rebindCommand, database);
+  rebindCommand->add_option("--from", rebind.from, "Cell type to replace")
+      ->type_name("LIB:CELL")
+      ->required();
+  rebindCommand->add_option("--to", rebind.to, "Cell type to put instead")
+      ->type_name("LIB:CELL")
+      ->required();
+  rebindCommand->add_option("--map", rebind.map, "Pins named otherwise in the new cell")
+      ->type_name("OLD=NEW,...");
+  rebindCommand->add_option("--where", rebind.where, "Only blocks whose path matches the glob")
+      ->type_name("GLOB");
+  rebindCommand->add_option("-o,--output", rebind.output, "Write to OUT instead of in place")
+      ->type_name("OUT");
+
+  CLI::App *findCommand = app.add_subcommand("find", "List (or count) the blocks of one cell type");
+  AddDatabase(findCommand, database);
+  findCommand->add_option("--type", find.type, "Cell type")->type_name("LIB:CELL")->required();
+  findCommand->add_flag("--count", find.count, "Print the count only");
+  findCommand->add_option("--view", find.view, "Only the views of this name")->type_name("V");
+
+  for (CLI::App *command : {demoCommand, infoCommand, checkCommand, commitCommand, treeCommand,
+                            dotCommand, importCommand, exportCommand, rebindCommand, findCommand}) {
     AddCommonOptions(command, common);
     command->footer(kExitCodes);
   }
@@ -118,7 +178,15 @@ int Main(int argc, char **argv) {
     if (libCommand->parsed())
       return tdm::RunLib(*libCommand, lib, common);
     if (demoCommand->parsed())
-      return tdm::RunDemo(demo, common);
+      return demo.real ? tdm::RunDemoReal(demo, common) : tdm::RunDemo(demo, common);
+    if (importCommand->parsed())
+      return tdm::RunImport(import, common);
+    if (exportCommand->parsed())
+      return tdm::RunExport(database, exported, common);
+    if (rebindCommand->parsed())
+      return tdm::RunRebind(database, rebind, common);
+    if (findCommand->parsed())
+      return tdm::RunFind(database, find, common);
     if (infoCommand->parsed())
       return tdm::RunInfo(database, common);
     if (checkCommand->parsed())

@@ -1,0 +1,287 @@
+#include "Lum_NetlistExporter.h"
+
+#include "Lum_NetlistImporter.h"
+#include "Lum_NetlistNames.h"
+#include "Lum_TdmBlock.h"
+#include "Lum_TdmPin.h"
+#include "Lum_TdmView.h"
+
+#include "Lum_Tlm.h"
+#include "Orb_Model.h"
+#include "Orb_Property.h"
+
+#include <algorithm>
+#include <cstring>
+#include <deque>
+#include <map>
+#include <unordered_map>
+#include <unordered_set>
+
+namespace {
+
+using namespace Lum_NetlistProperties;
+
+Lum_NetlistDirection DirectionOf(Orb_Pin::PIN_DIRECTION direction) {
+  return direction == Orb_Pin::PIN_OUTPUT          ? Lum_NetlistDirection::Output
+         : direction == Orb_Pin::PIN_BIDIRECTIONAL ? Lum_NetlistDirection::Inout
+                                                   : Lum_NetlistDirection::Input;
+}
+
+std::string PropertyValue(Orb_Persistent const *object, char const *name) {
+  Orb_Property const *property = object->GetPropertyByName(name);
+  return property ? std::string(property->GetValue()) : std::string();
+}
+
+// The declared ports of a module block, in order (empty without NL_PORTS).
+std::vector<Lum_NetlistVector> DeclaredPorts(Lum_Netlist &netlist, Orb_Block const *block) {
+  std::vector<Lum_NetlistVector> ports;
+  Orb_Property const *list = block->GetPropertyByName(kPorts);
+  if (!list)
+    return ports;
+  for (auto const &member : list->GetMembers()) {
+    Lum_NetlistVector port;
+    if (!Lum_NetlistNames::ParseMeta(std::string(member->GetValue()), true, port))
+      continue;
+    port.name = netlist.Intern(member->GetName());
+    ports.push_back(port);
+  }
+  return ports;
+}
+
+class Exporter {
+public:
+  explicit Exporter(Lum_TdmView &view) : m_View(view) {}
+
+  Lum_Netlist Run() {
+    Lum_TdmBlock *top = m_View.GetBlock();
+    if (!top)
+      return std::move(m_Netlist);
+    m_Queue.push_back({top, top->GetOrbBlock(), m_Netlist.Intern(top->GetName())});
+    m_Defined.insert(m_Queue.back().name);
+    for (std::size_t i = 0; i < m_Queue.size(); ++i)
+      Define(m_Queue[i], i == 0);
+    return std::move(m_Netlist);
+  }
+
+private:
+  struct Pending {
+    Lum_TdmBlock *block;   // the contents
+    Orb_Block const *meta; // NL_PORTS and NL_NETNAMES
+    Lum_NetlistName name;
+  };
+
+  // The module name and the block with its declarations, for a child that
+  // is an instance of a module; else a null block.
+  std::pair<Lum_NetlistName, Orb_Block const *> CellType(Lum_TdmBlock *child) {
+    Lum_TlmBlock const *typeBlock = child->GetTypeBlock();
+    if (!typeBlock) {
+      std::string const type = PropertyValue(child->GetOrbBlock(), kCellType);
+      return {m_Netlist.Intern(type.empty() ? std::string("$untyped") : type), nullptr};
+    }
+    Orb_Block const *host = typeBlock->GetOrbBlock();
+    bool const local = std::strcmp(typeBlock->GetLibrary()->GetLibraryName(),
+                                   Lum_TlmLibrary::LOCAL_LIBRARY_NAME) == 0;
+    std::string name = PropertyValue(host, kModuleName);
+    if (name.empty())
+      name = typeBlock->GetName();
+    return {m_Netlist.Intern(name), local ? host : nullptr};
+  }
+
+  Lum_NetlistBit Fresh(Lum_NetlistModule &module) { return module.numBits++; }
+
+  void Define(Pending const &pending, bool isTop) {
+    std::uint32_t const index = m_Netlist.AddModule(pending.name);
+    Lum_NetlistModule &module = m_Netlist.modules[index];
+    module.top = isTop;
+    Orb_Block const *block = pending.block->GetOrbBlock();
+    std::unordered_map<Orb_Signal const *, Lum_NetlistBit> bits;
+    bits.reserve(block->GetSignals().size());
+    // Net names: declared ones first, in their order, then the signals that
+    // carry no name under their own.
+    std::vector<Lum_NetlistVector> nets;
+    std::unordered_map<std::string, std::size_t> netIndex;
+    std::vector<std::vector<Lum_NetlistBit>> netBits;
+    if (Orb_Property const *list = pending.meta->GetPropertyByName(kNetNames))
+      for (auto const &member : list->GetMembers()) {
+        Lum_NetlistVector net;
+        if (!Lum_NetlistNames::ParseMeta(std::string(member->GetValue()), false, net))
+          continue;
+        net.name = m_Netlist.Intern(member->GetName());
+        if (!netIndex.emplace(member->GetName(), nets.size()).second)
+          continue;
+        nets.push_back(net);
+        netBits.emplace_back(net.bits.width, Lum_Netlist::kNone);
+      }
+    for (Orb_Signal const *signal : block->GetSignals()) {
+      Lum_NetlistBit bit = 0;
+      std::string const constant = PropertyValue(signal, kConstant);
+      if (!constant.empty())
+        bit = constant == "0"   ? Lum_NetlistBits::kZero
+              : constant == "1" ? Lum_NetlistBits::kOne
+              : constant == "x" ? Lum_NetlistBits::kUndefined
+                                : Lum_NetlistBits::kFloating;
+      else
+        bit = Fresh(module);
+      bits.emplace(signal, bit);
+      Orb_Property const *names = signal->GetPropertyByName(kNames);
+      bool named = false;
+      if (names)
+        for (std::string const &entry : names->GetStrings()) {
+          std::size_t const blank = entry.find(' ');
+          if (blank == std::string::npos)
+            continue;
+          auto const found = netIndex.find(entry.substr(blank + 1));
+          std::uint32_t const position =
+              static_cast<std::uint32_t>(std::strtoul(entry.c_str(), nullptr, 10));
+          if (found == netIndex.end() || position >= netBits[found->second].size())
+            continue;
+          netBits[found->second][position] = bit;
+          named = true;
+        }
+      if (!named && constant.empty()) {
+        Lum_NetlistVector net;
+        std::string const name = signal->GetName();
+        net.name = m_Netlist.Intern(name);
+        net.hidden = !name.empty() && name[0] == '$';
+        net.bits.width = 1;
+        if (!netIndex.emplace(name, nets.size()).second)
+          continue;
+        nets.push_back(net);
+        netBits.emplace_back(1, bit);
+      }
+    }
+    // Ports: declared ones, or one per pin.
+    std::vector<Lum_NetlistVector> ports = DeclaredPorts(m_Netlist, pending.meta);
+    if (ports.empty() && !pending.meta->GetPropertyByName(kPorts))
+      for (Orb_Pin const *pin : block->GetPins()) {
+        Lum_NetlistVector port;
+        port.name = m_Netlist.Intern(pin->GetName());
+        port.direction = DirectionOf(pin->GetDirection());
+        port.bits.width = 1;
+        ports.push_back(port);
+      }
+    for (Lum_NetlistVector &port : ports) {
+      std::vector<Lum_NetlistBit> portBits(port.bits.width);
+      for (std::uint32_t p = 0; p < port.bits.width; ++p) {
+        Orb_Pin const *pin = block->GetPinByName(
+            Lum_NetlistNames::BitName(m_Netlist.Text(port.name), port, p).c_str());
+        Orb_Signal const *inner = pin ? pin->GetInnerSignal() : nullptr;
+        portBits[p] = inner ? bits.at(inner) : Fresh(module);
+      }
+      port.bits = module.AddBits(portBits);
+      module.ports.push_back(port);
+    }
+    for (std::size_t n = 0; n < nets.size(); ++n) {
+      for (Lum_NetlistBit &bit : netBits[n])
+        if (bit == Lum_Netlist::kNone)
+          bit = Fresh(module);
+      nets[n].bits = module.AddBits(netBits[n]);
+      module.netNames.push_back(nets[n]);
+    }
+    std::size_t const children = pending.block->GetBlocks().size();
+    for (std::size_t i = 0; i < children; ++i)
+      AddCell(module, pending.block->GetBlock(i), bits);
+  }
+
+  void AddCell(Lum_NetlistModule &module, Lum_TdmBlock *child,
+               std::unordered_map<Orb_Signal const *, Lum_NetlistBit> const &bits) {
+    auto const [type, definition] = CellType(child);
+    if (definition && m_Defined.insert(type).second)
+      m_Queue.push_back({child, definition, type});
+    Lum_NetlistCell cell;
+    cell.name = m_Netlist.Intern(child->GetName());
+    cell.type = type;
+    Orb_Block const *host = child->GetOrbBlock();
+    // Bus pins by port, positions from the module's declaration when there
+    // is one, else from the smallest index.
+    std::vector<Lum_NetlistVector> const declared =
+        definition ? DeclaredPorts(m_Netlist, definition) : std::vector<Lum_NetlistVector>();
+    struct Port {
+      std::string_view name;
+      Lum_NetlistDirection direction;
+      std::vector<std::pair<std::int64_t, Orb_Pin const *>> pins;
+    };
+    std::vector<Port> ports;
+    for (std::size_t i = 0; i < child->GetPins().size(); ++i) {
+      // A typed pin stands for its type pin, whatever its own name.
+      Lum_TdmPin const *client = child->GetPin(i);
+      Orb_Pin const *pin = client->GetOrbPin();
+      auto const [base, index] = Lum_NetlistNames::SplitBitName(
+          client->GetTypePin() ? client->GetTypePin()->GetName() : pin->GetName());
+      // Cells have few ports: a search is cheaper than a map.
+      std::size_t at = 0;
+      while (at < ports.size() && ports[at].name != base)
+        ++at;
+      if (at == ports.size())
+        ports.push_back({base, DirectionOf(pin->GetDirection()), {}});
+      ports[at].pins.emplace_back(index, pin);
+    }
+    cell.firstConnection = static_cast<std::uint32_t>(module.connections.size());
+    for (Port &port : ports) {
+      bool connected = false;
+      for (auto const &entry : port.pins)
+        connected = connected || entry.second->GetSignal();
+      if (!connected)
+        continue;
+      Lum_NetlistVector const *declaration = nullptr;
+      for (Lum_NetlistVector const &candidate : declared)
+        if (m_Netlist.Text(candidate.name) == port.name)
+          declaration = &candidate;
+      std::int64_t low = port.pins.front().first;
+      std::int64_t high = low;
+      for (auto const &entry : port.pins) {
+        low = std::min(low, entry.first);
+        high = std::max(high, entry.first);
+      }
+      std::uint32_t width = static_cast<std::uint32_t>(high - low + 1);
+      if (declaration)
+        width = declaration->bits.width;
+      std::vector<Lum_NetlistBit> portBits(width, Lum_Netlist::kNone);
+      for (auto const &[index, pin] : port.pins) {
+        std::int64_t position = index - low;
+        if (declaration)
+          position = declaration->upto
+                         ? std::int64_t(declaration->offset) + declaration->bits.width - 1 - index
+                         : index - declaration->offset;
+        if (position < 0 || position >= width)
+          continue;
+        Orb_Signal const *signal = pin->GetSignal();
+        portBits[static_cast<std::size_t>(position)] = signal ? bits.at(signal) : Fresh(module);
+      }
+      for (Lum_NetlistBit &bit : portBits)
+        if (bit == Lum_Netlist::kNone)
+          bit = Fresh(module);
+      Lum_NetlistConnection connection;
+      connection.port = m_Netlist.Intern(port.name);
+      connection.direction = port.direction;
+      connection.bits = module.AddBits(portBits);
+      module.connections.push_back(connection);
+    }
+    cell.numConnections =
+        static_cast<std::uint32_t>(module.connections.size()) - cell.firstConnection;
+    cell.firstParameter = static_cast<std::uint32_t>(module.parameters.size());
+    for (char const *name : {kParameters, kStringParameters})
+      if (Orb_Property const *list = host->GetPropertyByName(name))
+        for (auto const &member : list->GetMembers()) {
+          Lum_NetlistParameter parameter;
+          parameter.name = m_Netlist.Intern(member->GetName());
+          parameter.value = m_Netlist.Intern(member->GetValue());
+          parameter.isString = name == kStringParameters;
+          module.parameters.push_back(parameter);
+        }
+    cell.numParameters = static_cast<std::uint32_t>(module.parameters.size()) - cell.firstParameter;
+    module.cells.push_back(cell);
+  }
+
+  Lum_TdmView &m_View;
+  Lum_Netlist m_Netlist;
+  std::deque<Pending> m_Queue;
+  std::unordered_set<Lum_NetlistName> m_Defined;
+};
+
+} // namespace
+
+Lum_Netlist Lum_NetlistExporter::Export(Lum_TdmView &view) {
+  Exporter exporter(view);
+  return exporter.Run();
+}

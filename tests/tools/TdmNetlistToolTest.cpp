@@ -1,0 +1,161 @@
+// tdm import, export, rebind and find, run as processes on the real design
+// the repository carries (examples/data): a synthesized netlist and its
+// Liberty file.
+
+#include "../Lum_TdmTestSupport.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <cstdlib>
+#include <filesystem>
+#include <fstream>
+#include <string>
+#include <sys/wait.h>
+#include <vector>
+
+using lumtest::FileBytes;
+using ::testing::HasSubstr;
+using ::testing::Not;
+
+namespace {
+
+char const kLibrary[] = "sg13g2_stdcell_typ_1p20V_25C";
+
+struct ToolRun {
+  int code = -1;
+  std::string out;
+  std::string err;
+};
+
+class TdmNetlist : public ::testing::Test {
+public:
+  static void SetUpTestSuite() {
+    s_Dir = new lumtest::TempDir;
+    s_Imported = Tdm({"import", Data("serv_sg13g2_hier.v"), "--lib",
+                      Data("sg13g2_stdcell_typ_1p20V_25C.filtered.lib"), "-o", File("serv.odb")});
+  }
+  static void TearDownTestSuite() { delete s_Dir; }
+
+  static std::string Data(char const *name) { return std::string(LUM_EXAMPLE_DATA) + "/" + name; }
+  static std::string File(std::string const &name) { return s_Dir->File(name); }
+
+  static ToolRun Tdm(std::vector<std::string> const &args) {
+    std::string command = "exec '" + std::string(TDM_PATH) + "'";
+    for (std::string const &arg : args)
+      command += " '" + arg + "'";
+    command += " >'" + File("out.txt") + "' 2>'" + File("err.txt") + "'";
+    int const status = std::system(command.c_str());
+    ToolRun run;
+    run.code = WIFEXITED(status) ? WEXITSTATUS(status) : 128 + WTERMSIG(status);
+    run.out = FileBytes(File("out.txt"));
+    run.err = FileBytes(File("err.txt"));
+    return run;
+  }
+  // A copy of the imported database to change.
+  static std::string Copy(std::string const &name) {
+    std::filesystem::copy_file(File("serv.odb"), File(name),
+                               std::filesystem::copy_options::overwrite_existing);
+    return File(name);
+  }
+
+protected:
+  static lumtest::TempDir *s_Dir;
+  static ToolRun s_Imported;
+};
+
+lumtest::TempDir *TdmNetlist::s_Dir = nullptr;
+ToolRun TdmNetlist::s_Imported;
+
+TEST_F(TdmNetlist, ImportsTheRealDesignWhichThenChecksClean) {
+  ASSERT_EQ(s_Imported.code, 0) << s_Imported.err;
+  EXPECT_THAT(s_Imported.out, HasSubstr("top serv_rf_top, 14 modules, 4667 cell instances"));
+  EXPECT_TRUE(std::filesystem::exists(File(std::string(kLibrary) + ".tlm")));
+  ToolRun const check = Tdm({"check", "--lib-path", s_Dir->Path(), File("serv.odb")});
+  EXPECT_EQ(check.code, 0) << check.out << check.err;
+  EXPECT_THAT(check.out, HasSubstr("no problems"));
+}
+
+TEST_F(TdmNetlist, RebindSwapsEveryMatchingBlockAndTheExportShowsIt) {
+  ASSERT_EQ(s_Imported.code, 0) << s_Imported.err;
+  std::string const db = Copy("rebind.odb");
+  std::string const from = std::string(kLibrary) + ":sg13g2_inv_1";
+  std::string const to = std::string(kLibrary) + ":sg13g2_inv_2";
+  auto count = [&db](std::string const &type) {
+    ToolRun const run = Tdm({"find", "--lib-path", s_Dir->Path(), db, "--type", type, "--count"});
+    EXPECT_EQ(run.code, 0) << run.err;
+    return std::atoi(run.out.c_str());
+  };
+  int const before = count(from);
+  int const others = count(to);
+  ASSERT_GT(before, 100);
+  // Only under one instance first, then everywhere.
+  ToolRun const some = Tdm({"rebind", "--lib-path", s_Dir->Path(), db, "--from", from, "--to", to,
+                            "--where", "serv_rf_top/cpu/*"});
+  ASSERT_EQ(some.code, 0) << some.err;
+  int const moved = before - count(from);
+  EXPECT_GT(moved, 0);
+  EXPECT_LT(moved, before);
+  EXPECT_EQ(count(to), others + moved);
+  ToolRun const all = Tdm({"rebind", "--lib-path", s_Dir->Path(), db, "--from", from, "--to", to});
+  ASSERT_EQ(all.code, 0) << all.err;
+  EXPECT_EQ(count(from), 0);
+  EXPECT_EQ(count(to), others + before);
+  ToolRun const exported = Tdm({"export", "--lib-path", s_Dir->Path(), db, "--format", "verilog"});
+  ASSERT_EQ(exported.code, 0) << exported.err;
+  EXPECT_THAT(exported.out, HasSubstr("sg13g2_inv_2 "));
+  EXPECT_THAT(exported.out, Not(HasSubstr("sg13g2_inv_1 ")));
+}
+
+TEST_F(TdmNetlist, ARebindThatFailsForOneBlockLeavesTheDatabaseByteIdentical) {
+  ASSERT_EQ(s_Imported.code, 0) << s_Imported.err;
+  std::string const db = Copy("failing.odb");
+  std::string const bytes = FileBytes(db);
+  // A flip-flop has pins an inverter lacks.
+  ToolRun const run = Tdm({"rebind", "--lib-path", s_Dir->Path(), db, "--from",
+                           std::string(kLibrary) + ":sg13g2_dfrbp_1", "--to",
+                           std::string(kLibrary) + ":sg13g2_inv_1", "--map", "D=A,Q=Y"});
+  EXPECT_EQ(run.code, 1);
+  EXPECT_THAT(run.err, HasSubstr("tdm rebind: error: block serv_rf_top/"));
+  EXPECT_THAT(run.err, HasSubstr("\" has no pin \""));
+  EXPECT_THAT(run.err, HasSubstr("is unchanged"));
+  EXPECT_EQ(FileBytes(db), bytes);
+}
+
+TEST_F(TdmNetlist, ImportRefusalsNameTheProblemAndWriteNothing) {
+  std::string const netlist = File("bad.v");
+  std::string const db = File("bad.odb");
+  struct Case {
+    char const *text;
+    std::vector<std::string> extra;
+    char const *message;
+  };
+  for (Case const &bad : std::vector<Case>{
+           {"module m(input a);\n  always @(a) ;\nendmodule\n",
+            {},
+            "bad.v\": line 2, column 3: 'always' is not structural"},
+           {"module m(input a, output y);\n  FOO f1 (.A(a), .Y(y));\n  FOO f2 (.A(a));\n  BAR "
+            "b (.A(a));\nendmodule\n",
+            {},
+            "2 cell types are in no type library: BAR (1 instance, e.g. b); FOO (2 instances, "
+            "e.g. f1, f2)."},
+       }) {
+    { std::ofstream(netlist) << bad.text; }
+    std::vector<std::string> args = {
+        "import", netlist, "--lib", Data("sg13g2_stdcell_typ_1p20V_25C.filtered.lib"), "-o", db};
+    ToolRun const run = Tdm(args);
+    EXPECT_EQ(run.code, 3) << bad.message;
+    EXPECT_THAT(run.err, HasSubstr(bad.message));
+    EXPECT_THAT(run.err, HasSubstr("nothing was written"));
+    EXPECT_FALSE(std::filesystem::exists(db));
+  }
+  // With --blackbox-unknown the unknown cells come in untyped and go out as
+  // they were.
+  ToolRun const run = Tdm({"import", netlist, "--blackbox-unknown", "-o", db});
+  ASSERT_EQ(run.code, 0) << run.err;
+  EXPECT_THAT(run.out, HasSubstr("3 untyped"));
+  ToolRun const exported = Tdm({"export", db, "--format", "verilog"});
+  EXPECT_THAT(exported.out, HasSubstr("FOO f2 (\n    .A(a)\n  );"));
+}
+
+} // namespace

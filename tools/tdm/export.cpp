@@ -1,0 +1,60 @@
+// tdm export: a view of a database as a gate-level netlist, JSON or
+// structural Verilog, its hierarchy folded back into modules.
+
+#include "commands.h"
+
+#include "Lum_NetlistExporter.h"
+#include "Lum_NetlistWriter.h"
+#include "Lum_TdmModel.h"
+#include "Lum_TdmView.h"
+
+#include "Orb_Model.h"
+#include "Port_Exception.h"
+
+#include <iostream>
+
+namespace tdm {
+
+int RunExport(std::string const &path, ExportOptions const &exported,
+              CommonOptions const &options) {
+  Lum_NetlistWriter::Format format = Lum_NetlistWriter::FormatOf(exported.output);
+  if (exported.format == "json")
+    format = Lum_NetlistWriter::Format::Json;
+  else if (exported.format == "verilog")
+    format = Lum_NetlistWriter::Format::Verilog;
+  else if (!exported.format.empty())
+    throw Failure(kExitUsage, "--format is json or verilog, not " + Quoted(exported.format));
+  ApplyLibraryPath(options);
+  std::unique_ptr<Lum_TdmModel> model = OpenTyped(path, options);
+  std::vector<Orb_View *> const views = SelectViews(*model, path, exported.view);
+  if (views.size() != 1) {
+    std::string names;
+    for (Orb_View const *view : views)
+      names += (names.empty() ? "" : ", ") + ViewPath(view);
+    throw Failure(kExitUsage, path + ": " +
+                                  (views.empty() ? "has no view"
+                                                 : "holds several views (" + names +
+                                                       "): choose one with --view"));
+  }
+  auto *view = static_cast<Lum_TdmView *>(model->Specialize(views.front()));
+  try {
+    Lum_Netlist const netlist = Lum_NetlistExporter::Export(*view);
+    if (exported.output.empty()) {
+      if (format == Lum_NetlistWriter::Format::Json)
+        Lum_NetlistWriter::WriteJson(netlist, std::cout);
+      else
+        Lum_NetlistWriter::WriteVerilog(netlist, std::cout, "standard output");
+      std::cout.flush();
+    } else {
+      Lum_NetlistWriter::Save(netlist, exported.output, format);
+      if (!options.quiet)
+        std::cerr << "wrote " << exported.output << " (" << netlist.modules.size() << " module"
+                  << (netlist.modules.size() == 1 ? "" : "s") << ")\n";
+    }
+  } catch (Port::Exception const &e) {
+    throw Failure(kExitUnreadable, Describe(e) + "; nothing was written");
+  }
+  return kExitOk;
+}
+
+} // namespace tdm
