@@ -39,7 +39,6 @@ char const kRevision[] = "$Revision: 1.1 $";
 
 using Lum_TdmSchema::kBlockPinMap;
 using Lum_TdmSchema::kBlockType;
-using Lum_TdmSchema::kDontCreateUnusedPins;
 
 // A pin whose name differs from its type pin's. A pin without a type pin is
 // not one: it has nothing to record.
