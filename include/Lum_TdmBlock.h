@@ -94,7 +94,12 @@ public:
   // - the check of SetTypeBlock above fails (type block's name);
   // - the map has more entries than the block has pins (type block's name);
   // - a pin has no mapping or one to another type block's pin (the first such
-  //   pin's name, in host order).
+  //   pin's name, in host order);
+  // - the next open after a commit would refuse the block: a type pin that no
+  //   pin takes while a pin holds its name, so that the open could not create
+  //   it (that pin's name; the message names the block and how to mend it).
+  //   The view's LUM_DONT_CREATE_UNUSED_PINS does not count: a commit
+  //   removes it.
   // The block keeps no reference to the map.
   void SetTypeBlock(Lum_TlmBlock const *typeBlock, Lum_TdmTypePinMap const &pinMap);
 
@@ -158,6 +163,8 @@ public:
 
   // Commits the block, then its pins, its signals and each child block with
   // its whole subtree, in host order. Objects without a client get one.
+  // Called on its own (not from its view's commit), it first checks the
+  // subtree as the view's commit does and writes nothing when that fails.
   virtual void TraverseAndCommitToOrb();
   virtual std::uint64_t DbgMySize() const;
   virtual std::uint64_t DbgClassSize() const;

@@ -7,6 +7,7 @@
 #include <string>
 #include <vector>
 
+class Orb_Block;
 class Orb_Design;
 class Orb_Model;
 class Orb_View;
@@ -81,7 +82,17 @@ public:
   // Checks one view of a host model (whether a client model binds it or not).
   static std::vector<Problem> Check(Orb_View *view);
 
+  // Objects as the problems name them: "manager/design",
+  // "manager/design/view", and a block as "top/child/...".
+  static std::string DesignPath(Orb_Design const *design);
+  static std::string ViewPath(Orb_View const *view);
+  static std::string BlockPath(Orb_Block const *block);
+
 private:
+  // Runs `check` on a verifier that collects, with the message manager's
+  // reports kept from the output.
+  static std::vector<Problem> Collect(std::function<void(Lum_TdmVerifier &)> const &check);
+
   Report m_Report;
   std::function<void()> m_OnBlock;
   std::uint64_t m_Views = 0;

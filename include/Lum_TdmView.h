@@ -56,7 +56,12 @@ public:
   void DebugDumpCallback(Port::Stream *stream, int indent) const override;
 
   // Commits the whole view: itself, its networks, its block tree and, when it
-  // is a user design, its design. A failure leaves what was committed.
+  // is a user design, its design. First every typed block is checked as the
+  // next open would bind what the commit stores; a block it would refuse (a
+  // connected pin that finds no type pin, or, unless the view carries
+  // LUM_DONT_CREATE_UNUSED_PINS, a type pin it could not create because a
+  // pin holds its name) throws Lum_ExceptionInvalidTypeBlock naming the pin,
+  // with nothing written. Another failure leaves what was committed.
   virtual void CommitAll();
   virtual void TraverseAndCommitToOrb();
   // The local library, obtained from the type-library component and added at

@@ -39,7 +39,6 @@ char const kRevision[] = "$Revision: 1.1 $";
 
 using Lum_TdmSchema::kBlockPinMap;
 using Lum_TdmSchema::kBlockType;
-using Lum_TdmSchema::kDontCreateUnusedPins;
 
 // A pin whose name differs from its type pin's. A pin without a type pin is
 // not one: it has nothing to record.
@@ -666,9 +665,12 @@ void Lum_TdmBlock::VerifyCommit(bool viewForbidsCreating) const {
   Lum_TdmLoadRules::Refusal const refusal = Lum_TdmLoadRules::Predict(
       GetOrbBlock(), reopened,
       Lum_TdmLoadRules::CreatesMissing(reopened, GetOrbBlock(), viewForbidsCreating),
-      [&](Orb_Pin *pin) {
+      [&](Orb_Pin *pin) -> Lum_TlmPin const * {
         Lum_TlmPin const *typePin =
             Lum_TdmClient::Of<Lum_TdmPin>(context, bridge, pin)->GetTypePin();
+        // A type pin of that very block is found by its name: no lookup.
+        if (typePin && typePin->GetParent() == reopened)
+          return typePin;
         return reopened->GetPinByName(typePin ? typePin->GetName() : pin->GetName());
       });
   if (refusal)

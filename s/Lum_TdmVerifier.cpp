@@ -18,24 +18,6 @@ namespace {
 using Kind = Lum_TdmVerifier::Kind;
 using Problem = Lum_TdmVerifier::Problem;
 
-std::string DesignPath(Orb_Design const *design) {
-  return std::string(design->GetParent()->GetName()) + "/" + design->GetName();
-}
-
-std::string ViewPath(Orb_View const *view) {
-  return DesignPath(view->GetParent()) + "/" + view->GetName();
-}
-
-std::string BlockPath(Orb_Block const *block) {
-  std::vector<Orb_Block const *> chain;
-  for (Orb_Block const *b = block; b; b = b->GetParent())
-    chain.push_back(b);
-  std::string path;
-  for (auto it = chain.rbegin(); it != chain.rend(); ++it)
-    path += (path.empty() ? "" : "/") + std::string((*it)->GetName());
-  return path;
-}
-
 // The class of an exception that loading a library threw.
 char const *ClassOf(Port::Exception const &e) {
   if (dynamic_cast<Lum_ExceptionInvalidLibrary const *>(&e))
@@ -93,6 +75,24 @@ private:
 };
 
 } // namespace
+
+std::string Lum_TdmVerifier::DesignPath(Orb_Design const *design) {
+  return std::string(design->GetParent()->GetName()) + "/" + design->GetName();
+}
+
+std::string Lum_TdmVerifier::ViewPath(Orb_View const *view) {
+  return DesignPath(view->GetParent()) + "/" + view->GetName();
+}
+
+std::string Lum_TdmVerifier::BlockPath(Orb_Block const *block) {
+  std::vector<Orb_Block const *> chain;
+  for (Orb_Block const *b = block; b; b = b->GetParent())
+    chain.push_back(b);
+  std::string path;
+  for (auto it = chain.rbegin(); it != chain.rend(); ++it)
+    path += (path.empty() ? "" : "/") + std::string((*it)->GetName());
+  return path;
+}
 
 Lum_TdmVerifier::Lum_TdmVerifier(Report report, std::function<void()> onBlock)
     : m_Report(std::move(report)), m_OnBlock(std::move(onBlock)) {}
@@ -253,23 +253,22 @@ void Lum_TdmVerifier::CheckView(Orb_View *view) {
   }
 }
 
+std::vector<Lum_TdmVerifier::Problem>
+Lum_TdmVerifier::Collect(std::function<void(Lum_TdmVerifier &)> const &check) {
+  std::vector<Problem> problems;
+  Port_MsgCapture const quiet;
+  Lum_TdmVerifier verifier([&problems](Problem const &problem) { problems.push_back(problem); });
+  check(verifier);
+  return problems;
+}
+
 std::vector<Lum_TdmVerifier::Problem> Lum_TdmVerifier::CheckFile(std::string const &path) {
   // A model of its own, with no client model attached: nothing is bound.
   Orb_Model host("checked", "checked", path.c_str(), true);
   host.Open(path.c_str());
-  std::vector<Problem> problems;
-  Port_MsgCapture const quiet;
-  Lum_TdmVerifier([&problems](Problem const &problem) {
-    problems.push_back(problem);
-  }).CheckModel(host);
-  return problems;
+  return Collect([&host](Lum_TdmVerifier &verifier) { verifier.CheckModel(host); });
 }
 
 std::vector<Lum_TdmVerifier::Problem> Lum_TdmVerifier::Check(Orb_View *view) {
-  std::vector<Problem> problems;
-  Port_MsgCapture const quiet;
-  Lum_TdmVerifier([&problems](Problem const &problem) {
-    problems.push_back(problem);
-  }).CheckView(view);
-  return problems;
+  return Collect([view](Lum_TdmVerifier &verifier) { verifier.CheckView(view); });
 }

@@ -1,6 +1,7 @@
 #include "common.h"
 
 #include "Lum_TdmModel.h"
+#include "Lum_TdmVerifier.h"
 
 #include "Lum_Tlm.h"
 #include "Orb_Exception.h"
@@ -63,26 +64,11 @@ std::string Quoted(std::string const &name) {
   return quoted + "\"";
 }
 
-std::string DesignPath(Orb_Design const *design) {
-  return std::string(design->GetParent()->GetName()) + "/" + design->GetName();
-}
+std::string DesignPath(Orb_Design const *design) { return Lum_TdmVerifier::DesignPath(design); }
 
-std::string ViewPath(Orb_View const *view) {
-  return DesignPath(view->GetParent()) + "/" + view->GetName();
-}
+std::string ViewPath(Orb_View const *view) { return Lum_TdmVerifier::ViewPath(view); }
 
-std::string BlockPath(Orb_Block const *block) {
-  std::vector<Orb_Block const *> chain;
-  for (Orb_Block const *b = block; b; b = b->GetParent())
-    chain.push_back(b);
-  std::string path;
-  for (auto it = chain.rbegin(); it != chain.rend(); ++it) {
-    if (!path.empty())
-      path += '/';
-    path += (*it)->GetName();
-  }
-  return path;
-}
+std::string BlockPath(Orb_Block const *block) { return Lum_TdmVerifier::BlockPath(block); }
 
 // ---------------------------------------------------------------------------
 // Progress
