@@ -121,10 +121,14 @@ public:
   void Remove(T *item) noexcept;
   // Forgets every element without touching them; keeps the room.
   void Clear() noexcept { m_Size = m_Start = m_Clean = m_Scan = m_Count = 0; }
-  // Sorts the elements with `less`, stably.
+  // Sorts the elements with `less`, stably. A copy is sorted and put in
+  // place only when the sort is done: a `less` that throws leaves the list
+  // as it was.
   template <class Less> void StableSort(Less const &less) {
     Squeeze(m_Size);
-    std::stable_sort(Slots() + m_Start, Slots() + m_Size, less);
+    std::vector<T *> sorted(Slots() + m_Start, Slots() + m_Size);
+    std::stable_sort(sorted.begin(), sorted.end(), less);
+    std::copy(sorted.begin(), sorted.end(), Slots() + m_Start);
     Renumber(m_Start);
   }
   // Approximate heap bytes the list holds.

@@ -138,11 +138,18 @@ private:
   ByteWriter *m_pOut = nullptr;
   ByteReader *m_pIn = nullptr;
 
-  // Saving: numbers of the current view's pins and signals by bridge id, and
-  // its signals in number order.
+  // Saving: pins and signals by bridge id, numbered from 1 in the order
+  // written across the whole save (0: not written). An object written in
+  // the current view has a number above the count when the view began, and
+  // is written in it as the difference less one. Anything else (an object
+  // whose deletion is held, still listed by a signal or a network) is left
+  // out.
   std::vector<std::uint64_t> m_PinNumber;
   std::vector<std::uint64_t> m_SignalNumber;
   std::uint64_t m_PinCount = 0;
+  std::uint64_t m_SignalCount = 0;
+  std::uint64_t m_ViewPinBase = 0;
+  std::uint64_t m_ViewSignalBase = 0;
   std::vector<Orb_Signal const *> m_ViewSignals;
 
   // Opening: the current view's pins and signals in number order.
@@ -232,27 +239,38 @@ void Orb_ModelIO::WriteDesignMgr(Orb_DesignMgr const *designMgr) {
 void Orb_ModelIO::WriteView(Orb_View const *view) {
   m_pOut->Named('W', view->GetNameString());
   WriteProperties(view);
-  m_PinCount = 0;
+  m_ViewPinBase = m_PinCount;
+  m_ViewSignalBase = m_SignalCount;
   m_ViewSignals.clear();
   if (view->GetBlock())
     WriteBlock(view->GetBlock());
   for (std::size_t s = 0; s < m_ViewSignals.size(); ++s) {
     auto const pins = m_ViewSignals[s]->GetPins();
-    if (pins.empty())
+    auto const written = [this](Orb_Pin const *pin) {
+      return m_PinNumber[pin->GetBridgeId()] > m_ViewPinBase;
+    };
+    auto const count = std::count_if(pins.begin(), pins.end(), written);
+    if (count == 0)
       continue;
     m_pOut->Tag('C');
     m_pOut->Num(s);
-    m_pOut->Num(pins.size());
+    m_pOut->Num(static_cast<std::uint64_t>(count));
     for (Orb_Pin const *pin : pins)
-      m_pOut->Num(m_PinNumber[pin->GetBridgeId()]);
+      if (written(pin))
+        m_pOut->Num(m_PinNumber[pin->GetBridgeId()] - m_ViewPinBase - 1);
     m_pOut->End();
   }
   for (Orb_Network const *network : view->GetNetworks()) {
     m_pOut->Tag('N');
     m_pOut->Str(network->GetNameString());
-    m_pOut->Num(network->GetSignals().size());
-    for (Orb_Signal const *signal : network->GetSignals())
-      m_pOut->Num(m_SignalNumber[signal->GetBridgeId()]);
+    auto const signals = network->GetSignals();
+    auto const written = [this](Orb_Signal const *signal) {
+      return m_SignalNumber[signal->GetBridgeId()] > m_ViewSignalBase;
+    };
+    m_pOut->Num(static_cast<std::uint64_t>(std::count_if(signals.begin(), signals.end(), written)));
+    for (Orb_Signal const *signal : signals)
+      if (written(signal))
+        m_pOut->Num(m_SignalNumber[signal->GetBridgeId()] - m_ViewSignalBase - 1);
     m_pOut->End();
     WriteProperties(network);
   }
@@ -264,7 +282,7 @@ void Orb_ModelIO::WriteBlock(Orb_Block const *block) {
   m_pOut->Named('B', block->GetNameString());
   WriteProperties(block);
   for (Orb_Pin const *pin : block->GetPins()) {
-    m_PinNumber[pin->GetBridgeId()] = m_PinCount++;
+    m_PinNumber[pin->GetBridgeId()] = ++m_PinCount;
     m_pOut->Tag('I');
     m_pOut->Num(pin->GetDirection());
     m_pOut->Str(pin->GetNameString());
@@ -272,7 +290,7 @@ void Orb_ModelIO::WriteBlock(Orb_Block const *block) {
     WriteProperties(pin);
   }
   for (Orb_Signal const *signal : block->GetSignals()) {
-    m_SignalNumber[signal->GetBridgeId()] = m_ViewSignals.size();
+    m_SignalNumber[signal->GetBridgeId()] = ++m_SignalCount;
     m_ViewSignals.push_back(signal);
     m_pOut->Named('S', signal->GetNameString());
     WriteProperties(signal);
