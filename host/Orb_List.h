@@ -16,6 +16,7 @@
 // deletions costs, like a vector's erase, the distance between them.
 
 #include "Lum_PlatformApi.h"
+#include "Orb_Hash.h"
 #include "Orb_Pool.h"
 
 #include <algorithm>
@@ -315,7 +316,7 @@ private:
   };
   static_assert(sizeof(Group) == 64 && sizeof(Table) == 64, "one cache line each");
 
-  static std::size_t Hash(std::string_view name) { return std::hash<std::string_view>()(name); }
+  static std::size_t Hash(std::string_view name) { return Orb_NameHash()(name); }
   // The top byte of the hash, kept clear of kEmpty and kTombstone.
   static std::uint8_t Tag(std::size_t hash) {
     auto const top = static_cast<std::uint8_t>(hash >> (8 * sizeof(std::size_t) - 8));
