@@ -5,6 +5,7 @@
 #include "Orb_Debug.h"
 #include "Orb_Derived.h"
 #include "Orb_Exception.h"
+#include "Orb_Sanitizer.h"
 #include "Orb_SortFtor.h"
 
 #include <algorithm>
@@ -845,6 +846,7 @@ void Orb_ObjectPool::NextPage() {
 void *Orb_ObjectPool::Allocate() {
   if (m_pFree) {
     FreeSlot *slot = m_pFree;
+    Orb_Unpoison(slot, m_SlotSize);
     m_pFree = slot->next;
     return slot;
   }
@@ -856,7 +858,10 @@ void *Orb_ObjectPool::Allocate() {
   return slot;
 }
 
-void Orb_ObjectPool::Release(void *slot) noexcept { m_pFree = new (slot) FreeSlot{m_pFree}; }
+void Orb_ObjectPool::Release(void *slot) noexcept {
+  m_pFree = new (slot) FreeSlot{m_pFree};
+  Orb_Poison(slot, m_SlotSize);
+}
 
 namespace {
 
@@ -913,11 +918,7 @@ SmallPool &TheSmallPool() {
   return *pool;
 }
 
-#if defined(__SANITIZE_ADDRESS__)
-constexpr bool kPooled = false;
-#else
-constexpr bool kPooled = true;
-#endif
+constexpr bool kPooled = !ORB_ADDRESS_SANITIZER;
 
 } // namespace
 
