@@ -231,7 +231,9 @@ void Orb_List<T, SlotOf>::Squeeze(std::size_t upTo) const noexcept {
     }
     ++m_Scan;
   }
-  if (m_Scan == m_Size)
+  // Written only when it changes: the shared empty list that blocks without
+  // children read (in any thread) must stay untouched.
+  if (m_Scan == m_Size && m_Size != m_Clean)
     m_Size = m_Scan = m_Clean;
   // Holes gathered at the front go once they are half the list.
   if (m_Start > 0 && m_Clean == m_Size && m_Start >= m_Size / 2) {
