@@ -19,13 +19,23 @@ namespace {
 unsigned long g_Allocations = 0;
 unsigned long g_FailAt = 0;
 bool g_Armed = false;
+// Blocks from operator new not yet deleted.
+long g_Live = 0;
 
 void *Allocate(std::size_t size) {
   if (g_Armed && ++g_Allocations == g_FailAt)
     throw std::bad_alloc();
-  if (void *memory = std::malloc(size ? size : 1))
+  if (void *memory = std::malloc(size ? size : 1)) {
+    ++g_Live;
     return memory;
+  }
   throw std::bad_alloc();
+}
+
+void Free(void *memory) noexcept {
+  if (memory)
+    --g_Live;
+  std::free(memory);
 }
 
 enum Outcome { DONE, FAILED, BAD_EXCEPTION };
@@ -75,16 +85,12 @@ LUM_REPLACE void *operator new(std::size_t size, std::nothrow_t const &) noexcep
 LUM_REPLACE void *operator new[](std::size_t size, std::nothrow_t const &) noexcept {
   return TryAllocate(size);
 }
-LUM_REPLACE void operator delete(void *memory) noexcept { std::free(memory); }
-LUM_REPLACE void operator delete[](void *memory) noexcept { std::free(memory); }
-LUM_REPLACE void operator delete(void *memory, std::size_t) noexcept { std::free(memory); }
-LUM_REPLACE void operator delete[](void *memory, std::size_t) noexcept { std::free(memory); }
-LUM_REPLACE void operator delete(void *memory, std::nothrow_t const &) noexcept {
-  std::free(memory);
-}
-LUM_REPLACE void operator delete[](void *memory, std::nothrow_t const &) noexcept {
-  std::free(memory);
-}
+LUM_REPLACE void operator delete(void *memory) noexcept { Free(memory); }
+LUM_REPLACE void operator delete[](void *memory) noexcept { Free(memory); }
+LUM_REPLACE void operator delete(void *memory, std::size_t) noexcept { Free(memory); }
+LUM_REPLACE void operator delete[](void *memory, std::size_t) noexcept { Free(memory); }
+LUM_REPLACE void operator delete(void *memory, std::nothrow_t const &) noexcept { Free(memory); }
+LUM_REPLACE void operator delete[](void *memory, std::nothrow_t const &) noexcept { Free(memory); }
 
 using namespace lumtest;
 
@@ -167,6 +173,32 @@ TEST_F(TdmAllocFaultTest, FailedAllocationWhileSavingKeepsThePreviousDatabase) {
     ASSERT_EQ(FileBytes(path), previous);
   }
   EXPECT_NE(FirstView(*OpenModel(path))->GetBlock()->GetBlockByName("u1"), nullptr);
+}
+
+// Long names (a pin's, shared in the model's name table, and a block's and a signal's of their
+// own, over the table's size classes): a failure at any allocation leaks nothing.
+TEST_F(TdmAllocFaultTest, FailedAllocationWhileNamingLeaksNothing) {
+  std::string const pin(40, 'p'), block(300, 'b'), signal(300, 's');
+  auto const name = [&](unsigned long k) {
+    Orb_Model model("m", "db", "", false);
+    Orb_Block *top =
+        model.CreateDesignMgr("dm")->CreateDesign("d")->CreateView("v")->CreateTopBlock("t");
+    return FailAt(k, [&] {
+      top->CreateBlock(block.c_str())->CreatePin(pin.c_str(), Orb_Pin::PIN_INPUT);
+      top->CreateSignal(signal.c_str());
+    });
+  };
+  // Once through, for the process-wide pools.
+  ASSERT_EQ(name(0), DONE);
+  for (unsigned long k = 1;; ++k) {
+    SCOPED_TRACE("allocation " + std::to_string(k));
+    long const live = g_Live;
+    Outcome const outcome = name(k);
+    ASSERT_NE(outcome, BAD_EXCEPTION);
+    EXPECT_EQ(g_Live, live) << "blocks leaked";
+    if (outcome == DONE)
+      break;
+  }
 }
 
 int NoSync(int) { return 0; }

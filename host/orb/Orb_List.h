@@ -16,6 +16,7 @@
 // deletions costs, like a vector's erase, the distance between them.
 
 #include "Lum_PlatformApi.h"
+#include "Orb_Hash.h"
 #include "Orb_Pool.h"
 
 #include <algorithm>
@@ -121,10 +122,14 @@ public:
   void Remove(T *item) noexcept;
   // Forgets every element without touching them; keeps the room.
   void Clear() noexcept { m_Size = m_Start = m_Clean = m_Scan = m_Count = 0; }
-  // Sorts the elements with `less`, stably.
+  // Sorts the elements with `less`, stably. A copy is sorted and put in
+  // place only when the sort is done: a `less` that throws leaves the list
+  // as it was.
   template <class Less> void StableSort(Less const &less) {
     Squeeze(m_Size);
-    std::stable_sort(Slots() + m_Start, Slots() + m_Size, less);
+    std::vector<T *> sorted(Slots() + m_Start, Slots() + m_Size);
+    std::stable_sort(sorted.begin(), sorted.end(), less);
+    std::copy(sorted.begin(), sorted.end(), Slots() + m_Start);
     Renumber(m_Start);
   }
   // Approximate heap bytes the list holds.
@@ -226,7 +231,9 @@ void Orb_List<T, SlotOf>::Squeeze(std::size_t upTo) const noexcept {
     }
     ++m_Scan;
   }
-  if (m_Scan == m_Size)
+  // Written only when it changes: the shared empty list that blocks without
+  // children read (in any thread) must stay untouched.
+  if (m_Scan == m_Size && m_Size != m_Clean)
     m_Size = m_Scan = m_Clean;
   // Holes gathered at the front go once they are half the list.
   if (m_Start > 0 && m_Clean == m_Size && m_Start >= m_Size / 2) {
@@ -311,7 +318,7 @@ private:
   };
   static_assert(sizeof(Group) == 64 && sizeof(Table) == 64, "one cache line each");
 
-  static std::size_t Hash(std::string_view name) { return std::hash<std::string_view>()(name); }
+  static std::size_t Hash(std::string_view name) { return Orb_NameHash()(name); }
   // The top byte of the hash, kept clear of kEmpty and kTombstone.
   static std::uint8_t Tag(std::size_t hash) {
     auto const top = static_cast<std::uint8_t>(hash >> (8 * sizeof(std::size_t) - 8));

@@ -16,9 +16,15 @@ Orb_NameTable::~Orb_NameTable() {
 
 void *Orb_NameTable::Allocate(std::size_t bytes) {
   if (bytes > kClassLimit) {
-    m_Large.reserve(m_Large.size() + 1);
+    // Reserving room does not make the set's node: the insertion itself
+    // may fail, and must not lose the entry.
     void *entry = ::operator new(bytes);
-    m_Large.insert(entry);
+    try {
+      m_Large.insert(entry);
+    } catch (...) {
+      ::operator delete(entry);
+      throw;
+    }
     return entry;
   }
   void *&free = m_Free[bytes / kGrain];

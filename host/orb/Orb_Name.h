@@ -10,6 +10,7 @@
 // their index is a plain hash map.
 
 #include "Lum_PlatformApi.h"
+#include "Orb_Hash.h"
 
 #include <cstddef>
 #include <cstdint>
@@ -64,7 +65,7 @@ private:
     Orb_NameEntry *entry;
     std::size_t holders;
   };
-  std::unordered_map<std::string_view, Shared> m_Shared;
+  std::unordered_map<std::string_view, Shared, Orb_NameHash> m_Shared;
   // Free entries by size class (bytes / kGrain), each holding the next.
   std::vector<void *> m_Free = std::vector<void *>(kClassLimit / kGrain + 1, nullptr);
   std::vector<void *> m_Chunks;

@@ -2,6 +2,7 @@
 // and property values.
 
 #include "Orb_Pool.h"
+#include "Orb_Sanitizer.h"
 
 #include <algorithm>
 #include <cassert>
@@ -47,6 +48,7 @@ void Orb_ObjectPool::NextPage() {
 void *Orb_ObjectPool::Allocate() {
   if (m_pFree) {
     FreeSlot *slot = m_pFree;
+    Orb_Unpoison(slot, m_SlotSize);
     m_pFree = slot->next;
     return slot;
   }
@@ -58,7 +60,10 @@ void *Orb_ObjectPool::Allocate() {
   return slot;
 }
 
-void Orb_ObjectPool::Release(void *slot) noexcept { m_pFree = new (slot) FreeSlot{m_pFree}; }
+void Orb_ObjectPool::Release(void *slot) noexcept {
+  m_pFree = new (slot) FreeSlot{m_pFree};
+  Orb_Poison(slot, m_SlotSize);
+}
 
 namespace {
 
@@ -115,11 +120,7 @@ SmallPool &TheSmallPool() {
   return *pool;
 }
 
-#if defined(__SANITIZE_ADDRESS__)
-constexpr bool kPooled = false;
-#else
-constexpr bool kPooled = true;
-#endif
+constexpr bool kPooled = !ORB_ADDRESS_SANITIZER;
 
 } // namespace
 

@@ -1,6 +1,7 @@
 #include "Orb_Property.h"
 
 #include "Orb_Debug.h"
+#include "Orb_Hash.h"
 #include "Orb_Pool.h"
 
 #include <algorithm>
@@ -84,7 +85,7 @@ public:
 
 private:
   std::mutex m_Mutex;
-  std::unordered_map<std::string_view, char const *> m_Names;
+  std::unordered_map<std::string_view, char const *, Orb_NameHash> m_Names;
 };
 
 // Never destroyed: properties of static objects may outlive any static here.
@@ -200,50 +201,120 @@ Orb_PropertyHolder::~Orb_PropertyHolder() {
   Orb_SmallRelease(m_pArray, ArrayBytes(m_pArray->capacity));
 }
 
+namespace {
+
+// Adds position `at` of `entries` to an index of `slots` slots (a power of
+// two), probing linearly from the name's hash.
+void IndexAdd(std::uint32_t *index, std::size_t slots, Orb_Property *const *entries,
+              std::uint32_t at) {
+  std::size_t i = Orb_HashName(entries[at]->GetName()) & (slots - 1);
+  while (index[i] != 0)
+    i = (i + 1) & (slots - 1);
+  index[i] = at + 1;
+}
+
+// Takes position `at` out of the index, moving later entries of its probe
+// run back into the hole where their home allows.
+void IndexRemove(std::uint32_t *index, std::size_t slots, Orb_Property *const *entries,
+                 std::uint32_t at) {
+  std::size_t const mask = slots - 1;
+  std::size_t i = Orb_HashName(entries[at]->GetName()) & mask;
+  while (index[i] != at + 1)
+    i = (i + 1) & mask;
+  for (std::size_t j = (i + 1) & mask; index[j] != 0; j = (j + 1) & mask) {
+    std::size_t const home = Orb_HashName(entries[index[j] - 1]->GetName()) & mask;
+    if (((j - home) & mask) >= ((j - i) & mask)) {
+      index[i] = index[j];
+      i = j;
+    }
+  }
+  index[i] = 0;
+}
+
+} // namespace
+
+void Orb_PropertyHolder::Reindex(Array *array) noexcept {
+  std::size_t const slots = IndexSlots(array->capacity);
+  if (slots == 0)
+    return;
+  std::uint32_t *index = Index(array);
+  std::fill(index, index + slots, 0);
+  for (std::uint32_t at = 0; at < array->count; ++at)
+    IndexAdd(index, slots, Entries(array), at);
+}
+
+std::size_t Orb_PropertyHolder::Find(char const *name) const {
+  if (!m_pArray)
+    return 0;
+  Orb_Property *const *entries = Entries(m_pArray);
+  std::size_t const slots = IndexSlots(m_pArray->capacity);
+  if (slots == 0) {
+    std::size_t at = 0;
+    while (at < m_pArray->count && std::strcmp(entries[at]->GetName(), name) != 0)
+      ++at;
+    return at;
+  }
+  std::uint32_t const *index = Index(m_pArray);
+  for (std::size_t i = Orb_HashName(name) & (slots - 1); index[i] != 0; i = (i + 1) & (slots - 1))
+    if (std::strcmp(entries[index[i] - 1]->GetName(), name) == 0)
+      return index[i] - 1;
+  return m_pArray->count;
+}
+
 Orb_Property *Orb_PropertyHolder::GetPropertyByName(char const *name) const {
-  if (!name)
+  if (!name || !m_pArray)
     return nullptr;
-  for (Orb_Property *property : GetProperties())
-    if (std::strcmp(property->GetName(), name) == 0)
-      return property;
-  return nullptr;
+  std::size_t const at = Find(name);
+  return at < m_pArray->count ? Entries(m_pArray)[at] : nullptr;
 }
 
 Orb_Property *Orb_PropertyHolder::Insert(std::unique_ptr<Orb_Property> property) {
   std::uint32_t const count = m_pArray ? m_pArray->count : 0;
-  Orb_Property **entries = m_pArray ? Entries(m_pArray) : nullptr;
-  // Stored names are unique: equal names are the same pointer.
-  for (std::uint32_t i = 0; i < count; ++i) {
-    if (entries[i]->m_pName == property->m_pName) {
-      std::unique_ptr<Orb_Property> const old(entries[i]);
-      entries[i] = property.release();
-      return entries[i];
-    }
+  std::size_t const at = Find(property->GetName());
+  if (at < count) {
+    Orb_Property *&entry = Entries(m_pArray)[at];
+    std::unique_ptr<Orb_Property> const old(entry);
+    entry = property.release();
+    return entry;
   }
   if (!m_pArray || count == m_pArray->capacity) {
+    if (count > UINT32_MAX / 4)
+      throw std::length_error("too many properties on one object");
     std::uint32_t const capacity = count ? count * 2 : 1;
     std::size_t const bytes = ArrayBytes(capacity);
     auto *grown = new (Orb_SmallAllocate(bytes)) Array{count, capacity};
     if (m_pArray) {
-      std::copy(entries, entries + count, Entries(grown));
+      std::copy(Entries(m_pArray), Entries(m_pArray) + count, Entries(grown));
       Orb_SmallRelease(m_pArray, ArrayBytes(m_pArray->capacity));
     }
     m_pArray = grown;
+    Reindex(m_pArray);
   }
   Orb_Property *added = property.release();
-  Entries(m_pArray)[m_pArray->count++] = added;
+  Entries(m_pArray)[m_pArray->count] = added;
+  if (std::size_t const slots = IndexSlots(m_pArray->capacity))
+    IndexAdd(Index(m_pArray), slots, Entries(m_pArray), m_pArray->count);
+  ++m_pArray->count;
   return added;
 }
 
 void Orb_PropertyHolder::Erase(std::size_t index) noexcept {
   Orb_Property **entries = Entries(m_pArray);
+  std::size_t const slots = IndexSlots(m_pArray->capacity);
+  bool const last = index + 1 == m_pArray->count;
+  if (slots != 0 && last)
+    IndexRemove(Index(m_pArray), slots, entries, static_cast<std::uint32_t>(index));
   delete entries[index];
   std::copy(entries + index + 1, entries + m_pArray->count, entries + index);
   // The last property gone, the object is back to one null pointer.
   if (--m_pArray->count == 0) {
     Orb_SmallRelease(m_pArray, ArrayBytes(m_pArray->capacity));
     m_pArray = nullptr;
+    return;
   }
+  // Positions after it moved down: made afresh, linear like the move.
+  if (slots != 0 && !last)
+    Reindex(m_pArray);
 }
 
 Orb_Property *Orb_PropertyHolder::CreatePropertyString(char const *name, char const *value) {
@@ -259,15 +330,11 @@ Orb_Property *Orb_PropertyHolder::CreatePropertyList(char const *name) {
 }
 
 void Orb_PropertyHolder::DeleteProperty(char const *name) {
-  if (!name)
+  if (!name || !m_pArray)
     return;
-  Range const properties = GetProperties();
-  for (std::size_t i = 0; i < properties.size(); ++i) {
-    if (std::strcmp(properties[i]->GetName(), name) == 0) {
-      Erase(i);
-      return;
-    }
-  }
+  std::size_t const at = Find(name);
+  if (at < m_pArray->count)
+    Erase(at);
 }
 
 void Orb_PropertyHolder::DeleteProperty(Orb_Property *property) {

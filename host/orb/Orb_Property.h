@@ -171,17 +171,30 @@ public:
 
 private:
   // One small block: this header, then `capacity` property pointers of
-  // which the first `count` are in use.
+  // which the first `count` are in use. From kIndexFrom pointers on, a name
+  // index follows them: IndexSlots(capacity) slots, open addressing by the
+  // name's hash, each 0 (free) or a position plus one.
   struct Array {
     std::uint32_t count;
     std::uint32_t capacity;
   };
+  static constexpr std::uint32_t kIndexFrom = 16;
+  static std::size_t IndexSlots(std::size_t capacity) {
+    return capacity < kIndexFrom ? 0 : 2 * capacity;
+  }
   static std::size_t ArrayBytes(std::size_t capacity) {
-    return sizeof(Array) + capacity * sizeof(void *);
+    return sizeof(Array) + capacity * sizeof(void *) + IndexSlots(capacity) * sizeof(std::uint32_t);
   }
   static Orb_Property **Entries(Array *array) {
     return reinterpret_cast<Orb_Property **>(array + 1);
   }
+  static std::uint32_t *Index(Array *array) {
+    return reinterpret_cast<std::uint32_t *>(Entries(array) + array->capacity);
+  }
+  // The index over the array's entries, made afresh.
+  static void Reindex(Array *array) noexcept;
+  // The position of the property of that name, or `count` when none.
+  std::size_t Find(char const *name) const;
   Orb_Property *Insert(std::unique_ptr<Orb_Property> property);
   void Erase(std::size_t index) noexcept;
 

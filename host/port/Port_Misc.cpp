@@ -47,8 +47,10 @@ Exception::~Exception() = default;
 
 namespace {
 
-// The innermost live capture, or null when reports go to standard error.
-Port_MsgCapture *g_pCapture = nullptr;
+// The calling thread's innermost live capture, or null when its reports go
+// to standard error. Per thread: a capture collects only the reports of the
+// thread that made it.
+thread_local Port_MsgCapture *g_pCapture = nullptr;
 
 } // namespace
 

@@ -17,7 +17,8 @@ struct LUM_PLATFORM_API Port_MsgReport {
 };
 
 // A message record: where a report comes from. Reports go to standard error
-// unless a Port_MsgCapture is alive, which collects them instead.
+// unless the reporting thread has a live Port_MsgCapture, which collects them
+// instead.
 class LUM_PLATFORM_API Port_MsgManData {
 public:
   static Port_MsgManData createObject(char const *subsystem, char const *path, int line,
@@ -39,8 +40,9 @@ private:
   std::string m_Revision;
 };
 
-// While alive, collects every report in issue order instead of printing it.
-// Captures nest: the innermost one collects.
+// While alive, collects every report of the thread that made it, in issue
+// order, instead of printing it. Captures nest: the thread's innermost one
+// collects. A capture is used and destroyed by the thread that made it.
 class LUM_PLATFORM_API Port_MsgCapture {
 public:
   Port_MsgCapture();

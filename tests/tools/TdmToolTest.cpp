@@ -10,11 +10,13 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <cstdlib>
 #include <cstring>
 #include <fstream>
 #include <functional>
 #include <string>
+#include <sys/stat.h>
 #include <sys/wait.h>
 #include <tuple>
 #include <vector>
@@ -400,6 +402,37 @@ TEST_F(TdmTool, DotOutputIsAcceptedByGraphviz) {
   std::string const render = "dot -Tsvg " + Sh(File("chip.dot")) + " -o " + Sh(File("chip.svg"));
   EXPECT_EQ(std::system(render.c_str()), 0) << run.out;
   EXPECT_THAT(FileBytes(File("chip.svg")), HasSubstr("GATES:NAND2"));
+}
+
+// Every error is one line with control bytes of paths escaped; a negative depth is refused; a
+// FIFO or a folder is neither read (which would block) nor replaced, with exit code 3.
+TEST_F(TdmTool, OneLineErrorsAndOnlyRegularFiles) {
+  std::string const db = WriteDatabase("chip.odb");
+  std::string const odd = File("two\nlines.odb"), fifo = File("pipe.odb");
+  ASSERT_EQ(::mkfifo(fifo.c_str(), 0600), 0);
+  std::string const shownOdd = m_Dir + "/two\\nlines.odb";
+  using Case = std::tuple<std::vector<std::string>, int, std::string>;
+  for (auto const &[args, code, message] : std::vector<Case>{
+           {{"info", odd}, 3, "tdm info: error: " + shownOdd + ": "},
+           {{"check", odd}, 3, "tdm check: error: " + shownOdd + ": "},
+           {{"tree", db, "--depth", "-1"}, 2, "--depth: must be a whole number of 0 or more"},
+           {{"tree", db, "--depth", "x"}, 2, "(see tdm tree --help)"},
+           {{"check"}, 2, "tdm check: error: DB is required (see tdm check --help)"},
+           {{"info", fifo}, 3, "tdm info: error: " + fifo + ": not a regular file (a FIFO)"},
+           {{"check", fifo}, 3, "not a regular file (a FIFO)"},
+           {{"commit", fifo}, 3, "not a regular file (a FIFO)"},
+           {{"commit", "-o", fifo, db}, 3, fifo + ": not a regular file (a FIFO)"},
+           {{"tree", m_Dir}, 3, "not a regular file (a folder)"}}) {
+    SCOPED_TRACE(args[0] + " " + args.back());
+    // A run that blocks is ended after a while, and fails.
+    Outcome const run = Tdm(args, "(sleep 20; kill $$) </dev/null >/dev/null 2>&1 &");
+    EXPECT_EQ(run.code, code) << run.err;
+    EXPECT_THAT(run.err, HasSubstr(message));
+    EXPECT_EQ(std::count(run.err.begin(), run.err.end(), '\n'), 1) << run.err;
+  }
+  struct stat status {};
+  ASSERT_EQ(::stat(fifo.c_str(), &status), 0);
+  EXPECT_TRUE(S_ISFIFO(status.st_mode)) << "the FIFO was replaced";
 }
 
 } // namespace

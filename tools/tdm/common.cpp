@@ -9,8 +9,10 @@
 #include "Port_Exception.h"
 #include "Port_MsgManData.h"
 
+#include <cerrno>
 #include <chrono>
 #include <cstdio>
+#include <sys/stat.h>
 #include <unistd.h>
 
 namespace tdm {
@@ -36,32 +38,66 @@ std::string OneLine(std::string const &text) {
 }
 
 std::string Describe(Port::Exception const &e, std::string const &path) {
-  std::string message = OneLine(e.GetMessage());
+  std::string message = e.GetMessage();
+  // The path shows escaped, as the rest of the line shows it, not folded.
+  if (std::string const shown = Escaped(path); shown != path)
+    for (std::size_t at = message.find(path); at != std::string::npos;
+         at = message.find(path, at + shown.size()))
+      message.replace(at, path.size(), shown);
+  message = OneLine(message);
   if (e.GetObjectName().empty() || e.GetObjectName() == path)
     return message;
   return Quoted(Port::Exception::ShownName(e.GetObjectName())) + ": " + message;
 }
 
+namespace {
+
+// Appends `c`, a control byte as \n, \r, \t or \xNN, and with `quoting` a
+// quote or backslash after a backslash.
+void AppendEscaped(std::string &out, char const c, bool quoting) {
+  auto const byte = static_cast<unsigned char>(c);
+  if (quoting && (c == '"' || c == '\\')) {
+    out += '\\';
+    out += c;
+  } else if (c == '\n') {
+    out += "\\n";
+  } else if (c == '\t') {
+    out += "\\t";
+  } else if (byte < 0x20 || byte == 0x7f) {
+    char hex[8];
+    std::snprintf(hex, sizeof hex, "\\x%02x", byte);
+    out += hex;
+  } else {
+    out += c;
+  }
+}
+
+} // namespace
+
 std::string Quoted(std::string const &name) {
   std::string quoted = "\"";
-  for (char const c : name) {
-    auto const byte = static_cast<unsigned char>(c);
-    if (c == '"' || c == '\\') {
-      quoted += '\\';
-      quoted += c;
-    } else if (c == '\n') {
-      quoted += "\\n";
-    } else if (c == '\t') {
-      quoted += "\\t";
-    } else if (byte < 0x20 || byte == 0x7f) {
-      char hex[8];
-      std::snprintf(hex, sizeof hex, "\\x%02x", byte);
-      quoted += hex;
-    } else {
-      quoted += c;
-    }
-  }
+  for (char const c : name)
+    AppendEscaped(quoted, c, true);
   return quoted + "\"";
+}
+
+std::string Escaped(std::string const &text) {
+  std::string escaped;
+  escaped.reserve(text.size());
+  for (char const c : text)
+    AppendEscaped(escaped, c, false);
+  return escaped;
+}
+
+void RequireRegularFile(std::string const &path) {
+  struct stat status {};
+  if (::stat(path.c_str(), &status) != 0 || S_ISREG(status.st_mode))
+    return;
+  char const *what = S_ISDIR(status.st_mode)    ? "a folder"
+                     : S_ISFIFO(status.st_mode) ? "a FIFO"
+                     : S_ISSOCK(status.st_mode) ? "a socket"
+                                                : "a device or other special file";
+  throw Failure(kExitUnreadable, path + ": not a regular file (" + what + ")");
 }
 
 std::string DesignPath(Orb_Design const *design) { return Lum_TdmVerifier::DesignPath(design); }

@@ -64,6 +64,15 @@ std::string OneLine(std::string const &text);
 // Quoted for the output: "name" with control bytes shown as \n, \t, \xNN.
 std::string Quoted(std::string const &name);
 
+// The text with control bytes shown as \n, \t, \xNN (and nothing else
+// changed), so that a path or message prints on one line.
+std::string Escaped(std::string const &text);
+
+// Throws Failure(kExitUnreadable) when something other than a regular file
+// (a folder, a FIFO, a device) is at `path`: reading a FIFO with no writer
+// would block, and saving over one would replace it. Nothing there passes.
+void RequireRegularFile(std::string const &path);
+
 // "manager/design", "manager/design/view", and a block as "top/child/...".
 std::string DesignPath(Orb_Design const *design);
 std::string ViewPath(Orb_View const *view);

@@ -8,6 +8,7 @@
 
 #include <CLI/CLI.hpp>
 
+#include <charconv>
 #include <cstdio>
 #include <exception>
 #include <new>
@@ -32,6 +33,32 @@ void AddCommonOptions(CLI::App *command, tdm::CommonOptions &options) {
       ->take_all();
   command->add_flag("-q,--quiet", options.quiet,
                     "No progress line and no output beyond results and errors");
+}
+
+// "tdm" and the subcommand given, as errors begin.
+std::string CommandName(CLI::App const &app) {
+  std::string name = "tdm";
+  for (CLI::App const *command = &app; !command->get_subcommands().empty();) {
+    command = command->get_subcommands().front();
+    name += " " + command->get_name();
+  }
+  return name;
+}
+
+// An error on one line of standard error, control bytes escaped.
+void PrintError(std::string const &name, std::string const &text) {
+  std::fflush(stdout);
+  std::fprintf(stderr, "%s: error: %s\n", name.c_str(), tdm::Escaped(text).c_str());
+}
+
+// A level count: a whole number of 0 or more.
+std::string CheckDepth(std::string const &value) {
+  int depth = -1;
+  char const *end = value.data() + value.size();
+  auto const result = std::from_chars(value.data(), end, depth);
+  if (result.ec != std::errc() || result.ptr != end || depth < 0)
+    return "must be a whole number of 0 or more, not " + tdm::Quoted(value);
+  return std::string();
 }
 
 void AddDatabase(CLI::App *command, std::string &path) {
@@ -93,7 +120,7 @@ int Main(int argc, char **argv) {
         ->add_option("--depth", tree.depth,
                      "Levels below the top block to show (0: the top block alone)")
         ->type_name("N")
-        ->check(CLI::NonNegativeNumber);
+        ->check(CLI::Validator(CheckDepth, "N"));
   }
   treeCommand->add_flag("--pins", tree.pins, "Also each pin with its direction and type pin");
   CLI::App *libCommand = tdm::AddLibCommand(app, lib, common);
@@ -165,16 +192,21 @@ int Main(int argc, char **argv) {
     app.parse(argc, argv);
   } catch (CLI::ParseError const &e) {
     // --help is a "parse error" that exits 0.
-    int const code = app.exit(e);
-    return code == 0 ? tdm::kExitOk : tdm::kExitUsage;
+    if (e.get_exit_code() == 0)
+      return app.exit(e) == 0 ? tdm::kExitOk : tdm::kExitUsage;
+    std::string const name = CommandName(app);
+    PrintError(name, tdm::OneLine(e.what()) + " (see " + name + " --help)");
+    return tdm::kExitUsage;
   }
 
-  std::string name = "tdm";
-  for (CLI::App const *command = &app; !command->get_subcommands().empty();) {
-    command = command->get_subcommands().front();
-    name += " " + command->get_name();
-  }
+  std::string const name = CommandName(app);
+  std::string const &where = database.empty() ? demo.dir : database;
   try {
+    // Only files are read or replaced: a FIFO, a device or a folder is refused.
+    if (!database.empty())
+      tdm::RequireRegularFile(database);
+    if (commitCommand->parsed() && !commit.output.empty())
+      tdm::RequireRegularFile(commit.output);
     if (libCommand->parsed())
       return tdm::RunLib(*libCommand, lib, common);
     if (demoCommand->parsed())
@@ -197,21 +229,16 @@ int Main(int argc, char **argv) {
       return tdm::RunTree(database, tree, common);
     return tdm::RunDot(database, tree, common);
   } catch (tdm::Failure const &e) {
-    std::fflush(stdout);
-    std::fprintf(stderr, "%s: error: %s\n", name.c_str(), e.what());
+    PrintError(name, e.what());
     return e.GetCode();
   } catch (Port::Exception const &e) {
-    std::fflush(stdout);
-    std::fprintf(stderr, "%s: error: %s: %s\n", name.c_str(),
-                 database.empty() ? demo.dir.c_str() : database.c_str(), tdm::Describe(e).c_str());
+    PrintError(name, where + ": " + tdm::Describe(e, where));
     return tdm::kExitUnreadable;
   } catch (std::bad_alloc const &) {
-    std::fflush(stdout);
-    std::fprintf(stderr, "%s: error: %s: out of memory\n", name.c_str(), database.c_str());
+    PrintError(name, where + ": out of memory");
     return tdm::kExitUnreadable;
   } catch (std::exception const &e) {
-    std::fflush(stdout);
-    std::fprintf(stderr, "%s: error: %s: %s\n", name.c_str(), database.c_str(), e.what());
+    PrintError(name, where + ": " + tdm::OneLine(e.what()));
     return tdm::kExitUnreadable;
   }
 }

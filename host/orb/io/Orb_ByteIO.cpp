@@ -148,6 +148,9 @@ void ByteWriter::Num(std::uint64_t value) {
 }
 
 void ByteWriter::Str(std::string_view text) {
+  if (text.size() > kMaxString)
+    Refuse("a string of " + std::to_string(text.size()) + " bytes exceeds the limit of " +
+           std::to_string(kMaxString) + " bytes");
   Num(text.size());
   Raw(":");
   Raw(text);
@@ -188,6 +191,9 @@ ByteReader::ByteReader(std::string const &path) : m_Path(path), m_Buffer(kBuffer
   m_Fd = ::open(path.c_str(), O_RDONLY | O_CLOEXEC);
   if (m_Fd < 0)
     Refuse(std::string("cannot be opened: ") + std::strerror(errno));
+  struct stat status {};
+  if (::fstat(m_Fd, &status) == 0 && S_ISREG(status.st_mode))
+    m_FileSize = static_cast<std::uint64_t>(status.st_size);
 }
 
 ByteReader::~ByteReader() {
@@ -267,6 +273,14 @@ void ByteReader::Str(std::string &out) {
   Expect(' ', "a field");
   std::uint64_t left = Digits();
   Expect(':', "':' after a string length");
+  // Refused before any byte of it is kept: a corrupt length must not make
+  // the open read and hold gigabytes.
+  std::uint64_t const read = m_BufferOffset + m_Pos;
+  if (left > kMaxString)
+    Corrupt("a " + std::to_string(left) + "-byte string exceeds the limit of " +
+            std::to_string(kMaxString) + " bytes");
+  if (m_FileSize != UINT64_MAX && read <= m_FileSize && left > m_FileSize - read)
+    Truncated();
   out.clear();
   // Appended as the bytes arrive: a corrupt length cannot make us allocate
   // more than the file holds.

@@ -15,6 +15,10 @@ namespace Orb_IO {
 // A path as messages quote it: whole, in single quotes.
 std::string QuotePath(std::string_view path);
 
+// The longest string (name or value) a database holds: a save refuses a
+// longer one, and an open refuses a longer length before it reads any byte.
+constexpr std::uint64_t kMaxString = std::uint64_t(1) << 30;
+
 // Writes a temporary file next to the target through a buffer. Commit syncs
 // it and renames it over the target; until then the destructor removes it,
 // so a failed save leaves the target as it was. The target is the file a
@@ -95,6 +99,8 @@ private:
 
   std::string m_Path;
   int m_Fd = -1;
+  // The size of a regular file; UINT64_MAX for anything else.
+  std::uint64_t m_FileSize = UINT64_MAX;
   std::vector<char> m_Buffer;
   std::size_t m_Pos = 0;
   std::size_t m_Size = 0;

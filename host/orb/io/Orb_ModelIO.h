@@ -135,11 +135,18 @@ private:
   ByteWriter *m_pOut = nullptr;
   ByteReader *m_pIn = nullptr;
 
-  // Saving: numbers of the current view's pins and signals by bridge id, and
-  // its signals in number order.
+  // Saving: pins and signals by bridge id, numbered from 1 in the order
+  // written across the whole save (0: not written). An object written in
+  // the current view has a number above the count when the view began, and
+  // is written in it as the difference less one. Anything else (an object
+  // whose deletion is held, still listed by a signal or a network) is left
+  // out.
   std::vector<std::uint64_t> m_PinNumber;
   std::vector<std::uint64_t> m_SignalNumber;
   std::uint64_t m_PinCount = 0;
+  std::uint64_t m_SignalCount = 0;
+  std::uint64_t m_ViewPinBase = 0;
+  std::uint64_t m_ViewSignalBase = 0;
   std::vector<Orb_Signal const *> m_ViewSignals;
 
   // Opening: the current view's pins and signals in number order.

@@ -5,6 +5,7 @@
 
 #include "Orb_Exception.h"
 
+#include <algorithm>
 #include <string>
 
 using Orb_IO::QuotePath;
@@ -86,27 +87,38 @@ void Orb_ModelIO::WriteDesignMgr(Orb_DesignMgr const *designMgr) {
 void Orb_ModelIO::WriteView(Orb_View const *view) {
   m_pOut->Named('W', view->GetNameString());
   WriteProperties(view);
-  m_PinCount = 0;
+  m_ViewPinBase = m_PinCount;
+  m_ViewSignalBase = m_SignalCount;
   m_ViewSignals.clear();
   if (view->GetBlock())
     WriteBlock(view->GetBlock());
   for (std::size_t s = 0; s < m_ViewSignals.size(); ++s) {
     auto const pins = m_ViewSignals[s]->GetPins();
-    if (pins.empty())
+    auto const written = [this](Orb_Pin const *pin) {
+      return m_PinNumber[pin->GetBridgeId()] > m_ViewPinBase;
+    };
+    auto const count = std::count_if(pins.begin(), pins.end(), written);
+    if (count == 0)
       continue;
     m_pOut->Tag('C');
     m_pOut->Num(s);
-    m_pOut->Num(pins.size());
+    m_pOut->Num(static_cast<std::uint64_t>(count));
     for (Orb_Pin const *pin : pins)
-      m_pOut->Num(m_PinNumber[pin->GetBridgeId()]);
+      if (written(pin))
+        m_pOut->Num(m_PinNumber[pin->GetBridgeId()] - m_ViewPinBase - 1);
     m_pOut->End();
   }
   for (Orb_Network const *network : view->GetNetworks()) {
     m_pOut->Tag('N');
     m_pOut->Str(network->GetNameString());
-    m_pOut->Num(network->GetSignals().size());
-    for (Orb_Signal const *signal : network->GetSignals())
-      m_pOut->Num(m_SignalNumber[signal->GetBridgeId()]);
+    auto const signals = network->GetSignals();
+    auto const written = [this](Orb_Signal const *signal) {
+      return m_SignalNumber[signal->GetBridgeId()] > m_ViewSignalBase;
+    };
+    m_pOut->Num(static_cast<std::uint64_t>(std::count_if(signals.begin(), signals.end(), written)));
+    for (Orb_Signal const *signal : signals)
+      if (written(signal))
+        m_pOut->Num(m_SignalNumber[signal->GetBridgeId()] - m_ViewSignalBase - 1);
     m_pOut->End();
     WriteProperties(network);
   }
@@ -118,7 +130,7 @@ void Orb_ModelIO::WriteBlock(Orb_Block const *block) {
   m_pOut->Named('B', block->GetNameString());
   WriteProperties(block);
   for (Orb_Pin const *pin : block->GetPins()) {
-    m_PinNumber[pin->GetBridgeId()] = m_PinCount++;
+    m_PinNumber[pin->GetBridgeId()] = ++m_PinCount;
     m_pOut->Tag('I');
     m_pOut->Num(pin->GetDirection());
     m_pOut->Str(pin->GetNameString());
@@ -126,7 +138,7 @@ void Orb_ModelIO::WriteBlock(Orb_Block const *block) {
     WriteProperties(pin);
   }
   for (Orb_Signal const *signal : block->GetSignals()) {
-    m_SignalNumber[signal->GetBridgeId()] = m_ViewSignals.size();
+    m_SignalNumber[signal->GetBridgeId()] = ++m_SignalCount;
     m_ViewSignals.push_back(signal);
     m_pOut->Named('S', signal->GetNameString());
     WriteProperties(signal);
