@@ -3,6 +3,7 @@ imported into a database, opened, counted and exported back, and bad files."""
 
 import json
 import os
+import threading
 
 import pytest
 
@@ -112,6 +113,25 @@ def test_export_options(tmp_path):
             lumtdm.export_netlist("top.odb")
     with pytest.raises(lumtdm.StaleObjectError):
         lumtdm.export_netlist(db)
+
+
+def test_imports_and_exports_from_several_threads(tmp_path):
+    netlist = write(tmp_path, "top.v", NETLIST)
+    tlm = lumtdm.import_library(need(CELLS), output_dir=str(tmp_path))["path"]
+    lumtdm.import_netlist(netlist, str(tmp_path / "top.odb"), libraries=[tlm])
+    with lumtdm.open(str(tmp_path / "top.odb"), lib_path=[str(tmp_path)]) as db:
+        view = db.lookup("top/top/netlist")
+        texts = []
+        threads = [threading.Thread(target=lambda: texts.append(lumtdm.export_netlist(view)))
+                   for _ in range(3)]
+        threads.append(threading.Thread(target=lambda: lumtdm.import_netlist(
+            netlist, str(tmp_path / "other.odb"), libraries=[tlm])))
+        for t in threads:
+            t.start()
+        for t in threads:
+            t.join()
+        assert len(texts) == 3 and len(set(texts)) == 1
+    assert os.path.exists(tmp_path / "other.odb")
 
 
 def test_bad_files_raise_invalid_format_error_with_file_and_position(tmp_path):
