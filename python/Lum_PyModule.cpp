@@ -1,9 +1,10 @@
 // The Python module lumtdm (its compiled part, lumtdm._lumtdm): databases,
 // the design hierarchy, types and typed queries, edits, dumps and the memory
 // report, each object reached through a handle that raises StaleObjectError
-// once its object is gone.
+// once its object is gone; the real formats are in Lum_PyFormats.cpp.
 
 #include "Lum_PyDatabase.h"
+#include "Lum_PyFormats.h"
 
 #include "Lum_TdmBlock.h"
 #include "Lum_TdmDesign.h"
@@ -1579,4 +1580,5 @@ PYBIND11_MODULE(_lumtdm, m) {
         return py::make_tuple(version, revision);
       },
       "The format stamp (version, revision) that new and committed views get.");
+  BindFormats(m);
 }

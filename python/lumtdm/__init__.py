@@ -19,8 +19,8 @@ The classes cannot be subclassed: the library's virtual hooks (type block
 initialisation, library loading, graft hooks) are not open to Python.
 
 Calls into the library are serialised; the long ones (open, save, commit,
-close, checks, library loading, grafting, count_by_type) let other Python threads
-run meanwhile.
+close, checks, library loading, grafting, count_by_type, import_library,
+import_netlist, export_netlist) let other Python threads run meanwhile.
 """
 
 from collections.abc import MutableMapping as _MutableMapping
@@ -54,7 +54,10 @@ from ._lumtdm import (  # noqa: F401
     View,
     check,
     create,
+    export_netlist,
     format_version,
+    import_library,
+    import_netlist,
     library_search_path,
     load_library,
     open,
