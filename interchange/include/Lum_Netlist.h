@@ -114,6 +114,8 @@ public:
   // The id of the string, the same for equal strings. Id 0 is "".
   Lum_NetlistName Intern(std::string_view text);
   std::string_view Text(Lum_NetlistName name) const { return m_Texts[name]; }
+  // The same text, null-terminated, for the host's C-string calls.
+  char const *CText(Lum_NetlistName name) const { return m_Texts[name].c_str(); }
   // The id of the string if it was interned, else kNone.
   Lum_NetlistName Find(std::string_view text) const;
 

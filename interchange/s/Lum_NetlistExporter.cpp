@@ -40,7 +40,7 @@ std::vector<Lum_NetlistVector> DeclaredPorts(Lum_Netlist &netlist, Orb_Block con
     return ports;
   for (auto const &member : list->GetMembers()) {
     Lum_NetlistVector port;
-    if (!Lum_NetlistNames::ParseMeta(std::string(member->GetValue()), true, port))
+    if (!Lum_NetlistNames::ParseMeta(member->GetValue(), true, port))
       continue;
     port.name = netlist.Intern(member->GetName());
     ports.push_back(port);
@@ -75,9 +75,18 @@ private:
   std::pair<Lum_NetlistName, Orb_Block const *> CellType(Lum_TdmBlock *child) {
     Lum_TlmBlock const *typeBlock = child->GetTypeBlock();
     if (!typeBlock) {
-      std::string const type = PropertyValue(child->GetOrbBlock(), kCellType);
-      return {m_Netlist.Intern(type.empty() ? std::string("$untyped") : type), nullptr};
+      Orb_Property const *type = child->GetOrbBlock()->GetPropertyByName(kCellType);
+      std::string_view const name = type ? type->GetValue() : std::string_view();
+      return {m_Netlist.Intern(name.empty() ? std::string_view("$untyped") : name), nullptr};
     }
+    // Many cells share a type: its module name is worked out once.
+    auto const known = m_TypeNames.find(typeBlock);
+    if (known != m_TypeNames.end())
+      return known->second;
+    return m_TypeNames[typeBlock] = TypeBlockCellType(typeBlock);
+  }
+
+  std::pair<Lum_NetlistName, Orb_Block const *> TypeBlockCellType(Lum_TlmBlock const *typeBlock) {
     Orb_Block const *host = typeBlock->GetOrbBlock();
     bool const local = std::strcmp(typeBlock->GetLibrary()->GetLibraryName(),
                                    Lum_TlmLibrary::LOCAL_LIBRARY_NAME) == 0;
@@ -99,12 +108,13 @@ private:
     // Net names: declared ones first, in their order, then the signals that
     // carry no name under their own.
     std::vector<Lum_NetlistVector> nets;
-    std::unordered_map<std::string, std::size_t> netIndex;
+    // Keys view names the host keeps (property and signal names).
+    std::unordered_map<std::string_view, std::size_t> netIndex;
     std::vector<std::vector<Lum_NetlistBit>> netBits;
     if (Orb_Property const *list = pending.meta->GetPropertyByName(kNetNames))
       for (auto const &member : list->GetMembers()) {
         Lum_NetlistVector net;
-        if (!Lum_NetlistNames::ParseMeta(std::string(member->GetValue()), false, net))
+        if (!Lum_NetlistNames::ParseMeta(member->GetValue(), false, net))
           continue;
         net.name = m_Netlist.Intern(member->GetName());
         if (!netIndex.emplace(member->GetName(), nets.size()).second)
@@ -114,7 +124,9 @@ private:
       }
     for (Orb_Signal const *signal : block->GetSignals()) {
       Lum_NetlistBit bit = 0;
-      std::string const constant = PropertyValue(signal, kConstant);
+      Orb_Property const *constantProperty = signal->GetPropertyByName(kConstant);
+      std::string_view const constant =
+          constantProperty ? constantProperty->GetValue() : std::string_view();
       if (!constant.empty())
         bit = constant == "0"   ? Lum_NetlistBits::kZero
               : constant == "1" ? Lum_NetlistBits::kOne
@@ -130,7 +142,7 @@ private:
           std::size_t const blank = entry.find(' ');
           if (blank == std::string::npos)
             continue;
-          auto const found = netIndex.find(entry.substr(blank + 1));
+          auto const found = netIndex.find(std::string_view(entry).substr(blank + 1));
           std::uint32_t const position =
               static_cast<std::uint32_t>(std::strtoul(entry.c_str(), nullptr, 10));
           if (found == netIndex.end() || position >= netBits[found->second].size())
@@ -140,7 +152,7 @@ private:
         }
       if (!named && constant.empty()) {
         Lum_NetlistVector net;
-        std::string const name = signal->GetName();
+        std::string_view const name = signal->GetName();
         net.name = m_Netlist.Intern(name);
         net.hidden = !name.empty() && name[0] == '$';
         net.bits.width = 1;
@@ -183,6 +195,13 @@ private:
       AddCell(module, pending.block->GetBlock(i), bits);
   }
 
+  std::vector<Lum_NetlistVector> const &Declared(Orb_Block const *definition) {
+    auto const found = m_Declared.find(definition);
+    if (found != m_Declared.end())
+      return found->second;
+    return m_Declared[definition] = DeclaredPorts(m_Netlist, definition);
+  }
+
   void AddCell(Lum_NetlistModule &module, Lum_TdmBlock *child,
                std::unordered_map<Orb_Signal const *, Lum_NetlistBit> const &bits) {
     auto const [type, definition] = CellType(child);
@@ -194,14 +213,10 @@ private:
     Orb_Block const *host = child->GetOrbBlock();
     // Bus pins by port, positions from the module's declaration when there
     // is one, else from the smallest index.
-    std::vector<Lum_NetlistVector> const declared =
-        definition ? DeclaredPorts(m_Netlist, definition) : std::vector<Lum_NetlistVector>();
-    struct Port {
-      std::string_view name;
-      Lum_NetlistDirection direction;
-      std::vector<std::pair<std::int64_t, Orb_Pin const *>> pins;
-    };
-    std::vector<Port> ports;
+    static std::vector<Lum_NetlistVector> const none;
+    std::vector<Lum_NetlistVector> const &declared = !definition ? none : Declared(definition);
+    // m_Ports[0, used) are this cell's ports; the rest keep their capacity.
+    std::size_t used = 0;
     for (std::size_t i = 0; i < child->GetPins().size(); ++i) {
       // A typed pin stands for its type pin, whatever its own name.
       Lum_TdmPin const *client = child->GetPin(i);
@@ -210,14 +225,20 @@ private:
           client->GetTypePin() ? client->GetTypePin()->GetName() : pin->GetName());
       // Cells have few ports: a search is cheaper than a map.
       std::size_t at = 0;
-      while (at < ports.size() && ports[at].name != base)
+      while (at < used && m_Ports[at].name != base)
         ++at;
-      if (at == ports.size())
-        ports.push_back({base, DirectionOf(pin->GetDirection()), {}});
-      ports[at].pins.emplace_back(index, pin);
+      if (at == used) {
+        if (used == m_Ports.size())
+          m_Ports.emplace_back();
+        m_Ports[used].name = base;
+        m_Ports[used].direction = DirectionOf(pin->GetDirection());
+        m_Ports[used++].pins.clear();
+      }
+      m_Ports[at].pins.emplace_back(index, pin);
     }
     cell.firstConnection = static_cast<std::uint32_t>(module.connections.size());
-    for (Port &port : ports) {
+    for (std::size_t at = 0; at < used; ++at) {
+      CellPort const &port = m_Ports[at];
       bool connected = false;
       for (auto const &entry : port.pins)
         connected = connected || entry.second->GetSignal();
@@ -236,7 +257,8 @@ private:
       std::uint32_t width = static_cast<std::uint32_t>(high - low + 1);
       if (declaration)
         width = declaration->bits.width;
-      std::vector<Lum_NetlistBit> portBits(width, Lum_Netlist::kNone);
+      std::vector<Lum_NetlistBit> &portBits = m_PortBits;
+      portBits.assign(width, Lum_Netlist::kNone);
       for (auto const &[index, pin] : port.pins) {
         std::int64_t position = index - low;
         if (declaration)
@@ -277,6 +299,17 @@ private:
   Lum_Netlist m_Netlist;
   std::deque<Pending> m_Queue;
   std::unordered_set<Lum_NetlistName> m_Defined;
+  std::unordered_map<Lum_TlmBlock const *, std::pair<Lum_NetlistName, Orb_Block const *>>
+      m_TypeNames;
+  std::unordered_map<Orb_Block const *, std::vector<Lum_NetlistVector>> m_Declared;
+  std::vector<Lum_NetlistBit> m_PortBits; // reused for every connection
+  // The pins of a cell by port, reused for every cell.
+  struct CellPort {
+    std::string_view name;
+    Lum_NetlistDirection direction = Lum_NetlistDirection::Unknown;
+    std::vector<std::pair<std::int64_t, Orb_Pin const *>> pins;
+  };
+  std::vector<CellPort> m_Ports;
 };
 
 } // namespace

@@ -14,6 +14,7 @@
 #include "Orb_Property.h"
 
 #include <algorithm>
+#include <charconv>
 #include <unordered_map>
 #include <unordered_set>
 
@@ -361,15 +362,15 @@ private:
       for (std::uint32_t c = 0; c < cell.numConnections; ++c) {
         Lum_NetlistConnection const &connection = module.connections[cell.firstConnection + c];
         CellType::Port const *port = FindPort(type, connection.port);
-        std::string const typeName(m_Netlist.Text(cell.type));
         if (!port)
           FailAt(module, cell, connection.port,
-                 "cell type " + typeName + " has no port " +
+                 "cell type " + std::string(m_Netlist.Text(cell.type)) + " has no port " +
                      std::string(m_Netlist.Text(connection.port)));
         if (port->pins.size() != connection.bits.width)
           FailAt(module, cell, connection.port,
                  std::to_string(connection.bits.width) + " bits connected to port " + port->name +
-                     " of " + typeName + ", which has " + std::to_string(port->pins.size()));
+                     " of " + std::string(m_Netlist.Text(cell.type)) + ", which has " +
+                     std::to_string(port->pins.size()));
       }
     }
   }
@@ -379,12 +380,11 @@ private:
   void WriteModuleProperties(Orb_Block *block, Lum_NetlistModule const &module) const {
     Orb_Property *ports = block->CreatePropertyList(kPorts);
     for (Lum_NetlistVector const &port : module.ports)
-      ports->CreatePropertyString(std::string(m_Netlist.Text(port.name)).c_str(),
+      ports->CreatePropertyString(m_Netlist.CText(port.name),
                                   Lum_NetlistNames::PortMeta(port).c_str());
     Orb_Property *nets = block->CreatePropertyList(kNetNames);
     for (Lum_NetlistVector const &net : module.netNames)
-      nets->CreatePropertyString(std::string(m_Netlist.Text(net.name)).c_str(),
-                                 Lum_NetlistNames::NetMeta(net).c_str());
+      nets->CreatePropertyString(m_Netlist.CText(net.name), Lum_NetlistNames::NetMeta(net).c_str());
   }
 
   void BuildModuleType(std::uint32_t index) {
@@ -454,7 +454,14 @@ private:
           Orb_Property *names = signal->GetPropertyByName(kNames);
           if (!names)
             names = signal->CreatePropertyStringList(kNames);
-          names->AppendString(std::to_string(p) + " " + std::string(name));
+          // "<position> <name>", made in one allocation the property keeps.
+          char digits[16];
+          char *end = std::to_chars(digits, digits + sizeof digits - 1, p).ptr;
+          *end++ = ' ';
+          std::string entry;
+          entry.reserve(static_cast<std::size_t>(end - digits) + name.size());
+          entry.append(digits, end).append(name);
+          names->AppendString(std::move(entry));
         }
       }
     // Ports: pins in port order, each bit connected inside.
@@ -491,7 +498,7 @@ private:
 
   Orb_Block *MakeChild(Orb_Block *block, Lum_TdmBlock *client, CellType const &type,
                        Lum_NetlistCell const &cell) {
-    std::string const name(m_Netlist.Text(cell.name));
+    char const *name = m_Netlist.CText(cell.name);
     if (type.kind == CellType::kLibrary)
       ++m_Summary.instancesByLibrary[type.typeBlock->GetLibrary()->GetLibraryName()];
     else if (type.kind == CellType::kModule)
@@ -499,12 +506,11 @@ private:
     else
       ++m_Summary.untyped;
     if (client && type.kind != CellType::kUnknown)
-      return client
-          ->CreateTypedBlock(name.c_str(), type.typeBlock, type.kind == CellType::kModule, true)
+      return client->CreateTypedBlock(name, type.typeBlock, type.kind == CellType::kModule, true)
           ->GetOrbBlock();
-    Orb_Block *child = block->CreateBlock(name.c_str());
+    Orb_Block *child = block->CreateBlock(name);
     if (type.kind == CellType::kUnknown)
-      child->CreatePropertyString(kCellType, std::string(m_Netlist.Text(cell.type)).c_str());
+      child->CreatePropertyString(kCellType, m_Netlist.CText(cell.type));
     else
       child->CreatePropertyString("TDS_BLOCK_TYPE", type.tag.c_str());
     for (auto const &[pin, direction] : type.pins)
@@ -523,8 +529,7 @@ private:
       Orb_Property *&list = parameter.isString ? strings : bits;
       if (!list)
         list = child->CreatePropertyList(parameter.isString ? kStringParameters : kParameters);
-      list->CreatePropertyString(std::string(m_Netlist.Text(parameter.name)).c_str(),
-                                 std::string(m_Netlist.Text(parameter.value)).c_str());
+      list->CreatePropertyString(m_Netlist.CText(parameter.name), m_Netlist.CText(parameter.value));
     }
   }
 

@@ -179,7 +179,9 @@ private:
       Lum_NetlistBit id = 0;
       if (bit.type() == od::json_type::number) {
         std::uint64_t const number = bit.get_uint64();
-        auto const inserted = m_Ids.emplace(number, static_cast<Lum_NetlistBit>(m_Declared.size()));
+        // try_emplace makes no node for a bit seen before (emplace would).
+        auto const inserted =
+            m_Ids.try_emplace(number, static_cast<Lum_NetlistBit>(m_Declared.size()));
         if (inserted.second) {
           if (m_Declared.size() >= Lum_Netlist::kNone - 1)
             throw Refusal{"too many bits"};

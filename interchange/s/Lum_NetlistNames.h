@@ -5,7 +5,9 @@
 
 #include "Lum_Netlist.h"
 
-#include <cstdio>
+#include <algorithm>
+#include <charconv>
+#include <cstdint>
 #include <string>
 #include <string_view>
 #include <utility>
@@ -67,36 +69,74 @@ inline Lum_NetlistDirection DirectionOf(std::string_view word) {
                             : Lum_NetlistDirection::Unknown;
 }
 
+namespace Detail {
+// "<width> <offset> <upto> <signed>", then " <hidden>" for a net; made in
+// a local buffer, so that the short result allocates nothing.
+inline std::string Meta(char const *direction, Lum_NetlistVector const &vector, bool net) {
+  char text[64];
+  char *at = text;
+  for (char const *c = direction; c && *c; ++c)
+    *at++ = *c;
+  if (direction)
+    *at++ = ' ';
+  at = std::to_chars(at, text + 24, vector.bits.width).ptr;
+  *at++ = ' ';
+  at = std::to_chars(at, text + 48, vector.offset).ptr;
+  *at++ = ' ';
+  *at++ = vector.upto ? '1' : '0';
+  *at++ = ' ';
+  *at++ = vector.isSigned ? '1' : '0';
+  if (net) {
+    *at++ = ' ';
+    *at++ = vector.hidden ? '1' : '0';
+  }
+  return std::string(text, at);
+}
+} // namespace Detail
+
 // "<direction> <width> <offset> <upto> <signed>"
 inline std::string PortMeta(Lum_NetlistVector const &port) {
-  return std::string(DirectionWord(port.direction)) + " " + std::to_string(port.bits.width) + " " +
-         std::to_string(port.offset) + " " + (port.upto ? "1" : "0") + " " +
-         (port.isSigned ? "1" : "0");
+  return Detail::Meta(DirectionWord(port.direction), port, false);
 }
 
 // "<width> <offset> <upto> <signed> <hidden>"
 inline std::string NetMeta(Lum_NetlistVector const &net) {
-  return std::to_string(net.bits.width) + " " + std::to_string(net.offset) + " " +
-         (net.upto ? "1" : "0") + " " + (net.isSigned ? "1" : "0") + " " + (net.hidden ? "1" : "0");
+  return Detail::Meta(nullptr, net, true);
 }
 
 // Reads a value PortMeta or NetMeta wrote into `vector` (its width into
 // bits.width); false when the text is not one.
-inline bool ParseMeta(std::string const &text, bool port, Lum_NetlistVector &vector) {
-  char word[16] = {};
-  unsigned width = 0;
-  int offset = 0;
+inline bool ParseMeta(std::string_view text, bool port, Lum_NetlistVector &vector) {
+  // The next blank-separated word of `text`, consumed.
+  auto word = [&text]() {
+    std::size_t const start = std::min(text.find_first_not_of(" \t"), text.size());
+    std::size_t const end = std::min(text.find_first_of(" \t", start), text.size());
+    std::string_view const found = text.substr(start, end - start);
+    text.remove_prefix(end);
+    return found;
+  };
+  auto number = [&word](auto &value) {
+    std::string_view const digits = word();
+    auto const [end, error] = std::from_chars(digits.data(), digits.data() + digits.size(), value);
+    return error == std::errc() && end == digits.data() + digits.size();
+  };
+  Lum_NetlistDirection direction = Lum_NetlistDirection::Unknown;
+  if (port) {
+    std::string_view const name = word();
+    if (name.empty())
+      return false;
+    direction = DirectionOf(name);
+  }
+  std::uint32_t width = 0;
+  std::int32_t offset = 0;
   int upto = 0;
   int isSigned = 0;
   int hidden = 0;
-  if (port) {
-    if (std::sscanf(text.c_str(), "%15s %u %d %d %d", word, &width, &offset, &upto, &isSigned) != 5)
-      return false;
-    vector.direction = DirectionOf(word);
-  } else if (std::sscanf(text.c_str(), "%u %d %d %d %d", &width, &offset, &upto, &isSigned,
-                         &hidden) != 5) {
+  if (!number(width) || !number(offset) || !number(upto) || !number(isSigned) ||
+      (!port && !number(hidden)))
     return false;
-  }
+  if (port)
+    vector.direction = direction;
   vector.bits.width = width;
   vector.offset = offset;
   vector.upto = upto != 0;

@@ -5,6 +5,7 @@
 
 #include <cctype>
 #include <cerrno>
+#include <charconv>
 #include <cstdint>
 #include <cstdio>
 #include <cstdlib>
@@ -13,17 +14,65 @@
 #include <fcntl.h>
 #include <fstream>
 #include <sstream>
+#include <type_traits>
 #include <unistd.h>
 #include <unordered_map>
 #include <unordered_set>
 
 namespace {
 
+// Text for a stream, gathered in a buffer and handed over in large pieces:
+// an insertion into a std::ostream costs far more than an append.
+class Buffered {
+public:
+  explicit Buffered(std::ostream &out) : m_Out(out) { m_Text.reserve(kChunk + 1024); }
+  Buffered(Buffered const &) = delete;
+  Buffered &operator=(Buffered const &) = delete;
+  ~Buffered() { Flush(); }
+
+  Buffered &operator<<(std::string_view text) {
+    m_Text.append(text);
+    if (m_Text.size() >= kChunk)
+      Flush();
+    return *this;
+  }
+  Buffered &operator<<(char const *text) { return *this << std::string_view(text); }
+  Buffered &operator<<(char c) {
+    m_Text.push_back(c);
+    return *this;
+  }
+  template <typename Integer, typename = std::enable_if_t<std::is_integral_v<Integer> &&
+                                                          !std::is_same_v<Integer, char> &&
+                                                          !std::is_same_v<Integer, bool>>>
+  Buffered &operator<<(Integer value) {
+    char digits[24];
+    char const *end = std::to_chars(digits, digits + sizeof digits, value).ptr;
+    return *this << std::string_view(digits, static_cast<std::size_t>(end - digits));
+  }
+
+  void Flush() {
+    m_Out.write(m_Text.data(), static_cast<std::streamsize>(m_Text.size()));
+    m_Text.clear();
+  }
+
+private:
+  static constexpr std::size_t kChunk = 1 << 16;
+  std::ostream &m_Out;
+  std::string m_Text;
+};
+
 // ---------------------------------------------------------------------------
 // JSON
 
-void JsonString(std::ostream &out, std::string_view text) {
+void JsonString(Buffered &out, std::string_view text, bool trailingBlank = false) {
   out << '"';
+  // Runs without a character to escape go out whole.
+  std::size_t plain = 0;
+  while (plain < text.size() && text[plain] != '"' && text[plain] != '\\' &&
+         static_cast<unsigned char>(text[plain]) >= 0x20)
+    ++plain;
+  out << text.substr(0, plain);
+  text.remove_prefix(plain);
   for (char const c : text) {
     auto const byte = static_cast<unsigned char>(c);
     if (c == '"' || c == '\\') {
@@ -36,6 +85,8 @@ void JsonString(std::ostream &out, std::string_view text) {
       out << c;
     }
   }
+  if (trailingBlank)
+    out << ' ';
   out << '"';
 }
 
@@ -46,7 +97,7 @@ bool LooksLikeBits(std::string_view text) {
   return true;
 }
 
-void JsonBits(std::ostream &out, Lum_NetlistBit const *bits, std::uint32_t width) {
+void JsonBits(Buffered &out, Lum_NetlistBit const *bits, std::uint32_t width) {
   out << '[';
   for (std::uint32_t i = 0; i < width; ++i) {
     out << (i ? ", " : " ");
@@ -58,7 +109,7 @@ void JsonBits(std::ostream &out, Lum_NetlistBit const *bits, std::uint32_t width
   out << " ]";
 }
 
-void JsonVector(std::ostream &out, Lum_Netlist const &netlist, Lum_NetlistModule const &module,
+void JsonVector(Buffered &out, Lum_Netlist const &netlist, Lum_NetlistModule const &module,
                 Lum_NetlistVector const &vector, bool port) {
   out << "        ";
   JsonString(out, netlist.Text(vector.name));
@@ -96,7 +147,7 @@ bool IsKeyword(std::string_view name) {
 
 class VerilogModule {
 public:
-  VerilogModule(Lum_Netlist const &netlist, Lum_NetlistModule const &module, std::ostream &out,
+  VerilogModule(Lum_Netlist const &netlist, Lum_NetlistModule const &module, Buffered &out,
                 std::string const &file)
       : m_Netlist(netlist), m_Module(module), m_Out(out), m_File(file) {}
 
@@ -151,12 +202,18 @@ private:
   };
 
   std::string Name(std::string_view name) const {
+    std::string text;
+    AppendName(text, name);
+    return text;
+  }
+
+  void AppendName(std::string &text, std::string_view name) const {
     // "\$x" is a user's name "$x" (a bare "$x" a generated one, which
     // Verilog cannot tell apart).
     if (name.size() > 1 && name[0] == '\\' && name[1] == '$')
       name.remove_prefix(1);
-    bool plain = !name.empty() && !IsKeyword(name) &&
-                 (std::isalpha(static_cast<unsigned char>(name[0])) || name[0] == '_');
+    bool plain =
+        !name.empty() && (std::isalpha(static_cast<unsigned char>(name[0])) || name[0] == '_');
     for (char c : name) {
       if (std::isspace(static_cast<unsigned char>(c)) || static_cast<unsigned char>(c) < 0x20)
         throw Lum_ExceptionInvalidFormat(__FILE__, __LINE__, m_File, 0, 0,
@@ -165,7 +222,13 @@ private:
                                              "\" holds white space, which Verilog cannot carry");
       plain = plain && (std::isalnum(static_cast<unsigned char>(c)) || c == '_' || c == '$');
     }
-    return plain ? std::string(name) : "\\" + std::string(name) + " ";
+    if (plain && !IsKeyword(name)) {
+      text += name;
+      return;
+    }
+    text += '\\';
+    text += name;
+    text += ' ';
   }
 
   static std::string Range(Lum_NetlistVector const &vector) {
@@ -229,16 +292,28 @@ private:
   // Bits LSB first as a Verilog expression: whole vectors, part-selects,
   // bit-selects and constants, concatenated from the most significant end.
   std::string Expression(Lum_NetlistBit const *bits, std::uint32_t width) const {
-    std::vector<std::string> parts;
+    std::string text;
+    AppendExpression(text, bits, width);
+    return text;
+  }
+
+  void AppendExpression(std::string &text, Lum_NetlistBit const *bits, std::uint32_t width) const {
+    std::size_t const start = text.size();
+    std::size_t parts = 0;
     std::uint32_t p = width;
     while (p > 0) {
+      if (parts++)
+        text += ", ";
       std::uint32_t const end = p; // chunk covers [start, end)
       Lum_NetlistBit const bit = bits[p - 1];
       if (Lum_NetlistBits::IsConstant(bit)) {
-        std::string constant;
-        while (p > 0 && Lum_NetlistBits::IsConstant(bits[p - 1]))
-          constant += Lum_NetlistBits::ConstantChar(bits[--p]);
-        parts.push_back(std::to_string(constant.size()) + "'b" + constant);
+        std::uint32_t count = 0;
+        while (p > count && Lum_NetlistBits::IsConstant(bits[p - 1 - count]))
+          ++count;
+        AppendNumber(text, count);
+        text += "'b";
+        for (; count > 0; --count)
+          text += Lum_NetlistBits::ConstantChar(bits[--p]);
         continue;
       }
       Holder const &first = m_Holders[bit];
@@ -251,33 +326,42 @@ private:
         --low;
       }
       Lum_NetlistVector const &vector = *m_Vectors[first.vector];
-      std::string part = Name(VectorName(first.vector));
+      AppendName(text, VectorName(first.vector));
       bool const whole = low == 0 && first.position == vector.bits.width - 1;
       bool const scalar = vector.bits.width == 1 && vector.offset == 0 && !vector.upto;
       if (!whole && !scalar) {
-        if (end - p == 1)
-          part += "[" + std::to_string(vector.IndexOf(low)) + "]";
-        else
-          part += "[" + std::to_string(vector.IndexOf(first.position)) + ":" +
-                  std::to_string(vector.IndexOf(low)) + "]";
+        text += '[';
+        if (end - p != 1) {
+          AppendNumber(text, vector.IndexOf(first.position));
+          text += ':';
+        }
+        AppendNumber(text, vector.IndexOf(low));
+        text += ']';
       }
-      parts.push_back(part);
     }
-    if (parts.size() == 1)
-      return parts[0];
-    std::string text = "{ ";
-    for (std::size_t i = 0; i < parts.size(); ++i)
-      text += (i ? ", " : "") + parts[i];
-    return text + " }";
+    if (parts > 1) {
+      text.insert(start, "{ ");
+      text += " }";
+    }
+  }
+
+  template <typename Integer> static void AppendNumber(std::string &text, Integer value) {
+    char digits[24];
+    char const *end = std::to_chars(digits, digits + sizeof digits, value).ptr;
+    text.append(digits, static_cast<std::size_t>(end - digits));
   }
 
   void WriteCell(Lum_NetlistCell const &cell) {
-    m_Out << "  " << Name(m_Netlist.Text(cell.type)) << " ";
+    m_Text.clear();
+    AppendName(m_Text, m_Netlist.Text(cell.type));
+    m_Out << "  " << m_Text << " ";
     if (cell.numParameters) {
       m_Out << "#(";
       for (std::uint32_t i = 0; i < cell.numParameters; ++i) {
         Lum_NetlistParameter const &parameter = m_Module.parameters[cell.firstParameter + i];
-        m_Out << (i ? ",\n    ." : "\n    .") << Name(m_Netlist.Text(parameter.name)) << "(";
+        m_Text.clear();
+        AppendName(m_Text, m_Netlist.Text(parameter.name));
+        m_Out << (i ? ",\n    ." : "\n    .") << m_Text << "(";
         std::string_view const value = m_Netlist.Text(parameter.value);
         if (parameter.isString) {
           m_Out << '"';
@@ -297,28 +381,36 @@ private:
       }
       m_Out << "\n  ) ";
     }
-    m_Out << Name(m_Netlist.Text(cell.name)) << " (";
+    m_Text.clear();
+    AppendName(m_Text, m_Netlist.Text(cell.name));
+    m_Out << m_Text << " (";
     for (std::uint32_t c = 0; c < cell.numConnections; ++c) {
       Lum_NetlistConnection const &connection = m_Module.connections[cell.firstConnection + c];
-      m_Out << (c ? ",\n    ." : "\n    .") << Name(m_Netlist.Text(connection.port)) << "("
-            << Expression(m_Module.Bits(connection.bits), connection.bits.width) << ")";
+      m_Text.clear();
+      AppendName(m_Text, m_Netlist.Text(connection.port));
+      m_Text += '(';
+      AppendExpression(m_Text, m_Module.Bits(connection.bits), connection.bits.width);
+      m_Text += ')';
+      m_Out << (c ? ",\n    ." : "\n    .") << m_Text;
     }
     m_Out << "\n  );\n";
   }
 
   Lum_Netlist const &m_Netlist;
   Lum_NetlistModule const &m_Module;
-  std::ostream &m_Out;
+  Buffered &m_Out;
   std::string const &m_File;
   std::vector<Lum_NetlistVector const *> m_Vectors;
   std::deque<Lum_NetlistVector> m_Generated;
   std::deque<std::string> m_GeneratedNames;
   std::vector<Holder> m_Holders;
+  std::string m_Text; // a name or a connection being written, reused
 };
 
 } // namespace
 
-void Lum_NetlistWriter::WriteJson(Lum_Netlist const &netlist, std::ostream &out) {
+void Lum_NetlistWriter::WriteJson(Lum_Netlist const &netlist, std::ostream &stream) {
+  Buffered out(stream);
   out << "{\n  \"creator\": \"libLum_Interchange\",\n  \"modules\": {";
   bool firstModule = true;
   for (Lum_NetlistModule const &module : netlist.modules) {
@@ -349,11 +441,9 @@ void Lum_NetlistWriter::WriteJson(Lum_Netlist const &netlist, std::ostream &out)
         out << (p ? ",\n            " : "\n            ");
         JsonString(out, netlist.Text(parameter.name));
         out << ": ";
-        std::string value(netlist.Text(parameter.value));
+        std::string_view const value = netlist.Text(parameter.value);
         // A string that would read as bits gets a trailing blank.
-        if (parameter.isString && LooksLikeBits(value))
-          value += ' ';
-        JsonString(out, value);
+        JsonString(out, value, parameter.isString && LooksLikeBits(value));
       }
       out << (cell.numParameters ? "\n          " : "")
           << "},\n          \"attributes\": {},\n          \"port_directions\": {";
@@ -387,8 +477,9 @@ void Lum_NetlistWriter::WriteJson(Lum_Netlist const &netlist, std::ostream &out)
   out << "\n  }\n}\n";
 }
 
-void Lum_NetlistWriter::WriteVerilog(Lum_Netlist const &netlist, std::ostream &out,
+void Lum_NetlistWriter::WriteVerilog(Lum_Netlist const &netlist, std::ostream &stream,
                                      std::string const &name) {
+  Buffered out(stream);
   out << "// Written by libLum_Interchange\n\n";
   for (Lum_NetlistModule const &module : netlist.modules)
     if (!module.blackbox)
