@@ -6,6 +6,7 @@
 #include "Lum_TdmDesign.h"
 #include "Lum_TdmDesignMgr.h"
 #include "Lum_TdmModel.h"
+#include "Lum_TdmSchema.h"
 #include "Lum_TdmView.h"
 
 #include "Lum_Tlm.h"
@@ -77,9 +78,9 @@ public:
 
     Lum_TdmDesign *design = m_Model.CreateDesignMgr(topName.c_str())->CreateDesign(topName.c_str());
     Lum_TdmView *view = design->CreateView(m_Options.viewName.c_str());
-    view->CreatePropertyString("TDS_DEVICE_PM", m_Options.personality.c_str());
-    view->CreatePropertyString("TDS_DEVICE_PART", m_Options.part.c_str());
-    Orb_Property *list = view->CreatePropertyStringList("TDS_VIEW_TYPE_LIBS");
+    view->CreatePropertyString(Lum_TdmSchema::kDevicePm, m_Options.personality.c_str());
+    view->CreatePropertyString(Lum_TdmSchema::kDevicePart, m_Options.part.c_str());
+    Orb_Property *list = view->CreatePropertyStringList(Lum_TdmSchema::kTypeLibraries);
     for (std::string const &name : m_Options.libraries)
       list->AppendString(name);
     for (std::string const &name : m_Options.libraries) {
@@ -512,7 +513,7 @@ private:
     if (type.kind == CellType::kUnknown)
       child->CreatePropertyString(kCellType, m_Netlist.CText(cell.type));
     else
-      child->CreatePropertyString("TDS_BLOCK_TYPE", type.tag.c_str());
+      child->CreatePropertyString(Lum_TdmSchema::kBlockType, type.tag.c_str());
     for (auto const &[pin, direction] : type.pins)
       child->CreatePin(pin.c_str(), direction);
     if (type.kind == CellType::kModule)
