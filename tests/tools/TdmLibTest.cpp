@@ -50,19 +50,20 @@ protected:
   TempDir m_Dir;
 };
 
-// Import writes N.tlm and says what it holds; show lists it back, a clock
-// gate without its internal pin.
+// Import writes N.tlm (making the folder it is told to write in) and says
+// what it holds; show lists it back, a clock gate without its internal pin.
 TEST_F(TdmLib, ImportThenShow) {
+  std::string const folder = m_Dir.File("new/libs");
   Outcome const import = Tdm({"lib", "import", Lib("sg13g2_stdcell_typ_1p20V_25C.filtered.lib"),
-                              "--name", "SG13", "--personality", "sg13g2", "-o", m_Dir.Path()});
+                              "--name", "SG13", "--personality", "sg13g2", "-o", folder});
   ASSERT_EQ(import.code, 0) << import.err;
   EXPECT_EQ(import.err, "");
   EXPECT_THAT(import.out, HasSubstr("SG13: 78 cells, 249 pins (173 input, 75 output, 1 inout)"));
   EXPECT_THAT(import.out, HasSubstr("left out: 0 supply pins, 2 internal pins"));
   EXPECT_THAT(import.out, HasSubstr("dont_use: 10 cells: sg13g2_antennanp, sg13g2_decap_4,"));
-  EXPECT_THAT(import.out, HasSubstr("wrote " + m_Dir.File("SG13.tlm")));
+  EXPECT_THAT(import.out, HasSubstr("wrote " + folder + "/SG13.tlm"));
 
-  Outcome const show = Tdm({"lib", "show", m_Dir.File("SG13.tlm"), "--cell", "sg13g2_lgcp_1"});
+  Outcome const show = Tdm({"lib", "show", folder + "/SG13.tlm", "--cell", "sg13g2_lgcp_1"});
   ASSERT_EQ(show.code, 0) << show.err;
   EXPECT_EQ(show.out, "library SG13 0.1 sg13g2, 78 cells\n"
                       "sg13g2_lgcp_1  LIB_AREA=\"27.216\"  LIB_DONT_USE=\"true\"\n"

@@ -13,7 +13,9 @@
 #include <CLI/CLI.hpp>
 
 #include <cstdio>
+#include <filesystem>
 #include <string>
+#include <system_error>
 #include <vector>
 
 namespace tdm {
@@ -43,7 +45,18 @@ int RunImport(LibOptions const &lib, CommonOptions const &options) {
   std::string saved;
   try {
     std::unique_ptr<Lum_TlmModel> model = Lum_CellLibraryReader::Read(lib.file, read, &summary);
-    saved = Lum_CellLibraryReader::Save(*model, lib.output);
+    // A folder named with -o that does not exist yet is made; a failed save
+    // removes it again, so that a failure leaves nothing behind.
+    std::error_code ignored;
+    bool const made =
+        !lib.output.empty() && std::filesystem::create_directories(lib.output, ignored);
+    try {
+      saved = Lum_CellLibraryReader::Save(*model, lib.output);
+    } catch (...) {
+      if (made)
+        std::filesystem::remove(lib.output, ignored);
+      throw;
+    }
   } catch (Port::Exception const &e) {
     throw Failure(kExitUnreadable,
                   lib.file + ": " + Describe(e, lib.file) + "; nothing was written");
