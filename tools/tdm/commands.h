@@ -64,6 +64,7 @@ struct ExportOptions {
   std::string format; // json or verilog; empty: from the output's extension, else json
   std::string output; // empty: standard output
   std::string view;   // empty: the only view
+  bool time = false;  // print the CPU seconds of each phase on standard error
 };
 int RunExport(std::string const &path, ExportOptions const &exported, CommonOptions const &options);
 

@@ -159,6 +159,8 @@ int Main(int argc, char **argv) {
   exportCommand->add_option("-o,--output", exported.output, "File to write (default: stdout)")
       ->type_name("OUT");
   exportCommand->add_option("--view", exported.view, "The view to write")->type_name("V");
+  exportCommand->add_flag("--time", exported.time,
+                          "Print the CPU seconds of opening, exporting, writing and closing");
 
   CLI::App *rebindCommand =
       app.add_subcommand("rebind", "Swap the cell type of every matching block, all or nothing");
