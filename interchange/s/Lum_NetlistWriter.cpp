@@ -13,6 +13,7 @@
 #include <deque>
 #include <fcntl.h>
 #include <fstream>
+#include <memory>
 #include <sstream>
 #include <type_traits>
 #include <unistd.h>
@@ -22,23 +23,32 @@
 namespace {
 
 // Text for a stream, gathered in a buffer and handed over in large pieces:
-// an insertion into a std::ostream costs far more than an append.
+// an insertion into a std::ostream, or even an append to a std::string,
+// costs far more than a copy into a buffer that is known to have room.
 class Buffered {
 public:
-  explicit Buffered(std::ostream &out) : m_Out(out) { m_Text.reserve(kChunk + 1024); }
+  explicit Buffered(std::ostream &out) : m_Out(out), m_Text(new char[kSize]) {}
   Buffered(Buffered const &) = delete;
   Buffered &operator=(Buffered const &) = delete;
   ~Buffered() { Flush(); }
 
   Buffered &operator<<(std::string_view text) {
-    m_Text.append(text);
-    if (m_Text.size() >= kChunk)
+    if (text.size() > kSize - m_Used) {
       Flush();
+      if (text.size() > kSize) {
+        m_Out.write(text.data(), static_cast<std::streamsize>(text.size()));
+        return *this;
+      }
+    }
+    std::memcpy(m_Text.get() + m_Used, text.data(), text.size());
+    m_Used += text.size();
     return *this;
   }
   Buffered &operator<<(char const *text) { return *this << std::string_view(text); }
   Buffered &operator<<(char c) {
-    m_Text.push_back(c);
+    if (m_Used == kSize)
+      Flush();
+    m_Text[m_Used++] = c;
     return *this;
   }
   template <typename Integer, typename = std::enable_if_t<std::is_integral_v<Integer> &&
@@ -51,14 +61,15 @@ public:
   }
 
   void Flush() {
-    m_Out.write(m_Text.data(), static_cast<std::streamsize>(m_Text.size()));
-    m_Text.clear();
+    m_Out.write(m_Text.get(), static_cast<std::streamsize>(m_Used));
+    m_Used = 0;
   }
 
 private:
-  static constexpr std::size_t kChunk = 1 << 16;
+  static constexpr std::size_t kSize = 1 << 16;
   std::ostream &m_Out;
-  std::string m_Text;
+  std::unique_ptr<char[]> m_Text;
+  std::size_t m_Used = 0;
 };
 
 // ---------------------------------------------------------------------------
