@@ -49,11 +49,22 @@ namespace {
 
 constexpr std::size_t kChunk = 1 << 16;
 
-// FNV-1a: names are short, and this needs no call.
+// Eight bytes at a time, each word mixed in by a multiply: names run to
+// tens of characters, and this needs no call.
 std::uint32_t HashOf(std::string_view text) {
-  std::uint64_t hash = 14695981039346656037ULL;
-  for (char c : text)
-    hash = (hash ^ static_cast<unsigned char>(c)) * 1099511628211ULL;
+  std::uint64_t hash = 0x9E3779B97F4A7C15ULL ^ text.size();
+  std::size_t at = 0;
+  for (; at + 8 <= text.size(); at += 8) {
+    std::uint64_t word = 0;
+    std::memcpy(&word, text.data() + at, 8);
+    hash = (hash ^ word) * 0xFF51AFD7ED558CCDULL;
+    hash ^= hash >> 32;
+  }
+  std::uint64_t tail = 0;
+  if (at < text.size()) // (an empty view may have no data)
+    std::memcpy(&tail, text.data() + at, text.size() - at);
+  hash = (hash ^ tail) * 0xC4CEB9FE1A85EC53ULL;
+  hash ^= hash >> 29;
   return static_cast<std::uint32_t>(hash ^ (hash >> 32));
 }
 
@@ -69,7 +80,8 @@ std::string_view Lum_Netlist::Store(std::string_view text) {
     m_ChunkFree = chunk;
   }
   char *const stored = m_ChunkNext;
-  std::memcpy(stored, text.data(), text.size());
+  if (!text.empty())
+    std::memcpy(stored, text.data(), text.size());
   stored[text.size()] = '\0';
   m_ChunkNext += size;
   m_ChunkFree -= size;

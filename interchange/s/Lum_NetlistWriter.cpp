@@ -40,7 +40,8 @@ public:
         return *this;
       }
     }
-    std::memcpy(m_Text.get() + m_Used, text.data(), text.size());
+    if (!text.empty()) // (an empty view may have no data)
+      std::memcpy(m_Text.get() + m_Used, text.data(), text.size());
     m_Used += text.size();
     return *this;
   }
