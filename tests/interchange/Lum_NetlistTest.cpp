@@ -435,4 +435,33 @@ TEST(NetlistNames, AreInternedOnceAndSurviveAMove) {
   EXPECT_EQ(moved.Find("fresh"), Lum_Netlist::kNone);
 }
 
+// Bit numbers belong to their module: the same numbers in the next module
+// are other bits, and numbers far beyond the text's length read alike.
+TEST(NetlistJson, NumbersBitsPerModuleWhateverTheirSize) {
+  char const text[] = R"({"modules": {
+    "a": {"ports": {"x": {"direction": "input", "bits": [1000000000000, 7]}},
+          "cells": {"g": {"type": "INV", "connections": {"A": [7], "Y": [1000000000000]}}}},
+    "b": {"ports": {"y": {"direction": "output", "bits": [7, 5]}},
+          "cells": {"h": {"type": "INV", "connections": {"A": [5], "Y": [7]}}}}}})";
+  Lum_Netlist const netlist = Lum_NetlistJsonReader::ReadText(text, "bits.json");
+  ASSERT_EQ(netlist.modules.size(), 2U);
+  for (Lum_NetlistModule const &module : netlist.modules) {
+    Lum_NetlistBit const *port = module.Bits(module.ports[0].bits);
+    EXPECT_EQ(module.numBits, Lum_NetlistBits::kFirstNet + 2);
+    EXPECT_NE(port[0], port[1]);
+    EXPECT_EQ(module.Bits(module.connections[0].bits)[0], port[1]) << netlist.Text(module.name);
+    EXPECT_EQ(module.Bits(module.connections[1].bits)[0], port[0]) << netlist.Text(module.name);
+  }
+  try {
+    Lum_NetlistJsonReader::ReadText(
+        R"({"modules": {"c": {"ports": {"p": {"direction": "input", "bits": [3]}},
+            "cells": {"k": {"type": "INV", "connections": {"A": [3, 99999999999]}}}}}})",
+        "undeclared.json");
+    ADD_FAILURE() << "read a bit no port or net declares";
+  } catch (Lum_ExceptionInvalidFormat const &e) {
+    EXPECT_THAT(e.GetMessage(), HasSubstr("modules.c.cells.k.connections.A: bit 99999999999 is "
+                                          "declared by no port"));
+  }
+}
+
 } // namespace
