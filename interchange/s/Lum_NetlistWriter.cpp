@@ -224,15 +224,19 @@ private:
     // Verilog cannot tell apart).
     if (name.size() > 1 && name[0] == '\\' && name[1] == '$')
       name.remove_prefix(1);
-    bool plain =
-        !name.empty() && (std::isalpha(static_cast<unsigned char>(name[0])) || name[0] == '_');
+    // ASCII classes, checked inline: a call per character costs more than
+    // the rest of the name's writing.
+    auto letter = [](char c) { return (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z'); };
+    bool plain = !name.empty() && (letter(name[0]) || name[0] == '_');
     for (char c : name) {
-      if (std::isspace(static_cast<unsigned char>(c)) || static_cast<unsigned char>(c) < 0x20)
+      // White space: the blank, and the controls below it (tab to carriage
+      // return among them).
+      if (c == ' ' || static_cast<unsigned char>(c) < 0x20)
         throw Lum_ExceptionInvalidFormat(__FILE__, __LINE__, m_File, 0, 0,
                                          "module " + std::string(m_Netlist.Text(m_Module.name)),
                                          "the name \"" + std::string(name) +
                                              "\" holds white space, which Verilog cannot carry");
-      plain = plain && (std::isalnum(static_cast<unsigned char>(c)) || c == '_' || c == '$');
+      plain = plain && (letter(c) || (c >= '0' && c <= '9') || c == '_' || c == '$');
     }
     if (plain && !IsKeyword(name)) {
       text += name;
