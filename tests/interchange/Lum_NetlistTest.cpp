@@ -13,12 +13,15 @@
 #include "Lum_TdmModel.h"
 #include "Lum_TdmView.h"
 
+#include "../Lum_TdmTestSupport.h"
+
 #include "Orb_Model.h"
 #include "Orb_Property.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <filesystem>
 #include <sstream>
 
 using ::testing::HasSubstr;
@@ -327,6 +330,58 @@ TEST_F(NetlistImport, RefusesWhatCannotBeMapped) {
   } catch (Lum_ExceptionInvalidFormat const &e) {
     EXPECT_THAT(e.GetMessage(), HasSubstr("modules.cpu.cells.$abc$12.connections.A: 2 bits"));
   }
+}
+
+// Every view of a model, one file each: each the same bytes as the export of
+// that view alone, and so the same netlist to Yosys. A view that fails names
+// itself and leaves no file; the files before it stay.
+TEST_F(NetlistImport, SavesEveryViewAsItsOneViewExport) {
+  Import(Lum_NetlistVerilogReader::ReadText(kEverything, "every.v"));
+  Import(Lum_NetlistVerilogReader::ReadText(
+      "module other(input a, output y);\n  INV i (.A(a), .Y(y));\nendmodule\n", "other.v"));
+  lumtest::TempDir dir;
+  std::vector<Orb_View *> views;
+  for (Orb_DesignMgr *designMgr : m_Model.GetOrbModel()->GetDesignMgrs())
+    views.push_back(designMgr->GetDesigns()[0]->GetViews()[0]);
+  ASSERT_EQ(views.size(), 2U);
+  for (auto const format : {Lum_NetlistWriter::Format::Json, Lum_NetlistWriter::Format::Verilog}) {
+    std::string const extension = format == Lum_NetlistWriter::Format::Json ? ".json" : ".v";
+    std::vector<std::string> const written =
+        Lum_NetlistExporter::SaveAll(m_Model, dir.Path(), format);
+    ASSERT_EQ(written, (std::vector<std::string>{dir.File("top.netlist" + extension),
+                                                 dir.File("other.netlist" + extension)}));
+    for (std::size_t i = 0; i < views.size(); ++i) {
+      std::string const alone = dir.File("alone" + std::to_string(i) + extension);
+      Lum_NetlistWriter::Save(
+          Lum_NetlistExporter::Export(*static_cast<Lum_TdmView *>(m_Model.Specialize(views[i]))),
+          alone, format);
+      EXPECT_EQ(lumtest::FileBytes(written[i]), lumtest::FileBytes(alone)) << written[i];
+      if (!nltest::HaveYosys())
+        continue;
+      ASSERT_TRUE(nltest::YosysNormalise(written[i], written[i] + ".yosys.json"));
+      ASSERT_TRUE(nltest::YosysNormalise(alone, alone + ".yosys.json"));
+      EXPECT_EQ(nltest::Canonical(Lum_NetlistJsonReader::Read(written[i] + ".yosys.json")),
+                nltest::Canonical(Lum_NetlistJsonReader::Read(alone + ".yosys.json")));
+    }
+  }
+  // A folder where the second file goes: the first is written, the second
+  // named in the error, and no temporary is left.
+  lumtest::TempDir failing;
+  std::filesystem::create_directory(failing.File("other.netlist.json"));
+  try {
+    Lum_NetlistExporter::SaveAll(m_Model, failing.Path(), Lum_NetlistWriter::Format::Json);
+    ADD_FAILURE() << "saved over a folder";
+  } catch (Lum_ExceptionInvalidFormat const &e) {
+    EXPECT_EQ(e.GetInputPath(), failing.File("other.netlist.json"));
+    EXPECT_THAT(e.GetMessage(), HasSubstr("view other/other/netlist: "));
+  }
+  std::size_t entries = 0;
+  for (auto const &entry : std::filesystem::directory_iterator(failing.Path()))
+    entries += entry.path().filename() == "top.netlist.json" ||
+                       entry.path().filename() == "other.netlist.json"
+                   ? 1
+                   : 100;
+  EXPECT_EQ(entries, 2U);
 }
 
 } // namespace

@@ -4,6 +4,9 @@
 
 #include "../Lum_TdmTestSupport.h"
 
+#include "Lum_TdmSchema.h"
+#include "Orb_Model.h"
+
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
@@ -120,6 +123,38 @@ TEST_F(TdmNetlist, ARebindThatFailsForOneBlockLeavesTheDatabaseByteIdentical) {
   EXPECT_THAT(run.err, HasSubstr("\" has no pin \""));
   EXPECT_THAT(run.err, HasSubstr("is unchanged"));
   EXPECT_EQ(FileBytes(db), bytes);
+}
+
+// A database with a second view: export names both and the two ways to
+// choose; --all-views writes each, the netlist view as its own export does.
+TEST_F(TdmNetlist, ExportsEveryViewOrAsksWhichOne) {
+  ASSERT_EQ(s_Imported.code, 0) << s_Imported.err;
+  std::string const db = Copy("views.odb");
+  {
+    Orb_Model host("t", "t", db.c_str(), false);
+    host.Open(db.c_str());
+    Orb_View *view = host.GetDesignMgrs()[0]->GetDesigns()[0]->CreateView("alt");
+    view->CreatePropertyString(Lum_TdmSchema::kVersion, "3.1");
+    view->CreateTopBlock("alt_top")->CreatePin("a", Orb_Pin::PIN_INPUT);
+    host.Save(db.c_str());
+  }
+  std::string const lib = s_Dir->Path();
+  ToolRun const neither = Tdm({"export", "--lib-path", lib, db});
+  EXPECT_EQ(neither.code, 2);
+  EXPECT_THAT(neither.err,
+              HasSubstr("holds several views (serv_rf_top/serv_rf_top/netlist, "
+                        "serv_rf_top/serv_rf_top/alt): choose one with --view, or write every "
+                        "view with --all-views -o FOLDER"));
+  EXPECT_EQ(Tdm({"export", "--lib-path", lib, db, "--all-views"}).code, 2);
+  std::string const folder = File("views");
+  ToolRun const all =
+      Tdm({"export", "--lib-path", lib, db, "--all-views", "-o", folder, "--format", "verilog"});
+  ASSERT_EQ(all.code, 0) << all.err;
+  ToolRun const one =
+      Tdm({"export", "--lib-path", lib, db, "--view", "netlist", "-o", File("one.v")});
+  ASSERT_EQ(one.code, 0) << one.err;
+  EXPECT_EQ(FileBytes(folder + "/serv_rf_top.netlist.v"), FileBytes(File("one.v")));
+  EXPECT_THAT(FileBytes(folder + "/serv_rf_top.alt.v"), HasSubstr("module alt_top"));
 }
 
 TEST_F(TdmNetlist, ImportRefusalsNameTheProblemAndWriteNothing) {

@@ -64,6 +64,8 @@ struct ExportOptions {
   std::string format; // json or verilog; empty: from the output's extension, else json
   std::string output; // empty: standard output
   std::string view;   // empty: the only view
+  // Every view, one file each in the folder `output`.
+  bool allViews = false;
 };
 int RunExport(std::string const &path, ExportOptions const &exported, CommonOptions const &options);
 
