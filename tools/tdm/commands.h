@@ -75,6 +75,8 @@ struct RebindOptions {
   std::string map;   // OLDPIN=NEWPIN,...
   std::string where; // glob over block paths; empty: every block
   std::string output;
+  // Files of libraries for --to (.tlm, .lib or cell models in .json).
+  std::vector<std::string> libraries;
 };
 int RunRebind(std::string const &path, RebindOptions const &rebind, CommonOptions const &options);
 

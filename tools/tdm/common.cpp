@@ -167,6 +167,7 @@ public:
     m_Progress.Count();
     Lum_TdmModel::SyncEventSpecializeBlockOnLoad(block);
   }
+  void SyncEventSpecializeViewOnLoad(Orb_View *view) override { new OpenedView(this, view, false); }
 
 private:
   Progress &m_Progress;

@@ -4,6 +4,8 @@
 // command, common options, the progress line, names of objects as the
 // output shows them, and opening a database through the client model.
 
+#include "Lum_TdmView.h"
+
 #include <atomic>
 #include <condition_variable>
 #include <cstdint>
@@ -15,6 +17,7 @@
 #include <vector>
 
 class Lum_TdmModel;
+class Lum_TlmLibrary;
 class Orb_Block;
 class Orb_Design;
 class Orb_View;
@@ -106,10 +109,19 @@ private:
   std::thread m_Thread;
 };
 
+// The view client of a database OpenTyped opened: a view whose library list
+// a command may extend (rebinding to a library the view does not list yet).
+// The library is one LoadLibrary gave, whose reference the view gives back.
+class OpenedView : public Lum_TdmView {
+public:
+  using Lum_TdmView::Lum_TdmView;
+  void AddLibrary(Lum_TlmLibrary const *library) const { SetLibrary(library); }
+};
+
 // Opens the database in a new client model, binding every typed block. A
 // file that cannot be read, or a database that the model refuses, throws
 // Failure(kExitUnreadable) naming the file and the object, with the message
-// manager's reports of the open folded in.
+// manager's reports of the open folded in. Its views are OpenedView.
 std::unique_ptr<Lum_TdmModel> OpenTyped(std::string const &path, CommonOptions const &options);
 
 // The views of the database (every design, in host order), those named

@@ -177,6 +177,10 @@ int Main(int argc, char **argv) {
       ->type_name("GLOB");
   rebindCommand->add_option("-o,--output", rebind.output, "Write to OUT instead of in place")
       ->type_name("OUT");
+  rebindCommand
+      ->add_option("--lib", rebind.libraries,
+                   "Library of --to that the view does not list yet (.tlm, .lib or .json)")
+      ->type_name("FILE");
 
   CLI::App *findCommand = app.add_subcommand("find", "List (or count) the blocks of one cell type");
   AddDatabase(findCommand, database);
