@@ -2,6 +2,7 @@
 # model.
 list(APPEND LUM_INTERCHANGE_SOURCES
   s/Lum_Netlist.cpp
+  s/Lum_NetlistDrivers.cpp
   s/Lum_NetlistExporter.cpp
   s/Lum_NetlistImporter.cpp
   s/Lum_NetlistJsonReader.cpp

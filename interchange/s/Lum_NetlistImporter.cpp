@@ -1,6 +1,7 @@
 #include "Lum_NetlistImporter.h"
 
 #include "Lum_ExceptionInvalidFormat.h"
+#include "Lum_NetlistDrivers.h"
 #include "Lum_NetlistNames.h"
 #include "Lum_TdmBlock.h"
 #include "Lum_TdmDesign.h"
@@ -96,8 +97,14 @@ public:
     // Everything is checked before anything is built.
     ResolveTypes(order);
     ReportUnknown();
-    for (std::uint32_t module : order)
+    Lum_NetlistDrivers drivers(m_Netlist);
+    for (std::uint32_t module : order) {
       CheckConnections(module);
+      drivers.Check(module, [this](Lum_NetlistCell const &cell, Lum_NetlistConnection const &c) {
+        Lum_NetlistDirection const known = FindPort(m_Types.at(cell.type), c.port)->direction;
+        return known != Lum_NetlistDirection::Unknown ? known : c.direction;
+      });
+    }
 
     m_ModuleHier.assign(m_Netlist.modules.size(), nullptr);
     for (std::uint32_t module : order)

@@ -332,6 +332,73 @@ TEST_F(NetlistImport, RefusesWhatCannotBeMapped) {
   }
 }
 
+// A net with two drivers is refused before anything is built, at the second
+// driver; an inout pin, a pin of unknown direction and x or z are no drivers.
+TEST_F(NetlistImport, RefusesANetWithTwoDrivers) {
+  struct Case {
+    bool json;
+    char const *text;
+    char const *what; // empty: imports
+  };
+  char const *const sub = "module sub(input i, output o);\n  INV g (.A(i), .Y(o));\nendmodule\n";
+  auto cells = [](char const *extra) {
+    return std::string(R"({"modules": {"m": {"ports": {"a": {"direction": "input", "bits": [2]},
+        "y": {"direction": "output", "bits": [3]}}, "cells": {
+        "$abc$1": {"type": "INV", "connections": {"A": [2], "Y": [3]}}, )") +
+           extra + "}}}}";
+  };
+  std::string const second =
+      cells(R"("$abc$2": {"type": "INV", "connections": {"A": [2], "Y": [3]}})");
+  std::string const unknownOut = cells(
+      R"("u": {"type": "ODD", "port_directions": {"P": "output"}, "connections": {"P": [3]}})");
+  std::string const unknownInout = cells(
+      R"("u": {"type": "ODD", "port_directions": {"P": "inout"}, "connections": {"P": [3]}})");
+  std::string const unknownBare = cells(R"("u": {"type": "ODD", "connections": {"P": [3]}})");
+  std::string const moduleOut =
+      std::string("module m(input a, output y);\n  sub s (.i(a), .o(y));\n  INV i (.A(a), "
+                  ".Y(y));\nendmodule\n") +
+      sub;
+  m_Options.blackboxUnknown = true;
+  for (Case const &c : std::vector<Case>{
+           {false,
+            "module m(input a, output y);\n  INV i1 (.A(a), .Y(y));\n  INV i2 (.A(a), "
+            ".Y(y));\nendmodule",
+            "line 3, column 7: module m: net y has two drivers, i1.Y and i2.Y"},
+           {false, "module m(input a);\n  INV i (.A(a), .Y(a));\nendmodule",
+            "line 2, column 7: module m: net a has two drivers, input port a and i.Y"},
+           {false,
+            "module m(input a, output y);\n  assign y = 1'b1;\n  INV i (.A(a), .Y(y));\nendmodule",
+            "line 3, column 7: module m: net y has two drivers, constant 1 and i.Y"},
+           {false,
+            "module m(input [3:0] d, output [3:0] q);\n  wire [2:0] w;\n  REG4 r1 (.D(d), "
+            ".Q(q));\n  REG4 r2 (.D(d), .Q({ q[2], w }));\nendmodule",
+            "line 4, column 8: module m: net q[2] has two drivers, r1.Q[2] and r2.Q[3]"},
+           {false, moduleOut.c_str(),
+            "line 3, column 7: module m: net y has two drivers, s.o and i.Y"},
+           {false,
+            "module m(input a, output y);\n  assign y = 1'bz;\n  INV i (.A(a), .Y(y));\nendmodule",
+            ""},
+           {true, second.c_str(),
+            "modules.m.cells.$abc$2.connections.Y: module m: net y has two drivers, $abc$1.Y and "
+            "$abc$2.Y"},
+           {true, unknownOut.c_str(),
+            "modules.m.cells.u.connections.P: module m: net y has two drivers, $abc$1.Y and u.P"},
+           {true, unknownInout.c_str(), ""},
+           {true, unknownBare.c_str(), ""},
+       }) {
+    Lum_Netlist const netlist = c.json ? Lum_NetlistJsonReader::ReadText(c.text, "two.json")
+                                       : Lum_NetlistVerilogReader::ReadText(c.text, "two.v");
+    Lum_TdmModel model("two", "two", "");
+    try {
+      Lum_NetlistImporter::Import(model, netlist, m_Options);
+      EXPECT_STREQ(c.what, "") << "imported";
+    } catch (Lum_ExceptionInvalidFormat const &e) {
+      EXPECT_EQ(e.GetInputPath(), c.json ? "two.json" : "two.v");
+      EXPECT_EQ(e.GetMessage(), c.what);
+    }
+  }
+}
+
 // Every view of a model, one file each: each the same bytes as the export of
 // that view alone, and so the same netlist to Yosys. A view that fails names
 // itself and leaves no file; the files before it stay.

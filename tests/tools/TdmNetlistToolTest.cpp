@@ -231,6 +231,10 @@ TEST_F(TdmNetlist, ImportRefusalsNameTheProblemAndWriteNothing) {
            {"module m(input a);\n  always @(a) ;\nendmodule\n",
             {},
             "bad.v\": line 2, column 3: 'always' is not structural"},
+           {"module m(input a, output y);\n  sg13g2_inv_1 i1 (.A(a), .Y(y));\n  sg13g2_inv_1 i2 "
+            "(.A(a), .Y(y));\nendmodule\n",
+            {},
+            "bad.v\": line 3, column 16: module m: net y has two drivers, i1.Y and i2.Y"},
            {"module m(input a, output y);\n  FOO f1 (.A(a), .Y(y));\n  FOO f2 (.A(a));\n  BAR "
             "b (.A(a));\nendmodule\n",
             {},
