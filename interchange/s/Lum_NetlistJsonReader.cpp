@@ -1,6 +1,7 @@
 #include "Lum_NetlistJsonReader.h"
 
 #include "Lum_ExceptionInvalidFormat.h"
+#include "Lum_MappedFile.h"
 
 #include <simdjson.h>
 
@@ -353,12 +354,11 @@ private:
 } // namespace
 
 Lum_Netlist Lum_NetlistJsonReader::Read(std::string const &path) {
-  simdjson::padded_string text;
-  if (simdjson::padded_string::load(path).get(text) != simdjson::SUCCESS)
-    throw Lum_ExceptionInvalidFormat(__FILE__, __LINE__, path, 0, 0, "file",
-                                     "cannot be read (missing, unreadable or not a file)");
+  // Mapped, not copied: the zero bytes after the end are simdjson's padding.
+  Lum_MappedFile const file(path, simdjson::SIMDJSON_PADDING);
   JsonNetlistReader reader(path);
-  return reader.Run(text);
+  return reader.Run(simdjson::padded_string_view(file.Data(), file.Size(),
+                                                 file.Size() + simdjson::SIMDJSON_PADDING));
 }
 
 Lum_Netlist Lum_NetlistJsonReader::ReadText(std::string_view text, std::string const &path) {
