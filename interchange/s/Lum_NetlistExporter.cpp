@@ -353,11 +353,12 @@ std::vector<std::string> Lum_NetlistExporter::SaveAll(Lum_TdmModel &model, std::
         std::string name =
             FileNamePart(design->GetName()) + "." + FileNamePart(hostView->GetName());
         if (taken.count(name))
-          name = FileNamePart(designMgr->GetName()) + "." + name;
+          name.insert(0, FileNamePart(designMgr->GetName()) + ".");
         // Names that still clash (after "_" replaced characters) get "_"s.
         while (!taken.insert(name).second)
           name += '_';
-        std::string const path = folder + "/" + name + extension;
+        std::string path = folder;
+        path.append("/").append(name).append(extension);
         try {
           Lum_NetlistWriter::Save(Export(*view), path, format);
         } catch (Port::Exception const &e) {

@@ -79,6 +79,12 @@ TEST(MappedNetlistFile, RefusalsNameTheFileAndThePosition) {
            {Write(dir, "empty.json", ""), true, "document: not valid JSON"},
            {Write(dir, "huge.v", huge), false,
             "line 1, column 8: a token longer than 65536 bytes (4194304)"},
+           {Write(dir, "huge.json",
+                  "{\"modules\": {\"" + std::string(std::size_t(4) << 20, 'n') + "\": {}}}"),
+            true, "line 1, column 14: a string longer than 1048576 bytes"},
+           {Write(dir, "escaped.json",
+                  "{\"modules\": {\"\\\"" + std::string(std::size_t(2) << 20, 'n') + "\": {}}}"),
+            true, "line 1, column 14: a string longer than 1048576 bytes"},
        }) {
     try {
       Read(c.path, c.json);
