@@ -10,28 +10,19 @@ bool IsDrivingConstant(Lum_NetlistBit bit) {
   return bit == Lum_NetlistBits::kZero || bit == Lum_NetlistBits::kOne;
 }
 
-} // namespace
-
-void Lum_NetlistDrivers::Check(std::uint32_t index, DirectionOf const &directionOf) {
-  Lum_NetlistModule const &module = m_Netlist.modules[index];
-  m_Driven.assign(module.numBits, false);
-  // Marks the bit driven; false when it was already.
-  auto drive = [this](Lum_NetlistBit bit) {
-    if (Lum_NetlistBits::IsConstant(bit))
-      return !IsDrivingConstant(bit);
-    if (m_Driven[bit])
-      return false;
-    m_Driven[bit] = true;
-    return true;
-  };
+// Calls visit(bit, driver) for each bit driven by an input port or a cell
+// output, ports first, until it returns false.
+template <class Visit>
+void EachDriver(Lum_NetlistModule const &module, Lum_NetlistDrivers::DirectionOf const &directionOf,
+                Visit const &visit) {
   for (std::uint32_t p = 0; p < module.ports.size(); ++p) {
     Lum_NetlistVector const &port = module.ports[p];
     if (port.direction != Lum_NetlistDirection::Input)
       continue;
     Lum_NetlistBit const *bits = module.Bits(port.bits);
     for (std::uint32_t b = 0; b < port.bits.width; ++b)
-      if (!drive(bits[b]))
-        Fail(module, bits[b], {true, p, 0, b}, directionOf);
+      if (!visit(bits[b], Lum_NetlistDrivers::Driver{true, p, 0, b}))
+        return;
   }
   for (std::uint32_t c = 0; c < module.cells.size(); ++c) {
     Lum_NetlistCell const &cell = module.cells[c];
@@ -41,36 +32,40 @@ void Lum_NetlistDrivers::Check(std::uint32_t index, DirectionOf const &direction
         continue;
       Lum_NetlistBit const *bits = module.Bits(connection.bits);
       for (std::uint32_t b = 0; b < connection.bits.width; ++b)
-        if (!drive(bits[b]))
-          Fail(module, bits[b], {false, c, k, b}, directionOf);
+        if (!visit(bits[b], Lum_NetlistDrivers::Driver{false, c, k, b}))
+          return;
     }
   }
+}
+
+} // namespace
+
+void Lum_NetlistDrivers::Check(std::uint32_t index, DirectionOf const &directionOf) {
+  Lum_NetlistModule const &module = m_Netlist.modules[index];
+  m_Driven.assign(module.numBits, false);
+  EachDriver(module, directionOf, [&](Lum_NetlistBit bit, Driver const &driver) {
+    bool const again =
+        Lum_NetlistBits::IsConstant(bit) ? IsDrivingConstant(bit) : bool(m_Driven[bit]);
+    if (again)
+      Fail(module, bit, driver, directionOf);
+    if (!Lum_NetlistBits::IsConstant(bit))
+      m_Driven[bit] = true;
+    return true;
+  });
 }
 
 // Only on the error path: the same walk, up to the first driver of the bit.
 Lum_NetlistDrivers::Driver Lum_NetlistDrivers::FirstDriver(Lum_NetlistModule const &module,
                                                            Lum_NetlistBit bit,
                                                            DirectionOf const &directionOf) const {
-  if (Lum_NetlistBits::IsConstant(bit))
-    return {};
-  for (std::uint32_t p = 0; p < module.ports.size(); ++p) {
-    Lum_NetlistVector const &port = module.ports[p];
-    for (std::uint32_t b = 0; b < port.bits.width; ++b)
-      if (port.direction == Lum_NetlistDirection::Input && module.Bits(port.bits)[b] == bit)
-        return {true, p, 0, b};
-  }
-  for (std::uint32_t c = 0; c < module.cells.size(); ++c) {
-    Lum_NetlistCell const &cell = module.cells[c];
-    for (std::uint32_t k = 0; k < cell.numConnections; ++k) {
-      Lum_NetlistConnection const &connection = module.connections[cell.firstConnection + k];
-      if (directionOf(cell, connection) != Lum_NetlistDirection::Output)
-        continue;
-      for (std::uint32_t b = 0; b < connection.bits.width; ++b)
-        if (module.Bits(connection.bits)[b] == bit)
-          return {false, c, k, b};
-    }
-  }
-  return {};
+  Driver first;
+  if (!Lum_NetlistBits::IsConstant(bit))
+    EachDriver(module, directionOf, [&](Lum_NetlistBit driven, Driver const &driver) {
+      if (driven == bit)
+        first = driver;
+      return driven != bit;
+    });
+  return first;
 }
 
 std::string Lum_NetlistDrivers::Describe(Lum_NetlistModule const &module, Driver const &driver,

@@ -26,7 +26,6 @@ public:
   // and column).
   void Check(std::uint32_t module, DirectionOf const &directionOf);
 
-private:
   // A driver: bit `position` of input port `index`, or of connection
   // `connection` of cell `index`; a constant has index kNone.
   struct Driver {
@@ -36,6 +35,7 @@ private:
     std::uint32_t position = 0;
   };
 
+private:
   Driver FirstDriver(Lum_NetlistModule const &module, Lum_NetlistBit bit,
                      DirectionOf const &directionOf) const;
   std::string Describe(Lum_NetlistModule const &module, Driver const &driver,

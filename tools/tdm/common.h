@@ -18,6 +18,8 @@
 
 class Lum_TdmModel;
 class Lum_TlmLibrary;
+class Lum_TypeLibraryLoader;
+struct Lum_TypeLibraryLoadOptions;
 class Orb_Block;
 class Orb_Design;
 class Orb_View;
@@ -129,5 +131,17 @@ std::unique_ptr<Lum_TdmModel> OpenTyped(std::string const &path, CommonOptions c
 // Failure(kExitUsage) listing the views there are.
 std::vector<Orb_View *> SelectViews(Lum_TdmModel const &model, std::string const &path,
                                     std::string const &onlyView);
+
+// The type libraries of --lib files, cell libraries read now (see
+// Lum_TypeLibraryLoader); one that cannot be loaded throws
+// Failure(kExitUnreadable).
+std::unique_ptr<Lum_TypeLibraryLoader> LoadLibraries(std::vector<std::string> const &files,
+                                                     Lum_TypeLibraryLoadOptions const &options);
+
+// Saves the libraries read now as .tlm files in the folder of the database
+// at `database`, so that it opens again with --lib-path there; returns the
+// files. One that cannot be saved throws Failure(kExitUnreadable).
+std::vector<std::string> KeepLibraries(Lum_TypeLibraryLoader const &libraries,
+                                       std::string const &database);
 
 } // namespace tdm

@@ -52,12 +52,7 @@ int RunImport(ImportOptions const &import, CommonOptions const &options) {
   Lum_TypeLibraryLoadOptions loading;
   loading.personality = import.personality;
   loading.part = import.part;
-  std::unique_ptr<Lum_TypeLibraryLoader> libraries;
-  try {
-    libraries = std::make_unique<Lum_TypeLibraryLoader>(import.libraries, loading);
-  } catch (Port::Exception const &e) {
-    throw Failure(kExitUnreadable, Describe(e));
-  }
+  std::unique_ptr<Lum_TypeLibraryLoader> const libraries = LoadLibraries(import.libraries, loading);
   std::filesystem::path const output(import.output);
   std::string const dir = output.has_parent_path() ? output.parent_path().string() : ".";
 
@@ -86,13 +81,7 @@ int RunImport(ImportOptions const &import, CommonOptions const &options) {
     }
   }
   // The libraries read on the fly stay beside the database.
-  std::vector<std::string> kept;
-  try {
-    kept = libraries->Save(dir);
-  } catch (Port::Exception const &e) {
-    throw Failure(kExitUnreadable,
-                  "the database is saved, but a type library is not: " + Describe(e));
-  }
+  std::vector<std::string> const kept = KeepLibraries(*libraries, import.output);
   if (!options.quiet) {
     std::uint64_t leaves = 0;
     for (auto const &entry : summary.instancesByLibrary)

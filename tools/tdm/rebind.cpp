@@ -22,7 +22,6 @@
 #include "Port_Exception.h"
 
 #include <cstdio>
-#include <filesystem>
 #include <fnmatch.h>
 #include <map>
 
@@ -134,11 +133,7 @@ int RunRebind(std::string const &path, RebindOptions const &rebind, CommonOption
     Lum_TypeLibraryLoadOptions loading;
     // A library the database holds already is used from its .tlm file.
     loading.refuseLoaded = true;
-    try {
-      libraries = std::make_unique<Lum_TypeLibraryLoader>(rebind.libraries, loading);
-    } catch (Port::Exception const &e) {
-      throw Failure(kExitUnreadable, Describe(e));
-    }
+    libraries = LoadLibraries(rebind.libraries, loading);
   }
   Lum_TdmTypePinMapMgr maps;
   std::size_t rebound = 0;
@@ -226,17 +221,8 @@ int RunRebind(std::string const &path, RebindOptions const &rebind, CommonOption
                       (rebind.output.empty() ? "; the database is unchanged" : ""));
   }
   // The libraries read now stay beside the database, for the next open.
-  std::filesystem::path const saved(target);
-  std::string const dir = saved.has_parent_path() ? saved.parent_path().string() : ".";
-  std::vector<std::string> kept;
-  if (libraries && added) {
-    try {
-      kept = libraries->Save(dir);
-    } catch (Port::Exception const &e) {
-      throw Failure(kExitUnreadable,
-                    "the database is saved, but a type library is not: " + Describe(e));
-    }
-  }
+  std::vector<std::string> const kept =
+      libraries && added ? KeepLibraries(*libraries, target) : std::vector<std::string>();
   if (!options.quiet) {
     std::printf("rebound %zu block%s from %s to %s in %zu view%s, saved %s\n", rebound,
                 rebound == 1 ? "" : "s", rebind.from.c_str(), rebind.to.c_str(), views,
@@ -245,8 +231,7 @@ int RunRebind(std::string const &path, RebindOptions const &rebind, CommonOption
       std::printf("added type library %s to %zu view%s\n", toName.c_str(), added,
                   added == 1 ? "" : "s");
     for (std::string const &file : kept)
-      std::printf("kept type library %s (open the database with --lib-path %s)\n", file.c_str(),
-                  dir.c_str());
+      std::printf("kept type library %s\n", file.c_str());
   }
   return kExitOk;
 }
