@@ -61,6 +61,12 @@ TEST(MappedNetlistFile, ReadsToTheLastByteAndNoFurther) {
   EXPECT_THROW(Read(Write(dir, "cut.v", cut.substr(0, page - 1)), false),
                Lum_ExceptionInvalidFormat);
   EXPECT_EQ(Read(Write(dir, "empty.v", ""), false).modules.size(), 0U);
+  // A string that ends in an escaped backslash ends there: the megabytes
+  // of blanks after it are no string.
+  Lum_Netlist const escaped = Read(
+      Write(dir, "escaped.json", R"({"modules": {"m\\": {}})" + std::string(2 << 20, ' ') + "}"),
+      true);
+  EXPECT_EQ(escaped.Text(escaped.modules[0].name), "m\\");
 }
 
 TEST(MappedNetlistFile, RefusalsNameTheFileAndThePosition) {
