@@ -140,6 +140,8 @@ std::unique_ptr<Lum_TlmModel> Build(Lum_CellLibraryData const &data, std::string
         typePin->CreatePropertyString(Lum_CellLibraryNames::kFunction, pin.function.c_str());
       if (!pin.clock.empty())
         typePin->CreatePropertyString(Lum_CellLibraryNames::kClock, pin.clock.c_str());
+      if (!pin.threeState.empty())
+        typePin->CreatePropertyString(Lum_CellLibraryNames::kThreeState, pin.threeState.c_str());
     }
     ++found.cells;
     found.buses += cell.buses;

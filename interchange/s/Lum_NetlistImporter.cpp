@@ -1,5 +1,6 @@
 #include "Lum_NetlistImporter.h"
 
+#include "Lum_CellLibraryReader.h"
 #include "Lum_ExceptionInvalidFormat.h"
 #include "Lum_NetlistDrivers.h"
 #include "Lum_NetlistNames.h"
@@ -224,10 +225,13 @@ private:
       std::string const base(view);
       auto const found = type.byName.find(base);
       if (found == type.byName.end()) {
+        // A tri-state output shares its net with others, as an inout does.
+        bool const shared = direction == Orb_Pin::PIN_BIDIRECTIONAL ||
+                            pin->GetPropertyByName(Lum_CellLibraryNames::kThreeState);
         AddPort(type, base,
-                direction == Orb_Pin::PIN_OUTPUT          ? Lum_NetlistDirection::Output
-                : direction == Orb_Pin::PIN_BIDIRECTIONAL ? Lum_NetlistDirection::Inout
-                                                          : Lum_NetlistDirection::Input);
+                shared                             ? Lum_NetlistDirection::Inout
+                : direction == Orb_Pin::PIN_OUTPUT ? Lum_NetlistDirection::Output
+                                                   : Lum_NetlistDirection::Input);
         bits.emplace_back();
       }
       bits[type.byName[base]].emplace_back(bit, index++);

@@ -3,6 +3,7 @@
 
 #include "Lum_NetlistTestSupport.h"
 
+#include "Lum_CellLibraryReader.h"
 #include "Lum_ExceptionInvalidFormat.h"
 #include "Lum_NetlistExporter.h"
 #include "Lum_NetlistImporter.h"
@@ -397,6 +398,38 @@ TEST_F(NetlistImport, RefusesANetWithTwoDrivers) {
       EXPECT_EQ(e.GetMessage(), c.what);
     }
   }
+}
+
+// Tri-state outputs (Liberty three_state) share a bus: they are not two
+// drivers of it.
+TEST(NetlistDrivers, TriStateOutputsShareANet) {
+  Lum_CellLibraryOptions options;
+  options.name = "TRI";
+  std::unique_ptr<Lum_TlmModel> const cells = Lum_CellLibraryReader::ReadText(
+      "library (tri) {\n  cell (EBUF) {\n    pin (A) { direction : input ; }\n    pin (E) { "
+      "direction : input ; }\n    pin (Z) { direction : output ; three_state : \"!E\" ; }\n  "
+      "}\n}\n",
+      "tri.lib", options);
+  Lum_TlmLibrary *library = cells->GetLibrary();
+  Orb_Property const *threeState = library->GetTypeBlock(Port::StringBase<char>("EBUF"))
+                                       ->GetPinByName("Z")
+                                       ->GetPropertyByName(Lum_CellLibraryNames::kThreeState);
+  ASSERT_NE(threeState, nullptr);
+  EXPECT_STREQ(threeState->GetStringValue(), "!E");
+  Lum_TlmCatalog::Register(library);
+  {
+    Lum_NetlistImportOptions import;
+    import.libraries = {"TRI"};
+    Lum_TdmModel model("tri", "tri", "");
+    EXPECT_NO_THROW(Lum_NetlistImporter::Import(
+        model,
+        Lum_NetlistVerilogReader::ReadText("module m(input a, b, e, f, output y);\n  EBUF u1 "
+                                           "(.A(a), .E(e), .Z(y));\n  EBUF u2 (.A(b), .E(f), "
+                                           ".Z(y));\nendmodule\n",
+                                           "tri.v"),
+        import));
+  }
+  Lum_TlmCatalog::Unregister(library);
 }
 
 // Every view of a model, one file each: each the same bytes as the export of
