@@ -1,7 +1,9 @@
 # Gate-level netlists: readers, writers and the mapping to and from the typed
 # model.
 list(APPEND LUM_INTERCHANGE_SOURCES
+  s/Lum_MappedFile.cpp
   s/Lum_Netlist.cpp
+  s/Lum_NetlistDrivers.cpp
   s/Lum_NetlistExporter.cpp
   s/Lum_NetlistImporter.cpp
   s/Lum_NetlistJsonReader.cpp

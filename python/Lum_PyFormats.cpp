@@ -10,8 +10,8 @@
 #include "Lum_NetlistVerilogReader.h"
 #include "Lum_NetlistWriter.h"
 #include "Lum_TdmView.h"
+#include "Lum_TypeLibraryLoader.h"
 
-#include "Lum_Exception.h"
 #include "Lum_Tlm.h"
 #include "Orb_Model.h"
 
@@ -81,54 +81,6 @@ py::dict ImportLibrary(std::string const &path, std::string const &outputDir,
   return result;
 }
 
-// The libraries of a netlist import: .tlm files by name through the search
-// path, cell libraries read now and registered while the import runs.
-class ImportLibraries {
-public:
-  ImportLibraries(std::vector<std::string> const &files, std::string const &personality,
-                  std::string const &part) {
-    for (std::string const &file : files) {
-      std::filesystem::path const path(file);
-      if (path.extension() == ".tlm") {
-        if (!std::filesystem::exists(path))
-          throw py::value_error(file + ": no such type library file");
-        Lum_TlmCatalog::AddSearchDirectory(FolderOf(file).c_str());
-        names.push_back(path.stem().string());
-        continue;
-      }
-      Lum_CellLibraryOptions options;
-      options.personality = personality;
-      options.part = part;
-      read.push_back(Lum_CellLibraryReader::Read(file, options));
-      Lum_TlmLibrary *library = read.back()->GetLibrary();
-      // Unlike in a one-shot tool, a library of that name may be loaded
-      // already in this process (by an open database or a type library
-      // object); its .tlm is then the one to name.
-      if (Lum_TlmCatalog::IsLoaded(library->GetLibraryName()))
-        throw Lum_ExceptionInvalidLibrary(
-            "lumtdm", "python/Lum_PyFormats", "", __LINE__, file.c_str(),
-            ("type library '" + std::string(library->GetLibraryName()) +
-             "' is loaded already in this process: give its .tlm file instead, or first close "
-             "what holds it")
-                .c_str(),
-            false);
-      Lum_TlmCatalog::Register(library);
-      registered.push_back(library);
-      names.push_back(library->GetLibraryName());
-    }
-  }
-  ~ImportLibraries() {
-    for (Lum_TlmLibrary const *library : registered)
-      Lum_TlmCatalog::Unregister(library);
-  }
-  ImportLibraries(ImportLibraries const &) = delete;
-  ImportLibraries &operator=(ImportLibraries const &) = delete;
-
-  std::vector<std::string> names;
-  std::vector<std::unique_ptr<Lum_TlmModel>> read;
-  std::vector<Lum_TlmLibrary const *> registered;
-};
-
 py::dict ImportNetlist(std::string const &netlistPath, std::string const &output,
                        std::vector<std::string> const &libraries, std::string const &top,
                        std::string const &personality, std::string const &part,
@@ -140,12 +92,18 @@ py::dict ImportNetlist(std::string const &netlistPath, std::string const &output
     py::gil_scoped_release release;
     Lum_Netlist const netlist = IsVerilog(netlistPath) ? Lum_NetlistVerilogReader::Read(netlistPath)
                                                        : Lum_NetlistJsonReader::Read(netlistPath);
-    ImportLibraries const read(libraries, personality, part);
+    // Unlike a one-shot tool, this process may hold a library of that name
+    // already (an open database, a type library object): its .tlm serves.
+    Lum_TypeLibraryLoadOptions loading;
+    loading.personality = personality;
+    loading.part = part;
+    loading.refuseLoaded = true;
+    Lum_TypeLibraryLoader const read(libraries, loading);
     Lum_NetlistImportOptions mapping;
     mapping.top = top;
     mapping.personality = personality;
     mapping.part = part;
-    mapping.libraries = read.names;
+    mapping.libraries = read.GetNames();
     mapping.blackboxUnknown = blackboxUnknown;
     {
       Lum_TdmModel model("lumtdm", "lumtdm", output.c_str());
@@ -154,8 +112,7 @@ py::dict ImportNetlist(std::string const &netlistPath, std::string const &output
     }
     // The libraries read on the fly stay beside the database, so that it
     // opens again with lib_path=[its folder].
-    for (auto const &library : read.read)
-      kept.push_back(Lum_CellLibraryReader::Save(*library, FolderOf(output)));
+    kept = read.Save(FolderOf(output));
   }
   py::dict result;
   result["path"] = output;

@@ -44,6 +44,7 @@ constexpr char const *kDontUse = "LIB_DONT_USE";       // type block: "true" whe
 constexpr char const *kSupplyPins = "LIB_SUPPLY_PINS"; // type block: "VDD:primary_power VSS:..."
 constexpr char const *kFunction = "LIB_FUNCTION";      // type pin: `function` as written
 constexpr char const *kClock = "LIB_CLOCK";            // type pin: "true" when a clock pin
+constexpr char const *kThreeState = "LIB_THREE_STATE"; // type pin: `three_state` as written
 constexpr char const *kSourceFormat = "LIB_SOURCE";    // type library: "liberty" or "json"
 constexpr char const *kRevision = "LIB_REVISION";      // type library: Liberty `revision`
 constexpr char const *kDate = "LIB_DATE";              // type library: Liberty `date`

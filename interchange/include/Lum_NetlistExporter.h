@@ -2,7 +2,12 @@
 
 #include "Lum_InterchangeApi.h"
 #include "Lum_Netlist.h"
+#include "Lum_NetlistWriter.h"
 
+#include <string>
+#include <vector>
+
+class Lum_TdmModel;
 class Lum_TdmView;
 
 // Makes the netlist of a view, folding its hierarchy back into modules: the
@@ -16,4 +21,14 @@ class Lum_TdmView;
 class LUM_INTERCHANGE_API Lum_NetlistExporter {
 public:
   static Lum_Netlist Export(Lum_TdmView &view);
+  // Writes every view of the model that has a top block as a file of its
+  // own in `dir`, "<design>.<view>.json" or ".v" (the design manager's name
+  // put first when two views would share a name; characters a file name
+  // should not carry become "_"), in host order, and returns the paths.
+  // Each view is exported and saved before the next is made, each file
+  // atomically. A view that cannot be exported or saved throws
+  // Lum_ExceptionInvalidFormat naming the file and the view, leaving no file
+  // of that view; the files of the views before it stay.
+  static std::vector<std::string> SaveAll(Lum_TdmModel &model, std::string const &dir,
+                                          Lum_NetlistWriter::Format format);
 };

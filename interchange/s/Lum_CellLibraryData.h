@@ -22,6 +22,7 @@ struct Lum_CellPinData {
   Lum_CellPinDirection direction = Lum_CellPinDirection::Input;
   std::string function; // empty when the file gives none
   std::string clock;
+  std::string threeState; // the enable of a tri-state output; empty for others
 };
 
 struct Lum_CellData {

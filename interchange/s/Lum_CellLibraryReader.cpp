@@ -5,6 +5,7 @@
 #include "Lum_ExceptionInvalidFormat.h"
 #include "Lum_LibertyReader.h"
 #include "Lum_LibertyScanner.h"
+#include "Lum_MappedFile.h"
 
 #include "Lum_Tlm.h"
 #include "Orb_Model.h"
@@ -139,6 +140,8 @@ std::unique_ptr<Lum_TlmModel> Build(Lum_CellLibraryData const &data, std::string
         typePin->CreatePropertyString(Lum_CellLibraryNames::kFunction, pin.function.c_str());
       if (!pin.clock.empty())
         typePin->CreatePropertyString(Lum_CellLibraryNames::kClock, pin.clock.c_str());
+      if (!pin.threeState.empty())
+        typePin->CreatePropertyString(Lum_CellLibraryNames::kThreeState, pin.threeState.c_str());
     }
     ++found.cells;
     found.buses += cell.buses;
@@ -169,13 +172,8 @@ std::unique_ptr<Lum_TlmModel> Lum_CellLibraryReader::Read(std::string const &pat
     Lum_LibertyScanner scanner(file.get(), path);
     return Build(Lum_LibertyReader::Read(scanner), path, options, summary);
   }
-  std::string text(head, got);
-  char block[1 << 16];
-  for (std::size_t n; (n = std::fread(block, 1, sizeof block, file.get())) > 0;)
-    text.append(block, n);
-  if (std::ferror(file.get()))
-    Fail(path, 0, 0, std::string("cannot be read: ") + std::strerror(errno));
-  return Build(Lum_CellModelReader::Read(text, path), path, options, summary);
+  Lum_MappedFile const text(path);
+  return Build(Lum_CellModelReader::Read(text.Text(), path), path, options, summary);
 }
 
 std::unique_ptr<Lum_TlmModel> Lum_CellLibraryReader::ReadText(std::string_view text,

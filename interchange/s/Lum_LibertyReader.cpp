@@ -55,6 +55,7 @@ enum class Field {
   Direction,
   Function,
   Clock,
+  ThreeState,
   BusType,
   BitWidth,
   BitFrom,
@@ -82,8 +83,9 @@ constexpr FieldRule kFields[] = {
     {Context::Bundle, "members", Field::Members},
 };
 // Pins, buses and bundles all take these.
-constexpr char const *kPinFields[] = {"direction", "function", "clock"};
-constexpr Field kPinFieldIds[] = {Field::Direction, Field::Function, Field::Clock};
+constexpr char const *kPinFields[] = {"direction", "function", "clock", "three_state"};
+constexpr Field kPinFieldIds[] = {Field::Direction, Field::Function, Field::Clock,
+                                  Field::ThreeState};
 
 bool IsPinLike(Context c) {
   return c == Context::CellPin || c == Context::BusPin || c == Context::BundlePin ||
@@ -125,6 +127,7 @@ struct PinGroup {
   Direction direction = Direction::None;
   std::string function;
   std::string clock;
+  std::string threeState;
 
   void Reset(Position where) {
     at = where;
@@ -132,6 +135,7 @@ struct PinGroup {
     direction = Direction::None;
     function.clear();
     clock.clear();
+    threeState.clear();
   }
 };
 
@@ -355,6 +359,9 @@ private:
     case Field::Clock:
       PinsOf(context)->clock = m_Value;
       return;
+    case Field::ThreeState:
+      PinsOf(context)->threeState = m_Value;
+      return;
     case Field::Members:
     case Field::None:
       return;
@@ -517,6 +524,7 @@ private:
                                                      : Lum_CellPinDirection::Inout;
     pin.function = group.function;
     pin.clock = group.clock;
+    pin.threeState = group.threeState;
     m_Cell.pins.push_back(std::move(pin));
   }
 
@@ -635,6 +643,8 @@ private:
             bit.function = member.function;
           if (!member.clock.empty())
             bit.clock = member.clock;
+          if (!member.threeState.empty())
+            bit.threeState = member.threeState;
         }
       }
     }
@@ -671,6 +681,8 @@ private:
           pin.function = group.function;
         if (!group.clock.empty())
           pin.clock = group.clock;
+        if (!group.threeState.empty())
+          pin.threeState = group.threeState;
       }
     for (std::size_t i = 0; i < m_Members.size(); ++i)
       AddPin(m_Members[i], pins[i], pins[i].direction);

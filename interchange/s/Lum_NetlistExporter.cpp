@@ -1,8 +1,10 @@
 #include "Lum_NetlistExporter.h"
 
+#include "Lum_ExceptionInvalidFormat.h"
 #include "Lum_NetlistImporter.h"
 #include "Lum_NetlistNames.h"
 #include "Lum_TdmBlock.h"
+#include "Lum_TdmModel.h"
 #include "Lum_TdmPin.h"
 #include "Lum_TdmView.h"
 
@@ -15,6 +17,7 @@
 #include <cstring>
 #include <deque>
 #include <map>
+#include <set>
 #include <stdexcept>
 #include <unordered_map>
 #include <unordered_set>
@@ -412,4 +415,54 @@ private:
 Lum_Netlist Lum_NetlistExporter::Export(Lum_TdmView &view) {
   Exporter exporter(view);
   return exporter.Run();
+}
+
+namespace {
+
+// A name as a part of a file name: no separators, control bytes or blanks.
+std::string FileNamePart(std::string_view name) {
+  std::string part(name.empty() ? std::string_view("_") : name);
+  for (char &c : part)
+    if (!std::isalnum(static_cast<unsigned char>(c)) && c != '_' && c != '-' && c != '$' &&
+        c != '.')
+      c = '_';
+  if (part[0] == '.')
+    part[0] = '_';
+  return part;
+}
+
+} // namespace
+
+std::vector<std::string> Lum_NetlistExporter::SaveAll(Lum_TdmModel &model, std::string const &dir,
+                                                      Lum_NetlistWriter::Format format) {
+  char const *const extension = format == Lum_NetlistWriter::Format::Json ? ".json" : ".v";
+  std::string const folder = dir.empty() ? std::string(".") : dir;
+  std::vector<std::string> written;
+  std::set<std::string> taken;
+  for (Orb_DesignMgr *designMgr : model.GetOrbModel()->GetDesignMgrs())
+    for (Orb_Design *design : designMgr->GetDesigns())
+      for (Orb_View *hostView : design->GetViews()) {
+        auto *view = static_cast<Lum_TdmView *>(model.Specialize(hostView));
+        if (!view->GetBlock())
+          continue;
+        std::string name =
+            FileNamePart(design->GetName()) + "." + FileNamePart(hostView->GetName());
+        if (taken.count(name))
+          name.insert(0, FileNamePart(designMgr->GetName()) + ".");
+        // Names that still clash (after "_" replaced characters) get "_"s.
+        while (!taken.insert(name).second)
+          name += '_';
+        std::string path = folder;
+        path.append("/").append(name).append(extension);
+        try {
+          Lum_NetlistWriter::Save(Export(*view), path, format);
+        } catch (Port::Exception const &e) {
+          throw Lum_ExceptionInvalidFormat(__FILE__, __LINE__, path, 0, 0,
+                                           "view " + std::string(designMgr->GetName()) + "/" +
+                                               design->GetName() + "/" + hostView->GetName(),
+                                           e.GetMessage());
+        }
+        written.push_back(path);
+      }
+  return written;
 }

@@ -1,6 +1,8 @@
 #include "Lum_NetlistImporter.h"
 
+#include "Lum_CellLibraryReader.h"
 #include "Lum_ExceptionInvalidFormat.h"
+#include "Lum_NetlistDrivers.h"
 #include "Lum_NetlistNames.h"
 #include "Lum_TdmBlock.h"
 #include "Lum_TdmDesign.h"
@@ -97,8 +99,14 @@ public:
     // Everything is checked before anything is built.
     ResolveTypes(order);
     ReportUnknown();
-    for (std::uint32_t module : order)
+    Lum_NetlistDrivers drivers(m_Netlist);
+    for (std::uint32_t module : order) {
       CheckConnections(module);
+      drivers.Check(module, [this](Lum_NetlistCell const &cell, Lum_NetlistConnection const &c) {
+        Lum_NetlistDirection const known = FindPort(m_Types.at(cell.type), c.port)->direction;
+        return known != Lum_NetlistDirection::Unknown ? known : c.direction;
+      });
+    }
 
     m_ModuleHier.assign(m_Netlist.modules.size(), nullptr);
     for (std::uint32_t module : order)
@@ -222,10 +230,13 @@ private:
       std::string const base(view);
       auto const found = type.byName.find(base);
       if (found == type.byName.end()) {
+        // A tri-state output shares its net with others, as an inout does.
+        bool const shared = direction == Orb_Pin::PIN_BIDIRECTIONAL ||
+                            pin->GetPropertyByName(Lum_CellLibraryNames::kThreeState);
         AddPort(type, base,
-                direction == Orb_Pin::PIN_OUTPUT          ? Lum_NetlistDirection::Output
-                : direction == Orb_Pin::PIN_BIDIRECTIONAL ? Lum_NetlistDirection::Inout
-                                                          : Lum_NetlistDirection::Input);
+                shared                             ? Lum_NetlistDirection::Inout
+                : direction == Orb_Pin::PIN_OUTPUT ? Lum_NetlistDirection::Output
+                                                   : Lum_NetlistDirection::Input);
         bits.emplace_back();
       }
       bits[type.byName[base]].emplace_back(bit, index++);

@@ -1,6 +1,7 @@
 #include "Lum_NetlistJsonReader.h"
 
 #include "Lum_ExceptionInvalidFormat.h"
+#include "Lum_MappedFile.h"
 
 #include <simdjson.h>
 
@@ -379,16 +380,47 @@ private:
 
 } // namespace
 
+namespace {
+
+// Bytes of one string (a name or a value, such as a memory's INIT bits) that
+// a netlist may hold.
+constexpr std::size_t kMaxString = std::size_t(1) << 20;
+
+// Refuses a string longer than kMaxString before the parser indexes the
+// document, whose index would grow with it: one pass from quote to quote.
+void CheckStrings(std::string_view text, std::string const &path) {
+  for (std::size_t at = text.find('"'); at != std::string_view::npos;) {
+    std::size_t end = at + 1;
+    while ((end = text.find_first_of("\"\\", end)) != std::string_view::npos && text[end] == '\\')
+      end += 2;
+    std::size_t const length = (end == std::string_view::npos ? text.size() : end) - at - 1;
+    if (length > kMaxString) {
+      std::size_t const line =
+          1 + static_cast<std::size_t>(std::count(text.begin(), text.begin() + at, '\n'));
+      std::size_t const lineStart = text.rfind('\n', at);
+      std::size_t const column = at - (lineStart == std::string_view::npos ? 0 : lineStart + 1) + 1;
+      throw Lum_ExceptionInvalidFormat(
+          __FILE__, __LINE__, path, line, column,
+          "line " + std::to_string(line) + ", column " + std::to_string(column),
+          "a string longer than " + std::to_string(kMaxString) + " bytes");
+    }
+    at = end == std::string_view::npos ? end : text.find('"', end + 1);
+  }
+}
+
+} // namespace
+
 Lum_Netlist Lum_NetlistJsonReader::Read(std::string const &path) {
-  simdjson::padded_string text;
-  if (simdjson::padded_string::load(path).get(text) != simdjson::SUCCESS)
-    throw Lum_ExceptionInvalidFormat(__FILE__, __LINE__, path, 0, 0, "file",
-                                     "cannot be read (missing, unreadable or not a file)");
+  // Mapped, not copied: the zero bytes after the end are simdjson's padding.
+  Lum_MappedFile const file(path, simdjson::SIMDJSON_PADDING);
+  CheckStrings(file.Text(), path);
   JsonNetlistReader reader(path);
-  return reader.Run(text);
+  return reader.Run(simdjson::padded_string_view(file.Data(), file.Size(),
+                                                 file.Size() + simdjson::SIMDJSON_PADDING));
 }
 
 Lum_Netlist Lum_NetlistJsonReader::ReadText(std::string_view text, std::string const &path) {
+  CheckStrings(text, path);
   simdjson::padded_string const padded(text);
   JsonNetlistReader reader(path);
   return reader.Run(padded);

@@ -1,6 +1,7 @@
 #include "Lum_NetlistVerilogReader.h"
 
 #include "Lum_ExceptionInvalidFormat.h"
+#include "Lum_MappedFile.h"
 
 #include <algorithm>
 #include <array>
@@ -963,14 +964,9 @@ private:
 } // namespace
 
 Lum_Netlist Lum_NetlistVerilogReader::Read(std::string const &path) {
-  std::ifstream in(path, std::ios::binary);
-  if (!in)
-    throw Lum_ExceptionInvalidFormat(__FILE__, __LINE__, path, 0, 0, "file",
-                                     "cannot be read (missing or unreadable)");
-  std::string const text((std::istreambuf_iterator<char>(in)), std::istreambuf_iterator<char>());
-  if (in.bad())
-    throw Lum_ExceptionInvalidFormat(__FILE__, __LINE__, path, 0, 0, "file", "read error");
-  return ReadText(text, path);
+  // Mapped, not copied: the netlist keeps its own copies of the names.
+  Lum_MappedFile const file(path);
+  return ReadText(file.Text(), path);
 }
 
 Lum_Netlist Lum_NetlistVerilogReader::ReadText(std::string_view text, std::string const &path) {

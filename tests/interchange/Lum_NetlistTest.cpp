@@ -3,6 +3,7 @@
 
 #include "Lum_NetlistTestSupport.h"
 
+#include "Lum_CellLibraryReader.h"
 #include "Lum_ExceptionInvalidFormat.h"
 #include "Lum_NetlistExporter.h"
 #include "Lum_NetlistImporter.h"
@@ -14,6 +15,8 @@
 #include "Lum_TdmPin.h"
 #include "Lum_TdmView.h"
 
+#include "../Lum_TdmTestSupport.h"
+
 #include "Lum_Tlm.h"
 #include "Orb_Model.h"
 #include "Orb_Property.h"
@@ -21,6 +24,7 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <filesystem>
 #include <sstream>
 
 using ::testing::HasSubstr;
@@ -354,6 +358,153 @@ TEST_F(NetlistImport, RefusesWhatCannotBeMapped) {
   } catch (Lum_ExceptionInvalidFormat const &e) {
     EXPECT_THAT(e.GetMessage(), HasSubstr("modules.cpu.cells.$abc$12.connections.A: 2 bits"));
   }
+}
+
+// A net with two drivers is refused before anything is built, at the second
+// driver; an inout pin, a pin of unknown direction and x or z are no drivers.
+TEST_F(NetlistImport, RefusesANetWithTwoDrivers) {
+  struct Case {
+    bool json;
+    char const *text;
+    char const *what; // empty: imports
+  };
+  char const *const sub = "module sub(input i, output o);\n  INV g (.A(i), .Y(o));\nendmodule\n";
+  auto cells = [](char const *extra) {
+    return std::string(R"({"modules": {"m": {"ports": {"a": {"direction": "input", "bits": [2]},
+        "y": {"direction": "output", "bits": [3]}}, "cells": {
+        "$abc$1": {"type": "INV", "connections": {"A": [2], "Y": [3]}}, )") +
+           extra + "}}}}";
+  };
+  std::string const second =
+      cells(R"("$abc$2": {"type": "INV", "connections": {"A": [2], "Y": [3]}})");
+  std::string const unknownOut = cells(
+      R"("u": {"type": "ODD", "port_directions": {"P": "output"}, "connections": {"P": [3]}})");
+  std::string const unknownInout = cells(
+      R"("u": {"type": "ODD", "port_directions": {"P": "inout"}, "connections": {"P": [3]}})");
+  std::string const unknownBare = cells(R"("u": {"type": "ODD", "connections": {"P": [3]}})");
+  std::string const moduleOut =
+      std::string("module m(input a, output y);\n  sub s (.i(a), .o(y));\n  INV i (.A(a), "
+                  ".Y(y));\nendmodule\n") +
+      sub;
+  m_Options.blackboxUnknown = true;
+  for (Case const &c : std::vector<Case>{
+           {false,
+            "module m(input a, output y);\n  INV i1 (.A(a), .Y(y));\n  INV i2 (.A(a), "
+            ".Y(y));\nendmodule",
+            "line 3, column 7: module m: net y has two drivers, i1.Y and i2.Y"},
+           {false, "module m(input a);\n  INV i (.A(a), .Y(a));\nendmodule",
+            "line 2, column 7: module m: net a has two drivers, input port a and i.Y"},
+           {false,
+            "module m(input a, output y);\n  assign y = 1'b1;\n  INV i (.A(a), .Y(y));\nendmodule",
+            "line 3, column 7: module m: net y has two drivers, constant 1 and i.Y"},
+           {false,
+            "module m(input [3:0] d, output [3:0] q);\n  wire [2:0] w;\n  REG4 r1 (.D(d), "
+            ".Q(q));\n  REG4 r2 (.D(d), .Q({ q[2], w }));\nendmodule",
+            "line 4, column 8: module m: net q[2] has two drivers, r1.Q[2] and r2.Q[3]"},
+           {false, moduleOut.c_str(),
+            "line 3, column 7: module m: net y has two drivers, s.o and i.Y"},
+           {false,
+            "module m(input a, output y);\n  assign y = 1'bz;\n  INV i (.A(a), .Y(y));\nendmodule",
+            ""},
+           {true, second.c_str(),
+            "modules.m.cells.$abc$2.connections.Y: module m: net y has two drivers, $abc$1.Y and "
+            "$abc$2.Y"},
+           {true, unknownOut.c_str(),
+            "modules.m.cells.u.connections.P: module m: net y has two drivers, $abc$1.Y and u.P"},
+           {true, unknownInout.c_str(), ""},
+           {true, unknownBare.c_str(), ""},
+       }) {
+    Lum_Netlist const netlist = c.json ? Lum_NetlistJsonReader::ReadText(c.text, "two.json")
+                                       : Lum_NetlistVerilogReader::ReadText(c.text, "two.v");
+    Lum_TdmModel model("two", "two", "");
+    try {
+      Lum_NetlistImporter::Import(model, netlist, m_Options);
+      EXPECT_STREQ(c.what, "") << "imported";
+    } catch (Lum_ExceptionInvalidFormat const &e) {
+      EXPECT_EQ(e.GetInputPath(), c.json ? "two.json" : "two.v");
+      EXPECT_EQ(e.GetMessage(), c.what);
+    }
+  }
+}
+
+// Tri-state outputs (Liberty three_state) share a bus: they are not two
+// drivers of it.
+TEST(NetlistDrivers, TriStateOutputsShareANet) {
+  Lum_CellLibraryOptions options;
+  options.name = "TRI";
+  std::unique_ptr<Lum_TlmModel> const cells = Lum_CellLibraryReader::ReadText(
+      "library (tri) {\n  cell (EBUF) {\n    pin (A) { direction : input ; }\n    pin (E) { "
+      "direction : input ; }\n    pin (Z) { direction : output ; three_state : \"!E\" ; }\n  "
+      "}\n}\n",
+      "tri.lib", options);
+  Lum_TlmLibrary *library = cells->GetLibrary();
+  Orb_Property const *threeState = library->GetTypeBlock(Port::StringBase<char>("EBUF"))
+                                       ->GetPinByName("Z")
+                                       ->GetPropertyByName(Lum_CellLibraryNames::kThreeState);
+  ASSERT_NE(threeState, nullptr);
+  EXPECT_STREQ(threeState->GetStringValue(), "!E");
+  Lum_TlmCatalog::Register(library);
+  {
+    Lum_NetlistImportOptions import;
+    import.libraries = {"TRI"};
+    Lum_TdmModel model("tri", "tri", "");
+    EXPECT_NO_THROW(Lum_NetlistImporter::Import(
+        model,
+        Lum_NetlistVerilogReader::ReadText("module m(input a, b, e, f, output y);\n  EBUF u1 "
+                                           "(.A(a), .E(e), .Z(y));\n  EBUF u2 (.A(b), .E(f), "
+                                           ".Z(y));\nendmodule\n",
+                                           "tri.v"),
+        import));
+  }
+  Lum_TlmCatalog::Unregister(library);
+}
+
+// Every view of a model, one file each: each the same bytes as the export of
+// that view alone, and so the same netlist to Yosys. A view that fails names
+// itself and leaves no file; the files before it stay.
+TEST_F(NetlistImport, SavesEveryViewAsItsOneViewExport) {
+  Import(Lum_NetlistVerilogReader::ReadText(kEverything, "every.v"));
+  Import(Lum_NetlistVerilogReader::ReadText(
+      "module other(input a, output y);\n  INV i (.A(a), .Y(y));\nendmodule\n", "other.v"));
+  lumtest::TempDir dir;
+  std::vector<Orb_View *> views;
+  for (Orb_DesignMgr *designMgr : m_Model.GetOrbModel()->GetDesignMgrs())
+    views.push_back(designMgr->GetDesigns()[0]->GetViews()[0]);
+  ASSERT_EQ(views.size(), 2U);
+  for (auto const format : {Lum_NetlistWriter::Format::Json, Lum_NetlistWriter::Format::Verilog}) {
+    std::string const extension = format == Lum_NetlistWriter::Format::Json ? ".json" : ".v";
+    std::vector<std::string> const written =
+        Lum_NetlistExporter::SaveAll(m_Model, dir.Path(), format);
+    ASSERT_EQ(written, (std::vector<std::string>{dir.File("top.netlist" + extension),
+                                                 dir.File("other.netlist" + extension)}));
+    for (std::size_t i = 0; i < views.size(); ++i) {
+      std::string const alone = dir.File("alone" + std::to_string(i) + extension);
+      Lum_NetlistWriter::Save(
+          Lum_NetlistExporter::Export(*static_cast<Lum_TdmView *>(m_Model.Specialize(views[i]))),
+          alone, format);
+      EXPECT_EQ(lumtest::FileBytes(written[i]), lumtest::FileBytes(alone)) << written[i];
+      if (!nltest::HaveYosys())
+        continue;
+      ASSERT_TRUE(nltest::YosysNormalise(written[i], written[i] + ".yosys.json"));
+      ASSERT_TRUE(nltest::YosysNormalise(alone, alone + ".yosys.json"));
+      EXPECT_EQ(nltest::Canonical(Lum_NetlistJsonReader::Read(written[i] + ".yosys.json")),
+                nltest::Canonical(Lum_NetlistJsonReader::Read(alone + ".yosys.json")));
+    }
+  }
+  // A folder where the second file goes: the first is written, the second
+  // named in the error, and no temporary is left.
+  lumtest::TempDir failing;
+  std::filesystem::create_directory(failing.File("other.netlist.json"));
+  try {
+    Lum_NetlistExporter::SaveAll(m_Model, failing.Path(), Lum_NetlistWriter::Format::Json);
+    ADD_FAILURE() << "saved over a folder";
+  } catch (Lum_ExceptionInvalidFormat const &e) {
+    EXPECT_EQ(e.GetInputPath(), failing.File("other.netlist.json"));
+    EXPECT_THAT(e.GetMessage(), HasSubstr("view other/other/netlist: "));
+  }
+  EXPECT_TRUE(std::filesystem::is_regular_file(failing.File("top.netlist.json")));
+  auto const files = std::filesystem::directory_iterator(failing.Path());
+  EXPECT_EQ(std::distance(begin(files), end(files)), 2);
 }
 
 } // namespace

@@ -2,4 +2,5 @@
 list(APPEND LUM_INTERCHANGE_TEST_SOURCES
   Lum_CellLibraryReaderTest.cpp
   Lum_CellLibrarySaveTest.cpp
+  Lum_TypeLibraryLoaderTest.cpp
 )

@@ -4,6 +4,10 @@
 
 #include "../Lum_TdmTestSupport.h"
 
+#include "Lum_TdmSchema.h"
+#include "Orb_Model.h"
+#include "Orb_Property.h"
+
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
@@ -137,6 +141,99 @@ TEST_F(TdmNetlist, ARebindThatFailsForOneBlockLeavesTheDatabaseByteIdentical) {
   EXPECT_EQ(FileBytes(db), bytes);
 }
 
+// A database with a second view: export names both and the two ways to
+// choose; --all-views writes each, the netlist view as its own export does.
+TEST_F(TdmNetlist, ExportsEveryViewOrAsksWhichOne) {
+  ASSERT_EQ(s_Imported.code, 0) << s_Imported.err;
+  std::string const db = Copy("views.odb");
+  {
+    Orb_Model host("t", "t", db.c_str(), false);
+    host.Open(db.c_str());
+    Orb_View *view = host.GetDesignMgrs()[0]->GetDesigns()[0]->CreateView("alt");
+    view->CreatePropertyString(Lum_TdmSchema::kVersion, "3.1");
+    view->CreateTopBlock("alt_top")->CreatePin("a", Orb_Pin::PIN_INPUT);
+    host.Save(db.c_str());
+  }
+  std::string const lib = s_Dir->Path();
+  ToolRun const neither = Tdm({"export", "--lib-path", lib, db});
+  EXPECT_EQ(neither.code, 2);
+  EXPECT_THAT(neither.err,
+              HasSubstr("holds several views (serv_rf_top/serv_rf_top/netlist, "
+                        "serv_rf_top/serv_rf_top/alt): choose one with --view, or write every "
+                        "view with --all-views -o FOLDER"));
+  EXPECT_EQ(Tdm({"export", "--lib-path", lib, db, "--all-views"}).code, 2);
+  std::string const folder = File("views");
+  ToolRun const all =
+      Tdm({"export", "--lib-path", lib, db, "--all-views", "-o", folder, "--format", "verilog"});
+  ASSERT_EQ(all.code, 0) << all.err;
+  ToolRun const one =
+      Tdm({"export", "--lib-path", lib, db, "--view", "netlist", "-o", File("one.v")});
+  ASSERT_EQ(one.code, 0) << one.err;
+  EXPECT_EQ(FileBytes(folder + "/serv_rf_top.netlist.v"), FileBytes(File("one.v")));
+  EXPECT_THAT(FileBytes(folder + "/serv_rf_top.alt.v"), HasSubstr("module alt_top"));
+}
+
+// Rebinding to a library the view does not list: the library is read from
+// --lib, added to the view's list and kept beside the database, so that the
+// next open binds the new type; a rebind that fails adds nothing.
+TEST_F(TdmNetlist, RebindsToALibraryTheViewDoesNotListYet) {
+  ASSERT_EQ(s_Imported.code, 0) << s_Imported.err;
+  lumtest::TempDir out;
+  std::string const spare = out.File("spare.lib");
+  std::ofstream(spare) << "library (spare) {\n  cell (spare_inv) {\n    pin (A) { direction : "
+                          "input ; }\n    pin (Y) { direction : output ; function : \"!A\" ; "
+                          "}\n  }\n}\n";
+  std::string const db = out.File("serv.odb");
+  std::filesystem::copy_file(File("serv.odb"), db);
+  std::string const lib = "--lib-path=" + s_Dir->Path();
+  std::string const from = std::string(kLibrary) + ":sg13g2_inv_1";
+  // Without the file the library is not found; a flip-flop does not fit an
+  // inverter. Neither changes the database or keeps the library.
+  std::string const bytes = FileBytes(db);
+  for (auto const &[args, message] : std::vector<std::pair<std::vector<std::string>, char const *>>{
+           {{"rebind", lib, db, "--from", from, "--to", "spare:spare_inv"},
+            "library \"spare\" of --to is not among the libraries of view "
+            "serv_rf_top/serv_rf_top/netlist and cannot be loaded"},
+           {{"rebind", lib, db, "--from", std::string(kLibrary) + ":sg13g2_dfrbp_1", "--to",
+             "spare:spare_inv", "--lib", spare, "--map", "D=A,Q=Y"},
+            "\" has no pin \""},
+       }) {
+    ToolRun const run = Tdm(args);
+    EXPECT_NE(run.code, 0);
+    EXPECT_THAT(run.err, HasSubstr(message));
+    EXPECT_EQ(FileBytes(db), bytes);
+    EXPECT_FALSE(std::filesystem::exists(out.File("spare.tlm")));
+  }
+  auto count = [&](std::string const &type) {
+    ToolRun const run = Tdm({"find", lib, "--lib-path", out.Path(), db, "--type", type, "--count"});
+    EXPECT_EQ(run.code, 0) << run.err;
+    return std::atoi(run.out.c_str());
+  };
+  int const before = count(from);
+  ASSERT_GT(before, 100);
+  ToolRun const run =
+      Tdm({"rebind", lib, db, "--from", from, "--to", "spare:spare_inv", "--lib", spare});
+  ASSERT_EQ(run.code, 0) << run.err;
+  EXPECT_THAT(run.out, HasSubstr("added type library spare to 1 view"));
+  EXPECT_TRUE(std::filesystem::exists(out.File("spare.tlm")));
+  // Reopened through the search path alone, the new type binds.
+  EXPECT_EQ(count("spare:spare_inv"), before);
+  EXPECT_EQ(count(from), 0);
+  ToolRun const check = Tdm({"check", lib, "--lib-path", out.Path(), db});
+  EXPECT_EQ(check.code, 0) << check.out << check.err;
+  // The view lists the library after those it had.
+  Orb_Model host("t", "t", db.c_str(), true);
+  host.Open(db.c_str());
+  std::vector<std::string> const listed = host.GetDesignMgrs()[0]
+                                              ->GetDesigns()[0]
+                                              ->GetViews()[0]
+                                              ->GetPropertyByName(Lum_TdmSchema::kTypeLibraries)
+                                              ->GetStrings();
+  ASSERT_EQ(listed.size(), 3U);
+  EXPECT_THAT(listed[0], HasSubstr(kLibrary));
+  EXPECT_THAT(listed[2], HasSubstr("spare"));
+}
+
 TEST_F(TdmNetlist, ImportRefusalsNameTheProblemAndWriteNothing) {
   std::string const netlist = File("bad.v");
   std::string const db = File("bad.odb");
@@ -149,6 +246,10 @@ TEST_F(TdmNetlist, ImportRefusalsNameTheProblemAndWriteNothing) {
            {"module m(input a);\n  always @(a) ;\nendmodule\n",
             {},
             "bad.v\": line 2, column 3: 'always' is not structural"},
+           {"module m(input a, output y);\n  sg13g2_inv_1 i1 (.A(a), .Y(y));\n  sg13g2_inv_1 i2 "
+            "(.A(a), .Y(y));\nendmodule\n",
+            {},
+            "bad.v\": line 3, column 16: module m: net y has two drivers, i1.Y and i2.Y"},
            {"module m(input a, output y);\n  FOO f1 (.A(a), .Y(y));\n  FOO f2 (.A(a));\n  BAR "
             "b (.A(a));\nendmodule\n",
             {},

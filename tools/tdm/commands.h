@@ -64,7 +64,9 @@ struct ExportOptions {
   std::string format; // json or verilog; empty: from the output's extension, else json
   std::string output; // empty: standard output
   std::string view;   // empty: the only view
-  bool time = false;  // print the CPU seconds of each phase on standard error
+  // Every view, one file each in the folder `output`.
+  bool allViews = false;
+  bool time = false; // print the CPU seconds of each phase on standard error
 };
 int RunExport(std::string const &path, ExportOptions const &exported, CommonOptions const &options);
 
@@ -74,6 +76,8 @@ struct RebindOptions {
   std::string map;   // OLDPIN=NEWPIN,...
   std::string where; // glob over block paths; empty: every block
   std::string output;
+  // Files of libraries for --to (.tlm, .lib or cell models in .json).
+  std::vector<std::string> libraries;
 };
 int RunRebind(std::string const &path, RebindOptions const &rebind, CommonOptions const &options);
 

@@ -2,6 +2,7 @@
 
 #include "Lum_TdmModel.h"
 #include "Lum_TdmVerifier.h"
+#include "Lum_TypeLibraryLoader.h"
 
 #include "Lum_Tlm.h"
 #include "Orb_Exception.h"
@@ -12,6 +13,7 @@
 #include <cerrno>
 #include <chrono>
 #include <cstdio>
+#include <filesystem>
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -167,6 +169,7 @@ public:
     m_Progress.Count();
     Lum_TdmModel::SyncEventSpecializeBlockOnLoad(block);
   }
+  void SyncEventSpecializeViewOnLoad(Orb_View *view) override { new OpenedView(this, view, false); }
 
 private:
   Progress &m_Progress;
@@ -213,6 +216,26 @@ std::vector<Orb_View *> SelectViews(Lum_TdmModel const &model, std::string const
     throw Failure(kExitUsage, path + ": no view named " + Quoted(onlyView) +
                                   " (views: " + (names.empty() ? "none" : names) + ")");
   return views;
+}
+
+std::unique_ptr<Lum_TypeLibraryLoader> LoadLibraries(std::vector<std::string> const &files,
+                                                     Lum_TypeLibraryLoadOptions const &options) {
+  try {
+    return std::make_unique<Lum_TypeLibraryLoader>(files, options);
+  } catch (Port::Exception const &e) {
+    throw Failure(kExitUnreadable, Describe(e));
+  }
+}
+
+std::vector<std::string> KeepLibraries(Lum_TypeLibraryLoader const &libraries,
+                                       std::string const &database) {
+  std::filesystem::path const path(database);
+  try {
+    return libraries.Save(path.has_parent_path() ? path.parent_path().string() : ".");
+  } catch (Port::Exception const &e) {
+    throw Failure(kExitUnreadable,
+                  "the database is saved, but a type library is not: " + Describe(e));
+  }
 }
 
 } // namespace tdm

@@ -4,6 +4,8 @@
 // command, common options, the progress line, names of objects as the
 // output shows them, and opening a database through the client model.
 
+#include "Lum_TdmView.h"
+
 #include <atomic>
 #include <condition_variable>
 #include <cstdint>
@@ -15,6 +17,9 @@
 #include <vector>
 
 class Lum_TdmModel;
+class Lum_TlmLibrary;
+class Lum_TypeLibraryLoader;
+struct Lum_TypeLibraryLoadOptions;
 class Orb_Block;
 class Orb_Design;
 class Orb_View;
@@ -106,10 +111,19 @@ private:
   std::thread m_Thread;
 };
 
+// The view client of a database OpenTyped opened: a view whose library list
+// a command may extend (rebinding to a library the view does not list yet).
+// The library is one LoadLibrary gave, whose reference the view gives back.
+class OpenedView : public Lum_TdmView {
+public:
+  using Lum_TdmView::Lum_TdmView;
+  void AddLibrary(Lum_TlmLibrary const *library) const { SetLibrary(library); }
+};
+
 // Opens the database in a new client model, binding every typed block. A
 // file that cannot be read, or a database that the model refuses, throws
 // Failure(kExitUnreadable) naming the file and the object, with the message
-// manager's reports of the open folded in.
+// manager's reports of the open folded in. Its views are OpenedView.
 std::unique_ptr<Lum_TdmModel> OpenTyped(std::string const &path, CommonOptions const &options);
 
 // The views of the database (every design, in host order), those named
@@ -117,5 +131,17 @@ std::unique_ptr<Lum_TdmModel> OpenTyped(std::string const &path, CommonOptions c
 // Failure(kExitUsage) listing the views there are.
 std::vector<Orb_View *> SelectViews(Lum_TdmModel const &model, std::string const &path,
                                     std::string const &onlyView);
+
+// The type libraries of --lib files, cell libraries read now (see
+// Lum_TypeLibraryLoader); one that cannot be loaded throws
+// Failure(kExitUnreadable).
+std::unique_ptr<Lum_TypeLibraryLoader> LoadLibraries(std::vector<std::string> const &files,
+                                                     Lum_TypeLibraryLoadOptions const &options);
+
+// Saves the libraries read now as .tlm files in the folder of the database
+// at `database`, so that it opens again with --lib-path there; returns the
+// files. One that cannot be saved throws Failure(kExitUnreadable).
+std::vector<std::string> KeepLibraries(Lum_TypeLibraryLoader const &libraries,
+                                       std::string const &database);
 
 } // namespace tdm

@@ -1,5 +1,5 @@
-// tdm export: a view of a database as a gate-level netlist, JSON or
-// structural Verilog, its hierarchy folded back into modules.
+// tdm export: a view of a database, or every view, as a gate-level netlist,
+// JSON or structural Verilog, its hierarchy folded back into modules.
 
 #include "commands.h"
 
@@ -13,11 +13,32 @@
 
 #include <cstdio>
 #include <ctime>
+#include <filesystem>
 #include <iostream>
 
 namespace tdm {
-
 namespace {
+
+// Every view with a top block, one file each in the folder (made when
+// missing).
+int ExportAll(Lum_TdmModel &model, ExportOptions const &exported, Lum_NetlistWriter::Format format,
+              CommonOptions const &options) {
+  std::error_code error;
+  std::filesystem::create_directories(exported.output, error);
+  if (!std::filesystem::is_directory(exported.output))
+    throw Failure(kExitUnreadable, exported.output + ": is not a folder and cannot be made one" +
+                                       (error ? ": " + error.message() : std::string()));
+  std::vector<std::string> written;
+  try {
+    written = Lum_NetlistExporter::SaveAll(model, exported.output, format);
+  } catch (Port::Exception const &e) {
+    throw Failure(kExitUnreadable, Describe(e) + "; nothing of that view was written");
+  }
+  if (!options.quiet)
+    for (std::string const &file : written)
+      std::cerr << "wrote " << file << "\n";
+  return kExitOk;
+}
 
 // The CPU seconds of each phase, for --time: benchmarks set them against
 // the same phases of other tools.
@@ -58,19 +79,27 @@ int RunExport(std::string const &path, ExportOptions const &exported,
     format = Lum_NetlistWriter::Format::Verilog;
   else if (!exported.format.empty())
     throw Failure(kExitUsage, "--format is json or verilog, not " + Quoted(exported.format));
+  if (exported.allViews && !exported.view.empty())
+    throw Failure(kExitUsage, "--all-views writes every view: leave out --view");
+  if (exported.allViews && exported.output.empty())
+    throw Failure(kExitUsage, "--all-views needs -o FOLDER for the files it writes");
   ApplyLibraryPath(options);
   PhaseTimes times(exported.time);
   std::unique_ptr<Lum_TdmModel> model = OpenTyped(path, options);
   times.End("open");
+  if (exported.allViews)
+    return ExportAll(*model, exported, format, options);
   std::vector<Orb_View *> const views = SelectViews(*model, path, exported.view);
   if (views.size() != 1) {
     std::string names;
     for (Orb_View const *view : views)
       names += (names.empty() ? "" : ", ") + ViewPath(view);
-    throw Failure(kExitUsage, path + ": " +
-                                  (views.empty() ? "has no view"
-                                                 : "holds several views (" + names +
-                                                       "): choose one with --view"));
+    throw Failure(kExitUsage,
+                  path + ": " +
+                      (views.empty() ? "has no view"
+                                     : "holds several views (" + names +
+                                           "): choose one with --view, or write every view "
+                                           "with --all-views -o FOLDER"));
   }
   auto *view = static_cast<Lum_TdmView *>(model->Specialize(views.front()));
   try {

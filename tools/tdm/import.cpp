@@ -5,15 +5,14 @@
 
 #include "commands.h"
 
-#include "Lum_CellLibraryReader.h"
 #include "Lum_Netlist.h"
 #include "Lum_NetlistImporter.h"
 #include "Lum_NetlistJsonReader.h"
 #include "Lum_NetlistVerilogReader.h"
 #include "Lum_TdmModel.h"
 #include "Lum_TdmView.h"
+#include "Lum_TypeLibraryLoader.h"
 
-#include "Lum_Tlm.h"
 #include "Orb_Model.h"
 #include "Port_Exception.h"
 
@@ -39,47 +38,6 @@ bool IsVerilog(std::string const &path) {
   return c != '{';
 }
 
-// The libraries of the import: .tlm files by name through the search path,
-// the others read now and registered while the import runs.
-class Libraries {
-public:
-  Libraries(ImportOptions const &import) {
-    for (std::string const &file : import.libraries) {
-      std::filesystem::path const path(file);
-      if (path.extension() == ".tlm") {
-        if (!std::filesystem::exists(path))
-          throw Failure(kExitUnreadable, file + ": no such type library file");
-        std::string const dir = path.has_parent_path() ? path.parent_path().string() : ".";
-        Lum_TlmCatalog::AddSearchDirectory(dir.c_str());
-        names.push_back(path.stem().string());
-        continue;
-      }
-      Lum_CellLibraryOptions options;
-      options.personality = import.personality;
-      options.part = import.part;
-      try {
-        read.push_back(Lum_CellLibraryReader::Read(file, options));
-      } catch (Port::Exception const &e) {
-        throw Failure(kExitUnreadable, Describe(e));
-      }
-      Lum_TlmLibrary *library = read.back()->GetLibrary();
-      Lum_TlmCatalog::Register(library);
-      registered.push_back(library);
-      names.push_back(library->GetLibraryName());
-    }
-  }
-  ~Libraries() {
-    for (Lum_TlmLibrary const *library : registered)
-      Lum_TlmCatalog::Unregister(library);
-  }
-  Libraries(Libraries const &) = delete;
-  Libraries &operator=(Libraries const &) = delete;
-
-  std::vector<std::string> names;
-  std::vector<std::unique_ptr<Lum_TlmModel>> read;
-  std::vector<Lum_TlmLibrary const *> registered;
-};
-
 } // namespace
 
 int RunImport(ImportOptions const &import, CommonOptions const &options) {
@@ -91,7 +49,10 @@ int RunImport(ImportOptions const &import, CommonOptions const &options) {
   } catch (Port::Exception const &e) {
     throw Failure(kExitUnreadable, Describe(e) + "; nothing was written");
   }
-  Libraries libraries(import);
+  Lum_TypeLibraryLoadOptions loading;
+  loading.personality = import.personality;
+  loading.part = import.part;
+  std::unique_ptr<Lum_TypeLibraryLoader> const libraries = LoadLibraries(import.libraries, loading);
   std::filesystem::path const output(import.output);
   std::string const dir = output.has_parent_path() ? output.parent_path().string() : ".";
 
@@ -99,7 +60,7 @@ int RunImport(ImportOptions const &import, CommonOptions const &options) {
   mapping.top = import.top;
   mapping.personality = import.personality;
   mapping.part = import.part;
-  mapping.libraries = libraries.names;
+  mapping.libraries = libraries->GetNames();
   mapping.blackboxUnknown = import.blackboxUnknown;
   Lum_NetlistImportSummary summary;
   {
@@ -120,15 +81,7 @@ int RunImport(ImportOptions const &import, CommonOptions const &options) {
     }
   }
   // The libraries read on the fly stay beside the database.
-  std::vector<std::string> kept;
-  for (auto const &library : libraries.read) {
-    try {
-      kept.push_back(Lum_CellLibraryReader::Save(*library, dir));
-    } catch (Port::Exception const &e) {
-      throw Failure(kExitUnreadable,
-                    "the database is saved, but a type library is not: " + Describe(e));
-    }
-  }
+  std::vector<std::string> const kept = KeepLibraries(*libraries, import.output);
   if (!options.quiet) {
     std::uint64_t leaves = 0;
     for (auto const &entry : summary.instancesByLibrary)

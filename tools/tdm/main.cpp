@@ -159,6 +159,8 @@ int Main(int argc, char **argv) {
   exportCommand->add_option("-o,--output", exported.output, "File to write (default: stdout)")
       ->type_name("OUT");
   exportCommand->add_option("--view", exported.view, "The view to write")->type_name("V");
+  exportCommand->add_flag("--all-views", exported.allViews,
+                          "Write every view, each to OUT/<design>.<view>.json or .v");
   exportCommand->add_flag("--time", exported.time,
                           "Print the CPU seconds of opening, exporting, writing and closing");
 
@@ -177,6 +179,10 @@ int Main(int argc, char **argv) {
       ->type_name("GLOB");
   rebindCommand->add_option("-o,--output", rebind.output, "Write to OUT instead of in place")
       ->type_name("OUT");
+  rebindCommand
+      ->add_option("--lib", rebind.libraries,
+                   "Library of --to that the view does not list yet (.tlm, .lib or .json)")
+      ->type_name("FILE");
 
   CLI::App *findCommand = app.add_subcommand("find", "List (or count) the blocks of one cell type");
   AddDatabase(findCommand, database);
