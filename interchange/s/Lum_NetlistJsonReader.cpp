@@ -24,10 +24,10 @@ public:
   JsonNetlistReader(std::string const &path) { m_Netlist.path = path; }
 
   Lum_Netlist Run(simdjson::padded_string_view text) {
-    // Bit numbers up to the text's length (or a floor) are looked up in a
-    // table; a number that large needs a text about that long, so the table
-    // stays in proportion to the input.
-    m_DenseLimit = std::max<std::size_t>(text.size(), 1 << 16);
+    // Bit numbers below a quarter of the text's length (or a floor) are
+    // looked up in a table of 4-byte ids, which so stays no larger than the
+    // text; a file numbers its bits densely, so larger numbers are rare.
+    m_DenseLimit = std::max<std::size_t>(text.size() / 4, 1 << 16);
     try {
       od::document document = m_Parser.iterate(text);
       od::object root = Object(document.get_value());
