@@ -3,8 +3,8 @@
 #include "Lum_InterchangeApi.h"
 
 #include <cstdint>
-#include <deque>
 #include <limits>
+#include <memory>
 #include <string>
 #include <string_view>
 #include <unordered_map>
@@ -97,6 +97,7 @@ struct Lum_NetlistModule {
   std::vector<Lum_NetlistBit> bits; // every span above points here
 
   Lum_NetlistSpan AddBits(std::vector<Lum_NetlistBit> const &more);
+  Lum_NetlistSpan AddBits(Lum_NetlistBit const *more, std::uint32_t count);
   Lum_NetlistBit const *Bits(Lum_NetlistSpan span) const { return bits.data() + span.first; }
 };
 
@@ -115,7 +116,7 @@ public:
   Lum_NetlistName Intern(std::string_view text);
   std::string_view Text(Lum_NetlistName name) const { return m_Texts[name]; }
   // The same text, null-terminated, for the host's C-string calls.
-  char const *CText(Lum_NetlistName name) const { return m_Texts[name].c_str(); }
+  char const *CText(Lum_NetlistName name) const { return m_Texts[name].data(); }
   // The id of the string if it was interned, else kNone.
   Lum_NetlistName Find(std::string_view text) const;
 
@@ -140,7 +141,19 @@ public:
   bool fromJson = false; // positions are JSON paths, not lines
 
 private:
-  std::deque<std::string> m_Texts;
-  std::unordered_map<std::string_view, Lum_NetlistName> m_Ids;
+  // An interned text: its id and the low bits of its hash.
+  struct Slot {
+    Lum_NetlistName id = kNone;
+    std::uint32_t hash = 0;
+  };
+  std::string_view Store(std::string_view text);
+  std::size_t Probe(std::string_view text, std::uint32_t hash) const;
+
+  // The texts, each followed by a '\0', in chunks that never move.
+  std::vector<std::unique_ptr<char[]>> m_Chunks;
+  std::size_t m_ChunkFree = 0;
+  char *m_ChunkNext = nullptr;
+  std::vector<std::string_view> m_Texts;
+  std::vector<Slot> m_Slots; // open addressing, a power of two long
   std::unordered_map<Lum_NetlistName, std::uint32_t> m_Modules;
 };

@@ -2,35 +2,134 @@
 
 #include "Lum_ExceptionInvalidFormat.h"
 
+#include <algorithm>
+#include <cstring>
+#include <stdexcept>
 #include <utility>
 
 Lum_NetlistSpan Lum_NetlistModule::AddBits(std::vector<Lum_NetlistBit> const &more) {
+  return AddBits(more.data(), static_cast<std::uint32_t>(more.size()));
+}
+
+Lum_NetlistSpan Lum_NetlistModule::AddBits(Lum_NetlistBit const *more, std::uint32_t count) {
   Lum_NetlistSpan span;
   span.first = static_cast<std::uint32_t>(bits.size());
-  span.width = static_cast<std::uint32_t>(more.size());
-  bits.insert(bits.end(), more.begin(), more.end());
+  span.width = count;
+  bits.insert(bits.end(), more, more + count);
   return span;
 }
 
 Lum_Netlist::Lum_Netlist() { Intern(""); }
-Lum_Netlist::Lum_Netlist(Lum_Netlist &&) noexcept = default;
-Lum_Netlist &Lum_Netlist::operator=(Lum_Netlist &&) noexcept = default;
+Lum_Netlist::Lum_Netlist(Lum_Netlist &&other) noexcept { *this = std::move(other); }
+
+// The texts' chunks move with their views; the other netlist is left empty
+// (without even ""), so that it can never write into chunks it gave away.
+Lum_Netlist &Lum_Netlist::operator=(Lum_Netlist &&other) noexcept {
+  if (this == &other)
+    return *this;
+  modules = std::move(other.modules);
+  path = std::move(other.path);
+  fromJson = other.fromJson;
+  m_Chunks = std::move(other.m_Chunks);
+  m_ChunkFree = std::exchange(other.m_ChunkFree, 0);
+  m_ChunkNext = std::exchange(other.m_ChunkNext, nullptr);
+  m_Texts = std::move(other.m_Texts);
+  m_Slots = std::move(other.m_Slots);
+  m_Modules = std::move(other.m_Modules);
+  other.modules.clear();
+  other.m_Chunks.clear();
+  other.m_Texts.clear();
+  other.m_Slots.clear();
+  other.m_Modules.clear();
+  return *this;
+}
 Lum_Netlist::~Lum_Netlist() = default;
 
+namespace {
+
+constexpr std::size_t kChunk = 1 << 16;
+
+// Eight bytes at a time, each word mixed in by a multiply: names run to
+// tens of characters, and this needs no call.
+std::uint32_t HashOf(std::string_view text) {
+  std::uint64_t hash = 0x9E3779B97F4A7C15ULL ^ text.size();
+  std::size_t at = 0;
+  for (; at + 8 <= text.size(); at += 8) {
+    std::uint64_t word = 0;
+    std::memcpy(&word, text.data() + at, 8);
+    hash = (hash ^ word) * 0xFF51AFD7ED558CCDULL;
+    hash ^= hash >> 32;
+  }
+  std::uint64_t tail = 0;
+  if (at < text.size()) // (an empty view may have no data)
+    std::memcpy(&tail, text.data() + at, text.size() - at);
+  hash = (hash ^ tail) * 0xC4CEB9FE1A85EC53ULL;
+  hash ^= hash >> 29;
+  return static_cast<std::uint32_t>(hash ^ (hash >> 32));
+}
+
+} // namespace
+
+std::string_view Lum_Netlist::Store(std::string_view text) {
+  std::size_t const size = text.size() + 1;
+  if (size > m_ChunkFree) {
+    // A text longer than a chunk has one of its own.
+    std::size_t const chunk = std::max(size, kChunk);
+    m_Chunks.push_back(std::make_unique<char[]>(chunk));
+    m_ChunkNext = m_Chunks.back().get();
+    m_ChunkFree = chunk;
+  }
+  char *const stored = m_ChunkNext;
+  if (!text.empty())
+    std::memcpy(stored, text.data(), text.size());
+  stored[text.size()] = '\0';
+  m_ChunkNext += size;
+  m_ChunkFree -= size;
+  return std::string_view(stored, text.size());
+}
+
+// The slot of the text, or the empty slot where it would go.
+std::size_t Lum_Netlist::Probe(std::string_view text, std::uint32_t hash) const {
+  std::size_t const mask = m_Slots.size() - 1;
+  for (std::size_t at = hash & mask;; at = (at + 1) & mask) {
+    Slot const &slot = m_Slots[at];
+    if (slot.id == kNone || (slot.hash == hash && m_Texts[slot.id] == text))
+      return at;
+  }
+}
+
 Lum_NetlistName Lum_Netlist::Intern(std::string_view text) {
-  auto const found = m_Ids.find(text);
-  if (found != m_Ids.end())
-    return found->second;
+  std::uint32_t const hash = HashOf(text);
+  if (!m_Slots.empty()) {
+    std::size_t const at = Probe(text, hash);
+    if (m_Slots[at].id != kNone)
+      return m_Slots[at].id;
+  }
+  if (m_Texts.size() >= kNone - 1)
+    throw std::length_error("more than 2^32 - 2 distinct names in a netlist");
+  // At most half full: probes stay short.
+  if (2 * (m_Texts.size() + 1) > m_Slots.size()) {
+    std::vector<Slot> old(std::max<std::size_t>(64, 2 * m_Slots.size()));
+    old.swap(m_Slots);
+    std::size_t const mask = m_Slots.size() - 1;
+    for (Slot const &slot : old)
+      if (slot.id != kNone) {
+        std::size_t at = slot.hash & mask;
+        while (m_Slots[at].id != kNone)
+          at = (at + 1) & mask;
+        m_Slots[at] = slot;
+      }
+  }
   auto const id = static_cast<Lum_NetlistName>(m_Texts.size());
-  m_Texts.emplace_back(text);
-  // The deque never moves its strings, so the key can view the stored copy.
-  m_Ids.emplace(std::string_view(m_Texts.back()), id);
+  m_Texts.push_back(Store(text));
+  m_Slots[Probe(text, hash)] = {id, hash};
   return id;
 }
 
 Lum_NetlistName Lum_Netlist::Find(std::string_view text) const {
-  auto const found = m_Ids.find(text);
-  return found == m_Ids.end() ? kNone : found->second;
+  if (m_Slots.empty())
+    return kNone;
+  return m_Slots[Probe(text, HashOf(text))].id;
 }
 
 std::uint32_t Lum_Netlist::FindModule(Lum_NetlistName name) const {

@@ -13,10 +13,12 @@
 #include "Orb_Property.h"
 
 #include <algorithm>
+#include <charconv>
 #include <cstring>
 #include <deque>
 #include <map>
 #include <set>
+#include <stdexcept>
 #include <unordered_map>
 #include <unordered_set>
 
@@ -50,6 +52,49 @@ std::vector<Lum_NetlistVector> DeclaredPorts(Lum_Netlist &netlist, Orb_Block con
   }
   return ports;
 }
+
+// The bit of each signal of a module: open addressing over a power-of-two
+// table, as every connection of every cell looks its signal up.
+class SignalBits {
+public:
+  explicit SignalBits(std::size_t count) {
+    std::size_t size = 16;
+    while (size < 2 * count)
+      size *= 2;
+    m_Slots.assign(size, Slot());
+  }
+
+  void Add(Orb_Signal const *signal, Lum_NetlistBit bit) {
+    std::size_t at = Start(signal);
+    while (m_Slots[at].signal && m_Slots[at].signal != signal)
+      at = (at + 1) & (m_Slots.size() - 1);
+    m_Slots[at] = {signal, bit};
+  }
+
+  // The bit of a signal of the module (each was added first).
+  Lum_NetlistBit At(Orb_Signal const *signal) const {
+    std::size_t at = Start(signal);
+    while (m_Slots[at].signal != signal) {
+      if (!m_Slots[at].signal)
+        throw std::out_of_range("a signal of another block");
+      at = (at + 1) & (m_Slots.size() - 1);
+    }
+    return m_Slots[at].bit;
+  }
+
+private:
+  struct Slot {
+    Orb_Signal const *signal = nullptr;
+    Lum_NetlistBit bit = 0;
+  };
+
+  std::size_t Start(Orb_Signal const *signal) const {
+    auto const key = static_cast<std::uint64_t>(reinterpret_cast<std::uintptr_t>(signal));
+    return static_cast<std::size_t>((key * 0x9E3779B97F4A7C15ULL) >> 32) & (m_Slots.size() - 1);
+  }
+
+  std::vector<Slot> m_Slots;
+};
 
 class Exporter {
 public:
@@ -106,24 +151,32 @@ private:
     Lum_NetlistModule &module = m_Netlist.modules[index];
     module.top = isTop;
     Orb_Block const *block = pending.block->GetOrbBlock();
-    std::unordered_map<Orb_Signal const *, Lum_NetlistBit> bits;
-    bits.reserve(block->GetSignals().size());
+    SignalBits bits(block->GetSignals().size());
     // Net names: declared ones first, in their order, then the signals that
-    // carry no name under their own.
+    // carry no name under their own. The bits of net n are
+    // netBits[netStart[n], netStart[n] + width); m_NetOf gives a net by the
+    // id of its name (reset below for the next module).
     std::vector<Lum_NetlistVector> nets;
-    // Keys view names the host keeps (property and signal names).
-    std::unordered_map<std::string_view, std::size_t> netIndex;
-    std::vector<std::vector<Lum_NetlistBit>> netBits;
+    std::vector<std::size_t> netStart;
+    std::vector<Lum_NetlistBit> netBits;
+    auto addNet = [&](Lum_NetlistVector const &net) {
+      if (m_NetOf.size() <= net.name)
+        m_NetOf.resize(net.name + 1, Lum_Netlist::kNone);
+      if (m_NetOf[net.name] != Lum_Netlist::kNone)
+        return false;
+      m_NetOf[net.name] = static_cast<std::uint32_t>(nets.size());
+      nets.push_back(net);
+      netStart.push_back(netBits.size());
+      netBits.resize(netBits.size() + net.bits.width, Lum_Netlist::kNone);
+      return true;
+    };
     if (Orb_Property const *list = pending.meta->GetPropertyByName(kNetNames))
       for (auto const &member : list->GetMembers()) {
         Lum_NetlistVector net;
         if (!Lum_NetlistNames::ParseMeta(member->GetValue(), false, net))
           continue;
         net.name = m_Netlist.Intern(member->GetName());
-        if (!netIndex.emplace(member->GetName(), nets.size()).second)
-          continue;
-        nets.push_back(net);
-        netBits.emplace_back(net.bits.width, Lum_Netlist::kNone);
+        addNet(net);
       }
     for (Orb_Signal const *signal : block->GetSignals()) {
       Lum_NetlistBit bit = 0;
@@ -137,20 +190,24 @@ private:
                                 : Lum_NetlistBits::kFloating;
       else
         bit = Fresh(module);
-      bits.emplace(signal, bit);
+      bits.Add(signal, bit);
       Orb_Property const *names = signal->GetPropertyByName(kNames);
       bool named = false;
       if (names)
         for (std::string const &entry : names->GetStrings()) {
+          // "<position> <net name>"
           std::size_t const blank = entry.find(' ');
           if (blank == std::string::npos)
             continue;
-          auto const found = netIndex.find(std::string_view(entry).substr(blank + 1));
-          std::uint32_t const position =
-              static_cast<std::uint32_t>(std::strtoul(entry.c_str(), nullptr, 10));
-          if (found == netIndex.end() || position >= netBits[found->second].size())
+          Lum_NetlistName const id = m_Netlist.Find(std::string_view(entry).substr(blank + 1));
+          std::uint32_t const net =
+              id < m_NetOf.size() ? m_NetOf[id] : static_cast<std::uint32_t>(Lum_Netlist::kNone);
+          std::uint32_t position = 0;
+          auto const parsed = std::from_chars(entry.data(), entry.data() + blank, position);
+          if (net == Lum_Netlist::kNone || parsed.ec != std::errc() ||
+              parsed.ptr != entry.data() + blank || position >= nets[net].bits.width)
             continue;
-          netBits[found->second][position] = bit;
+          netBits[netStart[net] + position] = bit;
           named = true;
         }
       if (!named && constant.empty()) {
@@ -159,10 +216,8 @@ private:
         net.name = m_Netlist.Intern(name);
         net.hidden = !name.empty() && name[0] == '$';
         net.bits.width = 1;
-        if (!netIndex.emplace(name, nets.size()).second)
-          continue;
-        nets.push_back(net);
-        netBits.emplace_back(1, bit);
+        if (addNet(net))
+          netBits.back() = bit;
       }
     }
     // Ports: declared ones, or one per pin.
@@ -181,21 +236,52 @@ private:
         Orb_Pin const *pin = block->GetPinByName(
             Lum_NetlistNames::BitName(m_Netlist.Text(port.name), port, p).c_str());
         Orb_Signal const *inner = pin ? pin->GetInnerSignal() : nullptr;
-        portBits[p] = inner ? bits.at(inner) : Fresh(module);
+        portBits[p] = inner ? bits.At(inner) : Fresh(module);
       }
       port.bits = module.AddBits(portBits);
       module.ports.push_back(port);
     }
+    for (Lum_NetlistBit &bit : netBits)
+      if (bit == Lum_Netlist::kNone)
+        bit = Fresh(module);
     for (std::size_t n = 0; n < nets.size(); ++n) {
-      for (Lum_NetlistBit &bit : netBits[n])
-        if (bit == Lum_Netlist::kNone)
-          bit = Fresh(module);
-      nets[n].bits = module.AddBits(netBits[n]);
+      nets[n].bits = module.AddBits(netBits.data() + netStart[n], nets[n].bits.width);
       module.netNames.push_back(nets[n]);
+      m_NetOf[nets[n].name] = Lum_Netlist::kNone;
     }
     std::size_t const children = pending.block->GetBlocks().size();
     for (std::size_t i = 0; i < children; ++i)
       AddCell(module, pending.block->GetBlock(i), bits);
+  }
+
+  // Where a pin goes: its port (interned) and its index in the port.
+  struct PinPlace {
+    Lum_TlmPin const *typePin = nullptr;
+    Lum_NetlistName port = 0;
+    std::int64_t index = 0;
+  };
+
+  PinPlace PlaceOf(std::string_view name) {
+    auto const [base, index] = Lum_NetlistNames::SplitBitName(name);
+    PinPlace place;
+    place.port = m_Netlist.Intern(base);
+    place.index = index;
+    return place;
+  }
+
+  // The places of a type block's pins, in its order, worked out once.
+  std::vector<PinPlace> const &Places(Lum_TlmBlock const *typeBlock) {
+    static std::vector<PinPlace> const none;
+    if (!typeBlock)
+      return none;
+    auto const [found, isNew] = m_Places.try_emplace(typeBlock);
+    if (isNew)
+      for (std::size_t i = 0; i < typeBlock->GetPins().size(); ++i) {
+        Lum_TlmPin const *typePin = typeBlock->GetPin(i);
+        found->second.push_back(PlaceOf(typePin->GetName()));
+        found->second.back().typePin = typePin;
+      }
+    return found->second;
   }
 
   std::vector<Lum_NetlistVector> const &Declared(Orb_Block const *definition) {
@@ -205,8 +291,7 @@ private:
     return m_Declared[definition] = DeclaredPorts(m_Netlist, definition);
   }
 
-  void AddCell(Lum_NetlistModule &module, Lum_TdmBlock *child,
-               std::unordered_map<Orb_Signal const *, Lum_NetlistBit> const &bits) {
+  void AddCell(Lum_NetlistModule &module, Lum_TdmBlock *child, SignalBits const &bits) {
     auto const [type, definition] = CellType(child);
     if (definition && m_Defined.insert(type).second)
       m_Queue.push_back({child, definition, type});
@@ -220,24 +305,32 @@ private:
     std::vector<Lum_NetlistVector> const &declared = !definition ? none : Declared(definition);
     // m_Ports[0, used) are this cell's ports; the rest keep their capacity.
     std::size_t used = 0;
-    for (std::size_t i = 0; i < child->GetPins().size(); ++i) {
+    std::size_t const count = child->GetPins().size();
+    std::vector<PinPlace> const &places = Places(child->GetTypeBlock());
+    for (std::size_t i = 0; i < count; ++i) {
       // A typed pin stands for its type pin, whatever its own name.
       Lum_TdmPin const *client = child->GetPin(i);
       Orb_Pin const *pin = client->GetOrbPin();
-      auto const [base, index] = Lum_NetlistNames::SplitBitName(
-          client->GetTypePin() ? client->GetTypePin()->GetName() : pin->GetName());
+      Lum_TlmPin const *typePin = client->GetTypePin();
+      // The pins of a cell are mostly its type block's, in its order: their
+      // ports are known. Others are worked out from their names.
+      PinPlace place;
+      if (typePin && i < places.size() && places[i].typePin == typePin)
+        place = places[i];
+      else
+        place = PlaceOf(typePin ? typePin->GetName() : pin->GetName());
       // Cells have few ports: a search is cheaper than a map.
       std::size_t at = 0;
-      while (at < used && m_Ports[at].name != base)
+      while (at < used && m_Ports[at].name != place.port)
         ++at;
       if (at == used) {
         if (used == m_Ports.size())
           m_Ports.emplace_back();
-        m_Ports[used].name = base;
+        m_Ports[used].name = place.port;
         m_Ports[used].direction = DirectionOf(pin->GetDirection());
         m_Ports[used++].pins.clear();
       }
-      m_Ports[at].pins.emplace_back(index, pin);
+      m_Ports[at].pins.emplace_back(place.index, pin);
     }
     cell.firstConnection = static_cast<std::uint32_t>(module.connections.size());
     for (std::size_t at = 0; at < used; ++at) {
@@ -249,7 +342,7 @@ private:
         continue;
       Lum_NetlistVector const *declaration = nullptr;
       for (Lum_NetlistVector const &candidate : declared)
-        if (m_Netlist.Text(candidate.name) == port.name)
+        if (candidate.name == port.name)
           declaration = &candidate;
       std::int64_t low = port.pins.front().first;
       std::int64_t high = low;
@@ -271,13 +364,13 @@ private:
         if (position < 0 || position >= width)
           continue;
         Orb_Signal const *signal = pin->GetSignal();
-        portBits[static_cast<std::size_t>(position)] = signal ? bits.at(signal) : Fresh(module);
+        portBits[static_cast<std::size_t>(position)] = signal ? bits.At(signal) : Fresh(module);
       }
       for (Lum_NetlistBit &bit : portBits)
         if (bit == Lum_Netlist::kNone)
           bit = Fresh(module);
       Lum_NetlistConnection connection;
-      connection.port = m_Netlist.Intern(port.name);
+      connection.port = port.name;
       connection.direction = port.direction;
       connection.bits = module.AddBits(portBits);
       module.connections.push_back(connection);
@@ -305,10 +398,12 @@ private:
   std::unordered_map<Lum_TlmBlock const *, std::pair<Lum_NetlistName, Orb_Block const *>>
       m_TypeNames;
   std::unordered_map<Orb_Block const *, std::vector<Lum_NetlistVector>> m_Declared;
+  std::unordered_map<Lum_TlmBlock const *, std::vector<PinPlace>> m_Places;
   std::vector<Lum_NetlistBit> m_PortBits; // reused for every connection
+  std::vector<std::uint32_t> m_NetOf;     // a module's nets by name id
   // The pins of a cell by port, reused for every cell.
   struct CellPort {
-    std::string_view name;
+    Lum_NetlistName name = 0;
     Lum_NetlistDirection direction = Lum_NetlistDirection::Unknown;
     std::vector<std::pair<std::int64_t, Orb_Pin const *>> pins;
   };

@@ -58,6 +58,7 @@ struct CellType {
   std::vector<std::pair<std::string, Orb_Pin::PIN_DIRECTION>> pins;
   // Unknown types: how many instances, and the first few.
   std::uint64_t count = 0;
+  std::uint64_t made = 0; // instances built
   std::vector<Lum_NetlistName> examples;
 };
 
@@ -118,6 +119,10 @@ public:
       topBlock->GetOrbBlock()->CreatePin(name.c_str(), direction);
     BuildContents(topBlock->GetOrbBlock(), topBlock, topModule);
     m_Summary.modules = order.size();
+    for (auto const &entry : m_Types)
+      if (entry.second.kind == CellType::kLibrary && entry.second.made)
+        m_Summary.instancesByLibrary[entry.second.typeBlock->GetLibrary()->GetLibraryName()] +=
+            entry.second.made;
     Flush();
     return view;
   }
@@ -433,19 +438,36 @@ private:
     return signal;
   }
 
-  // The signal of a bit, made on first use under a unique name.
-  Orb_Signal *Signal(Orb_Block *block, std::vector<Orb_Signal *> &signals, Lum_NetlistBit bit,
-                     std::string const &name) {
-    if (Lum_NetlistBits::IsConstant(bit))
-      return ConstantSignal(block, bit);
-    if (signals[bit])
-      return signals[bit];
-    m_Name = name;
+  // The signal of a bit when it is made already (a constant's is made on
+  // first use), else null.
+  Orb_Signal *Made(Orb_Block *block, std::vector<Orb_Signal *> const &signals, Lum_NetlistBit bit) {
+    return Lum_NetlistBits::IsConstant(bit) ? ConstantSignal(block, bit) : signals[bit];
+  }
+
+  // The signal of a bit, made on first use under m_Name (or, when a signal
+  // has that name already, a unique variant of it).
+  Orb_Signal *Signal(Orb_Block *block, std::vector<Orb_Signal *> &signals, Lum_NetlistBit bit) {
+    if (Orb_Signal *made = Made(block, signals, bit))
+      return made;
     if (block->GetSignalByName(m_Name.c_str()))
-      m_Name += "$" + std::to_string(bit);
+      AppendNumber(m_Name.append(1, '$'), bit);
     signals[bit] = block->CreateSignal(m_Name.c_str());
     ++m_Summary.nets;
     return signals[bit];
+  }
+
+  static std::string &AppendNumber(std::string &text, std::int64_t number) {
+    char digits[24];
+    char const *end = std::to_chars(digits, digits + sizeof digits, number).ptr;
+    return text.append(digits, static_cast<std::size_t>(end - digits));
+  }
+
+  // m_Name becomes the name of bit `position` of the vector.
+  void NameBit(std::string_view name, Lum_NetlistVector const &vector, std::uint32_t position) {
+    m_Name.assign(name);
+    if (vector.bits.width == 1 && vector.offset == 0 && !vector.upto)
+      return;
+    AppendNumber(m_Name.append(1, '['), vector.IndexOf(position)).append(1, ']');
   }
 
   void BuildContents(Orb_Block *block, Lum_TdmBlock *client, Lum_NetlistModule const &module) {
@@ -459,10 +481,11 @@ private:
         Lum_NetlistBit const *bits = module.Bits(net.bits);
         for (std::uint32_t p = 0; p < net.bits.width; ++p) {
           // The name is made only for a signal still to make.
-          bool const made = Lum_NetlistBits::IsConstant(bits[p]) || signals[bits[p]];
-          Orb_Signal *signal =
-              Signal(block, signals, bits[p],
-                     made ? std::string() : Lum_NetlistNames::BitName(name, net, p));
+          Orb_Signal *signal = Made(block, signals, bits[p]);
+          if (!signal) {
+            NameBit(name, net, p);
+            signal = Signal(block, signals, bits[p]);
+          }
           Orb_Property *names = signal->GetPropertyByName(kNames);
           if (!names)
             names = signal->CreatePropertyStringList(kNames);
@@ -481,13 +504,17 @@ private:
     auto const pins = block->GetPins();
     for (Lum_NetlistVector const &port : module.ports) {
       Lum_NetlistBit const *bits = module.Bits(port.bits);
-      for (std::uint32_t p = 0; p < port.bits.width; ++p, ++pin)
-        pins[pin]->ConnectInner(
-            Signal(block, signals, bits[p],
-                   Lum_NetlistNames::BitName(m_Netlist.Text(port.name), port, p)));
+      for (std::uint32_t p = 0; p < port.bits.width; ++p, ++pin) {
+        Orb_Signal *signal = Made(block, signals, bits[p]);
+        if (!signal) {
+          NameBit(m_Netlist.Text(port.name), port, p);
+          signal = Signal(block, signals, bits[p]);
+        }
+        pins[pin]->ConnectInner(signal);
+      }
     }
     for (Lum_NetlistCell const &cell : module.cells) {
-      CellType const &type = m_Types.at(cell.type);
+      CellType &type = m_Types.at(cell.type);
       Orb_Block *child = MakeChild(block, client, type, cell);
       AddParameters(child, module, cell);
       auto const childPins = child->GetPins();
@@ -497,9 +524,11 @@ private:
         Lum_NetlistBit const *bits = module.Bits(connection.bits);
         for (std::uint32_t p = 0; p < connection.bits.width; ++p) {
           Lum_NetlistBit const bit = bits[p];
-          Orb_Signal *signal = Lum_NetlistBits::IsConstant(bit) || signals[bit]
-                                   ? Signal(block, signals, bit, std::string())
-                                   : Signal(block, signals, bit, "$n" + std::to_string(bit));
+          Orb_Signal *signal = Made(block, signals, bit);
+          if (!signal) {
+            AppendNumber(m_Name.assign("$n"), bit);
+            signal = Signal(block, signals, bit);
+          }
           childPins[port->pins[p]]->Connect(signal);
         }
       }
@@ -508,11 +537,11 @@ private:
     }
   }
 
-  Orb_Block *MakeChild(Orb_Block *block, Lum_TdmBlock *client, CellType const &type,
+  Orb_Block *MakeChild(Orb_Block *block, Lum_TdmBlock *client, CellType &type,
                        Lum_NetlistCell const &cell) {
     char const *name = m_Netlist.CText(cell.name);
     if (type.kind == CellType::kLibrary)
-      ++m_Summary.instancesByLibrary[type.typeBlock->GetLibrary()->GetLibraryName()];
+      ++type.made;
     else if (type.kind == CellType::kModule)
       ++m_Summary.moduleInstances;
     else

@@ -24,6 +24,10 @@ public:
   JsonNetlistReader(std::string const &path) { m_Netlist.path = path; }
 
   Lum_Netlist Run(simdjson::padded_string_view text) {
+    // Bit numbers below a quarter of the text's length (or a floor) are
+    // looked up in a table of 4-byte ids, which so stays no larger than the
+    // text; a file numbers its bits densely, so larger numbers are rare.
+    m_DenseLimit = std::max<std::size_t>(text.size() / 4, 1 << 16);
     try {
       od::document document = m_Parser.iterate(text);
       od::object root = Object(document.get_value());
@@ -126,7 +130,11 @@ private:
   }
 
   void ReadModule(Lum_NetlistModule &module, od::object object) {
-    m_Ids.clear();
+    for (std::size_t id = Lum_NetlistBits::kFirstNet; id < m_Numbers.size(); ++id)
+      if (m_Numbers[id] < m_DenseLimit)
+        m_Dense[m_Numbers[id]] = Lum_Netlist::kNone;
+    m_Sparse.clear();
+    m_Numbers.assign(Lum_NetlistBits::kFirstNet, 0);
     m_Declared.assign(Lum_NetlistBits::kFirstNet, true);
     for (od::field field : object) {
       std::string_view const key = field.unescaped_key();
@@ -180,16 +188,7 @@ private:
     for (od::value bit : value.get_array()) {
       Lum_NetlistBit id = 0;
       if (bit.type() == od::json_type::number) {
-        std::uint64_t const number = bit.get_uint64();
-        // try_emplace makes no node for a bit seen before (emplace would).
-        auto const inserted =
-            m_Ids.try_emplace(number, static_cast<Lum_NetlistBit>(m_Declared.size()));
-        if (inserted.second) {
-          if (m_Declared.size() >= Lum_Netlist::kNone - 1)
-            throw Refusal{"too many bits"};
-          m_Declared.push_back(false);
-        }
-        id = inserted.first->second;
+        id = IdOf(bit.get_uint64());
         if (declare)
           m_Declared[id] = true;
       } else if (bit.type() == od::json_type::string) {
@@ -209,6 +208,28 @@ private:
     }
     span.width = static_cast<std::uint32_t>(module.bits.size()) - span.first;
     return span;
+  }
+
+  // The module's id of a bit number of the file, given on first sight.
+  Lum_NetlistBit IdOf(std::uint64_t number) {
+    Lum_NetlistBit *slot = nullptr;
+    if (number < m_DenseLimit) {
+      if (number >= m_Dense.size())
+        m_Dense.resize(std::min<std::size_t>(std::max<std::size_t>(number + 1, 2 * m_Dense.size()),
+                                             m_DenseLimit),
+                       Lum_Netlist::kNone);
+      slot = &m_Dense[number];
+    } else {
+      slot = &m_Sparse.try_emplace(number, Lum_Netlist::kNone).first->second;
+    }
+    if (*slot == Lum_Netlist::kNone) {
+      if (m_Declared.size() >= Lum_Netlist::kNone - 1)
+        throw Refusal{"too many bits"};
+      *slot = static_cast<Lum_NetlistBit>(m_Declared.size());
+      m_Declared.push_back(false);
+      m_Numbers.push_back(number);
+    }
+    return *slot;
   }
 
   static Lum_NetlistDirection Direction(std::string_view text) {
@@ -274,7 +295,8 @@ private:
     cell.firstParameter = static_cast<std::uint32_t>(module.parameters.size());
     bool sawType = false;
     // Directions may come before or after the connections.
-    std::vector<std::pair<Lum_NetlistName, Lum_NetlistDirection>> directions;
+    std::vector<std::pair<Lum_NetlistName, Lum_NetlistDirection>> &directions = m_Directions;
+    directions.clear();
     for (od::field field : object) {
       std::string_view const key = field.unescaped_key();
       Push(key);
@@ -331,10 +353,7 @@ private:
         Lum_NetlistBit const *bits = module.Bits(connection.bits);
         for (std::uint32_t i = 0; i < connection.bits.width; ++i)
           if (!m_Declared[bits[i]]) {
-            std::uint64_t number = 0;
-            for (auto const &[json, id] : m_Ids)
-              if (id == bits[i])
-                number = json;
+            std::uint64_t const number = m_Numbers[bits[i]];
             Push("cells");
             Push(m_Netlist.Text(cell.name));
             Push("connections");
@@ -348,8 +367,15 @@ private:
   Lum_Netlist m_Netlist;
   od::parser m_Parser;
   std::vector<std::string_view> m_Path;
-  std::unordered_map<std::uint64_t, Lum_NetlistBit> m_Ids;
+  // A module's bits: the id of a number (m_Dense below m_DenseLimit, else
+  // m_Sparse), the number of an id, and whether a port or net declares it.
+  std::size_t m_DenseLimit = 0;
+  std::vector<Lum_NetlistBit> m_Dense;
+  std::unordered_map<std::uint64_t, Lum_NetlistBit> m_Sparse;
+  std::vector<std::uint64_t> m_Numbers;
   std::vector<bool> m_Declared;
+  // A cell's port directions, reused from cell to cell.
+  std::vector<std::pair<Lum_NetlistName, Lum_NetlistDirection>> m_Directions;
 };
 
 } // namespace

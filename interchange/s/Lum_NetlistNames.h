@@ -108,9 +108,15 @@ inline std::string NetMeta(Lum_NetlistVector const &net) {
 // bits.width); false when the text is not one.
 inline bool ParseMeta(std::string_view text, bool port, Lum_NetlistVector &vector) {
   // The next blank-separated word of `text`, consumed.
+  // (A plain loop: find_first_of with a set costs a search per character.)
   auto word = [&text]() {
-    std::size_t const start = std::min(text.find_first_not_of(" \t"), text.size());
-    std::size_t const end = std::min(text.find_first_of(" \t", start), text.size());
+    auto blank = [](char c) { return c == ' ' || c == '\t'; };
+    std::size_t start = 0;
+    while (start < text.size() && blank(text[start]))
+      ++start;
+    std::size_t end = start;
+    while (end < text.size() && !blank(text[end]))
+      ++end;
     std::string_view const found = text.substr(start, end - start);
     text.remove_prefix(end);
     return found;

@@ -13,6 +13,7 @@
 #include <deque>
 #include <fcntl.h>
 #include <fstream>
+#include <memory>
 #include <sstream>
 #include <type_traits>
 #include <unistd.h>
@@ -22,23 +23,33 @@
 namespace {
 
 // Text for a stream, gathered in a buffer and handed over in large pieces:
-// an insertion into a std::ostream costs far more than an append.
+// an insertion into a std::ostream, or even an append to a std::string,
+// costs far more than a copy into a buffer that is known to have room.
 class Buffered {
 public:
-  explicit Buffered(std::ostream &out) : m_Out(out) { m_Text.reserve(kChunk + 1024); }
+  explicit Buffered(std::ostream &out) : m_Out(out), m_Text(new char[kSize]) {}
   Buffered(Buffered const &) = delete;
   Buffered &operator=(Buffered const &) = delete;
   ~Buffered() { Flush(); }
 
   Buffered &operator<<(std::string_view text) {
-    m_Text.append(text);
-    if (m_Text.size() >= kChunk)
+    if (text.size() > kSize - m_Used) {
       Flush();
+      if (text.size() > kSize) {
+        m_Out.write(text.data(), static_cast<std::streamsize>(text.size()));
+        return *this;
+      }
+    }
+    if (!text.empty()) // (an empty view may have no data)
+      std::memcpy(m_Text.get() + m_Used, text.data(), text.size());
+    m_Used += text.size();
     return *this;
   }
   Buffered &operator<<(char const *text) { return *this << std::string_view(text); }
   Buffered &operator<<(char c) {
-    m_Text.push_back(c);
+    if (m_Used == kSize)
+      Flush();
+    m_Text[m_Used++] = c;
     return *this;
   }
   template <typename Integer, typename = std::enable_if_t<std::is_integral_v<Integer> &&
@@ -51,14 +62,15 @@ public:
   }
 
   void Flush() {
-    m_Out.write(m_Text.data(), static_cast<std::streamsize>(m_Text.size()));
-    m_Text.clear();
+    m_Out.write(m_Text.get(), static_cast<std::streamsize>(m_Used));
+    m_Used = 0;
   }
 
 private:
-  static constexpr std::size_t kChunk = 1 << 16;
+  static constexpr std::size_t kSize = 1 << 16;
   std::ostream &m_Out;
-  std::string m_Text;
+  std::unique_ptr<char[]> m_Text;
+  std::size_t m_Used = 0;
 };
 
 // ---------------------------------------------------------------------------
@@ -212,15 +224,19 @@ private:
     // Verilog cannot tell apart).
     if (name.size() > 1 && name[0] == '\\' && name[1] == '$')
       name.remove_prefix(1);
-    bool plain =
-        !name.empty() && (std::isalpha(static_cast<unsigned char>(name[0])) || name[0] == '_');
+    // ASCII classes, checked inline: a call per character costs more than
+    // the rest of the name's writing.
+    auto letter = [](char c) { return (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z'); };
+    bool plain = !name.empty() && (letter(name[0]) || name[0] == '_');
     for (char c : name) {
-      if (std::isspace(static_cast<unsigned char>(c)) || static_cast<unsigned char>(c) < 0x20)
+      // White space: the blank, and the controls below it (tab to carriage
+      // return among them).
+      if (c == ' ' || static_cast<unsigned char>(c) < 0x20)
         throw Lum_ExceptionInvalidFormat(__FILE__, __LINE__, m_File, 0, 0,
                                          "module " + std::string(m_Netlist.Text(m_Module.name)),
                                          "the name \"" + std::string(name) +
                                              "\" holds white space, which Verilog cannot carry");
-      plain = plain && (std::isalnum(static_cast<unsigned char>(c)) || c == '_' || c == '$');
+      plain = plain && (letter(c) || (c >= '0' && c <= '9') || c == '_' || c == '$');
     }
     if (plain && !IsKeyword(name)) {
       text += name;

@@ -12,10 +12,12 @@
 #include "Lum_NetlistWriter.h"
 #include "Lum_TdmBlock.h"
 #include "Lum_TdmModel.h"
+#include "Lum_TdmPin.h"
 #include "Lum_TdmView.h"
 
 #include "../Lum_TdmTestSupport.h"
 
+#include "Lum_Tlm.h"
 #include "Orb_Model.h"
 #include "Orb_Property.h"
 
@@ -189,6 +191,31 @@ TEST_F(NetlistImport, ExportedJsonAndVerilogReadBackAsTheSameNetlist) {
   std::sort(original.begin(), original.end());
   EXPECT_TRUE(original == fromVerilog) << nltest::Difference(original, fromVerilog) << "\n--\n"
                                        << nltest::Difference(fromVerilog, original);
+}
+
+TEST_F(NetlistImport, ExportFollowsTypePinsWhateverThePinsOrderAndNames) {
+  Lum_Netlist const netlist =
+      Lum_NetlistVerilogReader::ReadText("module top(input a, input b, output y, output z);\n"
+                                         "  NAND2 u1 (.A(a), .B(b), .Y(y));\nendmodule\n",
+                                         "top.v");
+  Lum_TdmView *view = Import(netlist);
+  Lum_TdmBlock *top = view->GetBlock();
+  Lum_TlmBlock const *nand = top->GetBlockByName("u1")->GetTypeBlock();
+  // A second instance with its pins in another order than its type block's,
+  // the output's pin named otherwise (as a pin map leaves it).
+  Lum_TdmBlock *u2 = top->CreateTypedBlock("u2", nand, false, false);
+  struct Pin {
+    char const *name, *typePin, *net;
+  };
+  for (Pin const &pin : {Pin{"OUT", "Y", "z"}, Pin{"B", "B", "a"}, Pin{"A", "A", "b"}}) {
+    Lum_TdmPin *made = u2->CreatePin(pin.name, nand->GetPinByName(pin.typePin)->GetDirection());
+    made->SetTypePin(nand->GetPinByName(pin.typePin));
+    made->GetOrbPin()->Connect(top->GetOrbBlock()->GetSignalByName(pin.net));
+  }
+  std::ostringstream verilog;
+  Lum_NetlistWriter::WriteVerilog(Lum_NetlistExporter::Export(*view), verilog);
+  EXPECT_THAT(verilog.str(), HasSubstr("NAND2 u1 (\n    .A(a),\n    .B(b),\n    .Y(y)\n  );"));
+  EXPECT_THAT(verilog.str(), HasSubstr("NAND2 u2 (\n    .Y(z),\n    .B(a),\n    .A(b)\n  );"));
 }
 
 TEST_F(NetlistImport, UnknownCellsAreListedAllAtOnceOrKeptUntyped) {
@@ -531,6 +558,61 @@ TEST(NetlistJson, ReadsAndWritesTheFieldsThatCarryMeaning) {
   EXPECT_THAT(out.str(), HasSubstr("\"EMPTY\": \" \""));
   EXPECT_TRUE(nltest::Canonical(Lum_NetlistJsonReader::ReadText(out.str(), "again.json")) ==
               nltest::Canonical(netlist));
+}
+
+// Names are kept once each, whatever their length, and survive a move; the
+// netlist moved from is empty and can take new names of its own.
+TEST(NetlistNames, AreInternedOnceAndSurviveAMove) {
+  Lum_Netlist netlist;
+  std::vector<std::string> texts = {"", "A", std::string(100000, 'x'), "a\0b"};
+  for (int i = 0; i < 5000; ++i)
+    texts.push_back("c" + std::to_string(i) + "/$abc$" + std::to_string(7 * i));
+  std::vector<Lum_NetlistName> ids;
+  for (std::string const &text : texts)
+    ids.push_back(netlist.Intern(text));
+  EXPECT_EQ(ids[0], 0U);
+  for (std::size_t i = 0; i < texts.size(); ++i) {
+    EXPECT_EQ(netlist.Intern(texts[i]), ids[i]);
+    EXPECT_EQ(netlist.Find(texts[i]), ids[i]);
+  }
+  EXPECT_EQ(netlist.Find("c5000/$abc$0"), Lum_Netlist::kNone);
+  Lum_Netlist moved(std::move(netlist));
+  for (std::size_t i = 0; i < texts.size(); ++i) {
+    ASSERT_EQ(moved.Text(ids[i]), texts[i]);
+    EXPECT_EQ(moved.CText(ids[i])[texts[i].size()], '\0');
+  }
+  Lum_NetlistName const again = netlist.Intern("fresh"); // NOLINT(bugprone-use-after-move)
+  EXPECT_EQ(netlist.Text(again), "fresh");
+  EXPECT_EQ(moved.Find("fresh"), Lum_Netlist::kNone);
+}
+
+// Bit numbers belong to their module: the same numbers in the next module
+// are other bits, and numbers far beyond the text's length read alike.
+TEST(NetlistJson, NumbersBitsPerModuleWhateverTheirSize) {
+  char const text[] = R"({"modules": {
+    "a": {"ports": {"x": {"direction": "input", "bits": [1000000000000, 7]}},
+          "cells": {"g": {"type": "INV", "connections": {"A": [7], "Y": [1000000000000]}}}},
+    "b": {"ports": {"y": {"direction": "output", "bits": [7, 5]}},
+          "cells": {"h": {"type": "INV", "connections": {"A": [5], "Y": [7]}}}}}})";
+  Lum_Netlist const netlist = Lum_NetlistJsonReader::ReadText(text, "bits.json");
+  ASSERT_EQ(netlist.modules.size(), 2U);
+  for (Lum_NetlistModule const &module : netlist.modules) {
+    Lum_NetlistBit const *port = module.Bits(module.ports[0].bits);
+    EXPECT_EQ(module.numBits, Lum_NetlistBits::kFirstNet + 2);
+    EXPECT_NE(port[0], port[1]);
+    EXPECT_EQ(module.Bits(module.connections[0].bits)[0], port[1]) << netlist.Text(module.name);
+    EXPECT_EQ(module.Bits(module.connections[1].bits)[0], port[0]) << netlist.Text(module.name);
+  }
+  try {
+    Lum_NetlistJsonReader::ReadText(
+        R"({"modules": {"c": {"ports": {"p": {"direction": "input", "bits": [3]}},
+            "cells": {"k": {"type": "INV", "connections": {"A": [3, 99999999999]}}}}}})",
+        "undeclared.json");
+    ADD_FAILURE() << "read a bit no port or net declares";
+  } catch (Lum_ExceptionInvalidFormat const &e) {
+    EXPECT_THAT(e.GetMessage(), HasSubstr("modules.c.cells.k.connections.A: bit 99999999999 is "
+                                          "declared by no port"));
+  }
 }
 
 } // namespace

@@ -19,6 +19,7 @@
 #include <vector>
 
 using lumtest::FileBytes;
+using ::testing::ContainsRegex;
 using ::testing::HasSubstr;
 using ::testing::Not;
 
@@ -78,6 +79,20 @@ TEST_F(TdmNetlist, ImportsTheRealDesignWhichThenChecksClean) {
   ToolRun const check = Tdm({"check", "--lib-path", s_Dir->Path(), File("serv.odb")});
   EXPECT_EQ(check.code, 0) << check.out << check.err;
   EXPECT_THAT(check.out, HasSubstr("no problems"));
+}
+
+TEST_F(TdmNetlist, ExportTimesItsPhasesOnlyWhenAsked) {
+  ASSERT_EQ(s_Imported.code, 0) << s_Imported.err;
+  std::vector<std::string> command = {"export",         "--lib-path", s_Dir->Path(),
+                                      File("serv.odb"), "--format",   "json"};
+  ToolRun const plain = Tdm(command);
+  command.push_back("--time");
+  ToolRun const timed = Tdm(command);
+  ASSERT_EQ(timed.code, 0) << timed.err;
+  EXPECT_EQ(timed.out, plain.out);
+  EXPECT_EQ(plain.err, "");
+  EXPECT_THAT(timed.err, ContainsRegex("^tdm export: open [0-9.]+ s, export [0-9.]+ s, write "
+                                       "[0-9.]+ s, close [0-9.]+ s \\(CPU\\)\n$"));
 }
 
 TEST_F(TdmNetlist, RebindSwapsEveryMatchingBlockAndTheExportShowsIt) {

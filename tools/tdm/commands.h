@@ -66,6 +66,7 @@ struct ExportOptions {
   std::string view;   // empty: the only view
   // Every view, one file each in the folder `output`.
   bool allViews = false;
+  bool time = false; // print the CPU seconds of each phase on standard error
 };
 int RunExport(std::string const &path, ExportOptions const &exported, CommonOptions const &options);
 

@@ -11,6 +11,8 @@
 #include "Orb_Model.h"
 #include "Port_Exception.h"
 
+#include <cstdio>
+#include <ctime>
 #include <filesystem>
 #include <iostream>
 
@@ -38,6 +40,34 @@ int ExportAll(Lum_TdmModel &model, ExportOptions const &exported, Lum_NetlistWri
   return kExitOk;
 }
 
+// The CPU seconds of each phase, for --time: benchmarks set them against
+// the same phases of other tools.
+class PhaseTimes {
+public:
+  explicit PhaseTimes(bool on) : m_On(on), m_Last(std::clock()) {}
+
+  void End(char const *phase) {
+    if (!m_On)
+      return;
+    std::clock_t const now = std::clock();
+    char text[64];
+    std::snprintf(text, sizeof text, "%s%s %.3f s", m_Text.empty() ? "" : ", ", phase,
+                  static_cast<double>(now - m_Last) / CLOCKS_PER_SEC);
+    m_Text += text;
+    m_Last = now;
+  }
+
+  void Print() const {
+    if (m_On)
+      std::cerr << "tdm export: " << m_Text << " (CPU)\n";
+  }
+
+private:
+  bool m_On;
+  std::clock_t m_Last;
+  std::string m_Text;
+};
+
 } // namespace
 
 int RunExport(std::string const &path, ExportOptions const &exported,
@@ -54,7 +84,9 @@ int RunExport(std::string const &path, ExportOptions const &exported,
   if (exported.allViews && exported.output.empty())
     throw Failure(kExitUsage, "--all-views needs -o FOLDER for the files it writes");
   ApplyLibraryPath(options);
+  PhaseTimes times(exported.time);
   std::unique_ptr<Lum_TdmModel> model = OpenTyped(path, options);
+  times.End("open");
   if (exported.allViews)
     return ExportAll(*model, exported, format, options);
   std::vector<Orb_View *> const views = SelectViews(*model, path, exported.view);
@@ -72,14 +104,17 @@ int RunExport(std::string const &path, ExportOptions const &exported,
   auto *view = static_cast<Lum_TdmView *>(model->Specialize(views.front()));
   try {
     Lum_Netlist const netlist = Lum_NetlistExporter::Export(*view);
+    times.End("export");
     if (exported.output.empty()) {
       if (format == Lum_NetlistWriter::Format::Json)
         Lum_NetlistWriter::WriteJson(netlist, std::cout);
       else
         Lum_NetlistWriter::WriteVerilog(netlist, std::cout, "standard output");
       std::cout.flush();
+      times.End("write");
     } else {
       Lum_NetlistWriter::Save(netlist, exported.output, format);
+      times.End("write");
       if (!options.quiet)
         std::cerr << "wrote " << exported.output << " (" << netlist.modules.size() << " module"
                   << (netlist.modules.size() == 1 ? "" : "s") << ")\n";
@@ -87,6 +122,9 @@ int RunExport(std::string const &path, ExportOptions const &exported,
   } catch (Port::Exception const &e) {
     throw Failure(kExitUnreadable, Describe(e) + "; nothing was written");
   }
+  model.reset();
+  times.End("close");
+  times.Print();
   return kExitOk;
 }
 

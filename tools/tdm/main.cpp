@@ -161,6 +161,8 @@ int Main(int argc, char **argv) {
   exportCommand->add_option("--view", exported.view, "The view to write")->type_name("V");
   exportCommand->add_flag("--all-views", exported.allViews,
                           "Write every view, each to OUT/<design>.<view>.json or .v");
+  exportCommand->add_flag("--time", exported.time,
+                          "Print the CPU seconds of opening, exporting, writing and closing");
 
   CLI::App *rebindCommand =
       app.add_subcommand("rebind", "Swap the cell type of every matching block, all or nothing");
