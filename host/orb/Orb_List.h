@@ -92,7 +92,7 @@ public:
   // The element at index `i` (< Size()) in host order.
   T *At(std::size_t i) const {
     if (!OnHeap())
-      return m_Items[i];
+      return i == 0 ? m_Items[0] : m_Items[1];
     Header const &h = *Head();
     if (h.start + i >= h.clean)
       Squeeze(h.start + i + 1);

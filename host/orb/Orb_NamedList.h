@@ -108,11 +108,15 @@ template <class T> T *Orb_NamedList<T>::CheckNames() {
   }
   if (m_List.Size() > Orb_NameIndex<T>::kScanLimit)
     return m_Index.RebuildChecked(2 * m_List.Size(), m_List.Range());
+  // Few: each name against those before it, each name read once.
+  std::string_view names[Orb_NameIndex<T>::kScanLimit];
   auto const items = m_List.Range();
-  for (std::size_t i = 1; i < items.size(); ++i)
+  for (std::size_t i = 0; i < items.size(); ++i) {
+    names[i] = items[i]->GetNameString();
     for (std::size_t j = 0; j < i; ++j)
-      if (items[j]->GetNameString() == items[i]->GetNameString())
+      if (names[j] == names[i])
         return items[i];
+  }
   return nullptr;
 }
 

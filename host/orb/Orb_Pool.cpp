@@ -28,7 +28,8 @@ void Orb_ObjectPool::SetSlotSize(std::size_t size, void *owner) {
 }
 
 void Orb_ObjectPool::NextPage() {
-  m_Pages.reserve(m_Pages.size() + 1);
+  if (m_Pages.size() == m_Pages.capacity())
+    m_Pages.reserve(2 * m_Pages.size() + 8);
   if (m_pPageEnd == m_pChunkEnd) {
     std::size_t const bytes = m_NextChunkPages * kPageBytes;
     m_Chunks.reserve(m_Chunks.size() + 1);

@@ -214,6 +214,10 @@ TEST_F(Orb_ModelIOTest, RefusesBrokenFiles) {
       {"B 3:top", "B 3top", "expected ':'"},
       {"B 3:top\nI", "B 9:top\nI", "expected end of record"},
       {"C 0 1 0", "C 0 1 7", "pin 7 of a view with 2 pins"},
+      // Numbers past the digits that cannot overflow read the same, or overflow.
+      {"C 0 1 0", "C 0 1 0000000000000000000000000007", "pin 7 of a view with 2 pins"},
+      {"C 0 1 0", "C 0 1 18446744073709551616", "number too large"},
+      {"C 0 1 0", "C 0 1 x", "expected a number"},
       {"C 0 1 0", "C 0 2 0 0", "pin 'p' is connected twice inside"},
       {"I 1 1:q\nE\nE\nC 0 1 0", "I 1 1:q\nS 1:t\nE\nE\nC 1 1 0",
        "connects to signal 't' of block 'c', neither its own block nor its parent"},
