@@ -76,7 +76,12 @@ protected:
 
 private:
   friend class Orb_ClientObject;
+  friend class Orb_Model;
   friend class Orb_ModelDerived;
+  // Room in each kind's table for bridge ids below `limits[kind]`, so that a
+  // load that gives every object a client grows no table step by step.
+  // Throws std::bad_alloc.
+  void ReserveBridges(unsigned const (&limits)[Orb_KindCount]);
   // Throws Orb_Exception for an object of another model or one that has a
   // client here already.
   void Register(Orb_ClientObject *client);

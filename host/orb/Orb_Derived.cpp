@@ -115,12 +115,20 @@ void Orb_Context::Register(Orb_ClientObject *client) {
   CheckOwnModel(object);
   auto &table = m_Bridge[static_cast<unsigned>(object->GetKind())];
   unsigned const id = object->GetBridgeId();
-  if (id >= table.size())
+  // A load registers in id order: one more entry each time.
+  if (id == table.size())
+    table.push_back(nullptr);
+  else if (id > table.size())
     table.resize(id + 1, nullptr);
   if (table[id])
     throw Orb_Exception(kSource, __LINE__, object->GetName(),
                         "The object already has a client in this context.");
   table[id] = client;
+}
+
+void Orb_Context::ReserveBridges(unsigned const (&limits)[Orb_KindCount]) {
+  for (unsigned k = 0; k < Orb_KindCount; ++k)
+    m_Bridge[k].reserve(limits[k]);
 }
 
 void Orb_Context::Unregister(Orb_ClientObject *client) {

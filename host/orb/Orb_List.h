@@ -72,6 +72,11 @@ private:
 
 // SlotOf: a stateless functor, `std::uint32_t &operator()(T *, void const
 // *list) const`, giving the element's slot in that list.
+//
+// Two pointers: up to two elements sit in the list itself (most signals
+// connect one or two pins, most lists of a netlist are that short); a longer
+// list keeps its counts in a header before its array, and both pointers then
+// point at that header (two equal elements never share a list).
 template <class T, class SlotOf> class Orb_List {
 public:
   Orb_List() = default;
@@ -79,168 +84,223 @@ public:
   Orb_List &operator=(Orb_List const &) = delete;
   ~Orb_List() { ReleaseRaw(); }
 
-  std::size_t Size() const { return m_Count; }
+  std::size_t Size() const {
+    if (OnHeap())
+      return Head()->count;
+    return (m_Items[0] != nullptr) + (m_Items[1] != nullptr);
+  }
   // The element at index `i` (< Size()) in host order.
   T *At(std::size_t i) const {
-    if (m_Start + i >= m_Clean)
-      Squeeze(m_Start + i + 1);
+    if (!OnHeap())
+      return i == 0 ? m_Items[0] : m_Items[1];
+    Header const &h = *Head();
+    if (h.start + i >= h.clean)
+      Squeeze(h.start + i + 1);
     // Squeezing may have moved the front.
-    return Slots()[m_Start + i];
+    return Raw()[h.start + i];
   }
   // The Size() elements in host order, holes squeezed out.
   T *const *Data() const {
-    Squeeze(m_Size);
-    return Slots() + m_Start;
+    if (!OnHeap())
+      return m_Items;
+    Squeeze(Head()->size);
+    return Raw() + Head()->start;
   }
   Orb_Range<T, SlotOf> Range() const { return Orb_Range<T, SlotOf>(*this); }
 
   // Room for `more` elements beyond what the list holds, growing
   // geometrically so that adding one at a time stays linear.
   void Reserve(std::size_t more) {
-    if (m_Size + more > m_Capacity)
-      Reallocate(std::max(m_Size + more, 2 * std::size_t(m_Capacity)));
+    if (RawSize() + more > Capacity())
+      Reallocate(std::max(RawSize() + more, 2 * Capacity()));
   }
   // Room for exactly `more` elements beyond what the list holds, for a
   // reader that knows how many follow.
   void ReserveExact(std::size_t more) {
-    if (m_Size + more > m_Capacity)
-      Reallocate(m_Size + more);
+    if (RawSize() + more > Capacity())
+      Reallocate(RawSize() + more);
   }
   // Appends. Throws std::bad_alloc and changes nothing when out of memory.
   void Add(T *item) {
-    // A first room of four saves the steps through one and two.
-    if (m_Size == m_Capacity)
-      Reallocate(m_Capacity == 0 ? 4 : 2 * std::size_t(m_Capacity));
-    std::uint32_t const slot = m_Size++;
-    Slots()[slot] = item;
+    if (!OnHeap()) {
+      std::uint32_t const slot = m_Items[0] ? 1 : 0;
+      if (!m_Items[slot]) {
+        m_Items[slot] = item;
+        SlotOf()(item, this) = slot;
+        return;
+      }
+      // A first array of four saves the step through three.
+      Reallocate(4);
+    }
+    if (Head()->size == Head()->capacity)
+      Reallocate(2 * std::size_t(Head()->capacity));
+    Header &h = *Head();
+    std::uint32_t const slot = h.size++;
+    Raw()[slot] = item;
     SlotOf()(item, this) = slot;
-    if (m_Clean == slot && m_Scan == slot)
-      m_Clean = m_Scan = slot + 1;
-    ++m_Count;
+    if (h.clean == slot && h.scan == slot)
+      h.clean = h.scan = slot + 1;
+    ++h.count;
   }
   // Removes an element of the list; O(1) amortised (see above). Never throws.
   void Remove(T *item) noexcept;
   // Forgets every element without touching them; keeps the room.
-  void Clear() noexcept { m_Size = m_Start = m_Clean = m_Scan = m_Count = 0; }
+  void Clear() noexcept {
+    if (OnHeap())
+      Head()->size = Head()->start = Head()->clean = Head()->scan = Head()->count = 0;
+    else
+      m_Items[0] = m_Items[1] = nullptr;
+  }
   // Sorts the elements with `less`, stably. A copy is sorted and put in
   // place only when the sort is done: a `less` that throws leaves the list
   // as it was.
   template <class Less> void StableSort(Less const &less) {
-    Squeeze(m_Size);
-    std::vector<T *> sorted(Slots() + m_Start, Slots() + m_Size);
+    if (!OnHeap()) {
+      if (m_Items[1] && less(m_Items[1], m_Items[0])) {
+        std::swap(m_Items[0], m_Items[1]);
+        Renumber(0);
+      }
+      return;
+    }
+    Squeeze(Head()->size);
+    std::vector<T *> sorted(Raw() + Head()->start, Raw() + Head()->size);
     std::stable_sort(sorted.begin(), sorted.end(), less);
-    std::copy(sorted.begin(), sorted.end(), Slots() + m_Start);
-    Renumber(m_Start);
+    std::copy(sorted.begin(), sorted.end(), Raw() + Head()->start);
+    Renumber(Head()->start);
   }
   // Approximate heap bytes the list holds.
-  std::size_t Bytes() const { return m_Capacity > 1 ? m_Capacity * sizeof(T *) : 0; }
+  std::size_t Bytes() const { return OnHeap() ? ArrayBytes(Head()->capacity) : 0; }
 
 private:
-  // The slots: the one kept in place while the room is one element at most
-  // (a signal with one pin needs no array), else the array.
-  T **Slots() const { return m_Capacity <= 1 ? const_cast<T **>(&m_pOne) : m_pRaw; }
-  void ReleaseRaw() noexcept {
-    if (m_Capacity > 1)
-      Orb_SmallRelease(m_pRaw, m_Capacity * sizeof(T *));
+  // The counts of a list whose elements are in an array: the array has
+  // `capacity` slots and follows the header. Slots [0, size): [0, start)
+  // holes, [start, clean) elements, no holes, [clean, scan) holes, [scan,
+  // size) elements and holes not yet squeezed. Holes are null.
+  struct alignas(T *) Header {
+    std::uint32_t capacity;
+    std::uint32_t size;
+    std::uint32_t start;
+    std::uint32_t clean;
+    std::uint32_t scan;
+    std::uint32_t count;
+  };
+  static std::size_t ArrayBytes(std::size_t capacity) {
+    return sizeof(Header) + capacity * sizeof(T *);
   }
-  // Moves the slots to room for `capacity` (>= m_Size) slots.
+  bool OnHeap() const { return m_Items[0] == m_Items[1] && m_Items[0]; }
+  Header *Head() const { return reinterpret_cast<Header *>(m_Items[0]); }
+  T **Raw() const { return reinterpret_cast<T **>(Head() + 1); }
+  // Slots in use, holes included: in the list itself there are none.
+  std::size_t RawSize() const { return OnHeap() ? Head()->size : Size(); }
+  std::size_t Capacity() const { return OnHeap() ? Head()->capacity : 2; }
+  void ReleaseRaw() noexcept {
+    if (OnHeap())
+      Orb_SmallRelease(Head(), ArrayBytes(Head()->capacity));
+  }
+  // Moves the slots to room for `capacity` (>= RawSize()) slots; the slots
+  // keep their numbers. Room for two is the list itself.
   void Reallocate(std::size_t capacity) {
     if (capacity > UINT32_MAX)
       throw std::bad_alloc();
-    if (capacity <= 1 && m_Capacity <= 1) {
-      m_Capacity = static_cast<std::uint32_t>(capacity);
+    if (capacity <= 2 && !OnHeap())
       return;
+    auto *head = static_cast<Header *>(Orb_SmallAllocate(ArrayBytes(capacity)));
+    auto **raw = reinterpret_cast<T **>(head + 1);
+    if (OnHeap()) {
+      *head = *Head();
+      std::copy(Raw(), Raw() + head->size, raw);
+      ReleaseRaw();
+    } else {
+      auto const n = static_cast<std::uint32_t>(Size());
+      *head = Header{0, n, 0, n, n, n};
+      std::copy(m_Items, m_Items + n, raw);
     }
-    auto **raw = static_cast<T **>(Orb_SmallAllocate(capacity * sizeof(T *)));
-    if (m_Size > 0)
-      std::copy(Slots(), Slots() + m_Size, raw);
-    ReleaseRaw();
-    m_pRaw = raw;
-    m_Capacity = static_cast<std::uint32_t>(capacity);
+    head->capacity = static_cast<std::uint32_t>(capacity);
+    m_Items[0] = m_Items[1] = reinterpret_cast<T *>(head);
   }
   // Moves elements down over the holes until raw index `upTo` is clean.
   void Squeeze(std::size_t upTo) const noexcept;
   void Renumber(std::uint32_t from) const noexcept {
-    for (std::uint32_t i = from; i < m_Size; ++i)
-      SlotOf()(Slots()[i], this) = i;
+    T *const *items = OnHeap() ? Raw() : m_Items;
+    for (std::uint32_t i = from, n = static_cast<std::uint32_t>(RawSize()); i < n; ++i)
+      SlotOf()(items[i], this) = i;
   }
 
-  // Slots()[0, m_Size) of m_Capacity slots: [0, m_Start) holes, [m_Start,
-  // m_Clean) elements, no holes, [m_Clean, m_Scan) holes, [m_Scan, m_Size)
-  // elements and holes not yet squeezed. Holes are null.
-  union {
-    T **m_pRaw;
-    T *m_pOne = nullptr;
-  };
-  std::uint32_t m_Capacity = 0;
-  mutable std::uint32_t m_Size = 0;
-  mutable std::uint32_t m_Start = 0;
-  mutable std::uint32_t m_Clean = 0;
-  mutable std::uint32_t m_Scan = 0;
-  std::uint32_t m_Count = 0;
+  // The elements (null where none), or twice the header of the array.
+  T *m_Items[2] = {nullptr, nullptr};
 };
 
 template <class T, class SlotOf> void Orb_List<T, SlotOf>::Remove(T *item) noexcept {
+  if (!OnHeap()) {
+    assert((m_Items[0] == item || m_Items[1] == item) && "Orb_List::Remove: not an element");
+    if (m_Items[0] == item) {
+      m_Items[0] = m_Items[1];
+      if (m_Items[0])
+        SlotOf()(m_Items[0], this) = 0;
+    }
+    m_Items[1] = nullptr;
+    return;
+  }
+  Header &h = *Head();
   std::uint32_t const p = SlotOf()(item, this);
-  T **const raw = Slots();
-  assert(p < m_Size && raw[p] == item && "Orb_List::Remove: not an element");
-  --m_Count;
+  T **const raw = Raw();
+  assert(p < h.size && raw[p] == item && "Orb_List::Remove: not an element");
+  --h.count;
   raw[p] = nullptr;
-  if (m_Count == 0) {
+  if (h.count == 0) {
     Clear();
     return;
   }
-  if (p >= m_Scan) {
+  if (p >= h.scan) {
     // In the part not yet squeezed: a hole is all it takes.
-  } else if (p == m_Start) {
-    ++m_Start;
+  } else if (p == h.start) {
+    ++h.start;
   } else {
     // Inside the clean part: the clean elements after it move up against
     // the holes already gathered, so that holes stay in one run.
-    std::uint32_t const gap = m_Scan - m_Clean;
+    std::uint32_t const gap = h.scan - h.clean;
     if (gap > 0) {
-      for (std::uint32_t j = m_Clean; j-- > p + 1;) {
+      for (std::uint32_t j = h.clean; j-- > p + 1;) {
         T *moved = raw[j];
         raw[j + gap] = moved;
         SlotOf()(moved, this) = j + gap;
       }
-      std::fill(raw + p + 1, raw + std::min(m_Clean, p + 1 + gap), nullptr);
+      std::fill(raw + p + 1, raw + std::min(h.clean, p + 1 + gap), nullptr);
     }
-    m_Clean = p;
-    m_Scan = p + 1 + gap;
+    h.clean = p;
+    h.scan = p + 1 + gap;
   }
   // Trailing holes go.
-  while (m_Size > m_Scan && !raw[m_Size - 1])
-    --m_Size;
-  if (m_Scan == m_Size)
-    m_Size = m_Scan = m_Clean;
+  while (h.size > h.scan && !raw[h.size - 1])
+    --h.size;
+  if (h.scan == h.size)
+    h.size = h.scan = h.clean;
 }
 
 template <class T, class SlotOf>
 void Orb_List<T, SlotOf>::Squeeze(std::size_t upTo) const noexcept {
-  T **const raw = Slots();
-  while (m_Clean < upTo && m_Scan < m_Size) {
-    T *item = raw[m_Scan];
+  Header &h = *Head();
+  T **const raw = Raw();
+  while (h.clean < upTo && h.scan < h.size) {
+    T *item = raw[h.scan];
     if (item) {
-      if (m_Scan != m_Clean) {
-        raw[m_Clean] = item;
-        raw[m_Scan] = nullptr;
-        SlotOf()(item, this) = m_Clean;
+      if (h.scan != h.clean) {
+        raw[h.clean] = item;
+        raw[h.scan] = nullptr;
+        SlotOf()(item, this) = h.clean;
       }
-      ++m_Clean;
+      ++h.clean;
     }
-    ++m_Scan;
+    ++h.scan;
   }
-  // Written only when it changes: the shared empty list that blocks without
-  // children read (in any thread) must stay untouched.
-  if (m_Scan == m_Size && m_Size != m_Clean)
-    m_Size = m_Scan = m_Clean;
+  if (h.scan == h.size && h.size != h.clean)
+    h.size = h.scan = h.clean;
   // Holes gathered at the front go once they are half the list.
-  if (m_Start > 0 && m_Clean == m_Size && m_Start >= m_Size / 2) {
-    std::copy(raw + m_Start, raw + m_Size, raw);
-    m_Size -= m_Start;
-    m_Start = 0;
-    m_Clean = m_Scan = m_Size;
+  if (h.start > 0 && h.clean == h.size && h.start >= h.size / 2) {
+    std::copy(raw + h.start, raw + h.size, raw);
+    h.size -= h.start;
+    h.start = 0;
+    h.clean = h.scan = h.size;
     Renumber(0);
   }
 }
@@ -256,6 +316,8 @@ void Orb_List<T, SlotOf>::Squeeze(std::size_t upTo) const noexcept {
 template <class T> class Orb_NameIndex {
 public:
   static constexpr std::size_t kScanLimit = 16;
+  // From this many items on, Build sorts them before filling the table.
+  static constexpr std::size_t kSortedFill = 4096;
 
   Orb_NameIndex() = default;
   Orb_NameIndex(Orb_NameIndex const &) = delete;
@@ -283,6 +345,9 @@ public:
   template <class Items> T *RebuildChecked(std::size_t count, Items const &items) {
     return Build(count, items, true);
   }
+  // For kSortedFill items or more: an item whose name an earlier item has,
+  // or null, building no index (one sorted pass over their hashes).
+  template <class Items> static T *FindRepeated(Items const &items);
   void Clear() noexcept {
     Free(m_pTable);
     m_pTable = nullptr;
@@ -293,8 +358,6 @@ public:
 
 private:
   static constexpr std::size_t kGroupSlots = 7;
-  // From this many items on, Build sorts them before filling the table.
-  static constexpr std::size_t kSortedFill = 4096;
   static constexpr std::uint8_t kEmpty = 0;
   static constexpr std::uint8_t kTombstone = 1;
   struct alignas(64) Group {
@@ -332,6 +395,11 @@ private:
     T *item;
   };
   static T *Fill(Table &table, Hashed const *hashed, std::size_t n, bool sorted, bool check);
+  // The items' hashes, sorted by home slot when they are many.
+  template <class Items> static std::vector<Hashed> HashAll(Items const &items);
+  // Whether item `k` of items sorted by home slot has the name of one
+  // before it.
+  static bool RepeatsEarlier(Hashed const *hashed, std::size_t k);
   static void Free(Table *table) noexcept {
     if (table)
       ::operator delete(table, std::align_val_t(alignof(Table)));
@@ -406,18 +474,16 @@ template <class T> void Orb_NameIndex<T>::Erase(T *item) noexcept {
 
 template <class T>
 template <class Items>
-T *Orb_NameIndex<T>::Build(std::size_t count, Items const &items, bool check) {
+std::vector<typename Orb_NameIndex<T>::Hashed> Orb_NameIndex<T>::HashAll(Items const &items) {
   std::size_t const n = items.size();
-  // Groups enough that `count` names fill at most 7/8 of the slots.
-  std::size_t const groups = std::max<std::size_t>(1, (8 * std::max(count, n) + 48) / 49);
   std::vector<Hashed> hashed;
   hashed.reserve(n);
   for (T *item : items)
     hashed.push_back({Hash(item->GetNameString()), item});
-  // A large table is filled in the order of the home slots, so that it is
-  // written from front to back rather than at random: the home slot grows
-  // with the hash's low 32 bits, and a stable radix sort on them (three
-  // passes of 11 bits) keeps items of one name in their given order.
+  // Many items are sorted by their home slots, so that a table is filled
+  // from front to back rather than at random: the home slot grows with the
+  // hash's low 32 bits, and a stable radix sort on them (three passes of 11
+  // bits) keeps items of one name in their given order.
   if (n >= kSortedFill) {
     std::vector<Hashed> other(n);
     for (unsigned shift = 0; shift < 33; shift += 11) {
@@ -435,6 +501,34 @@ T *Orb_NameIndex<T>::Build(std::size_t count, Items const &items, bool check) {
       hashed.swap(other);
     }
   }
+  return hashed;
+}
+
+template <class T> template <class Items> T *Orb_NameIndex<T>::FindRepeated(Items const &items) {
+  assert(items.size() >= kSortedFill && "Orb_NameIndex::FindRepeated: few items");
+  std::vector<Hashed> const hashed = HashAll(items);
+  for (std::size_t k = 1; k < hashed.size(); ++k)
+    if (RepeatsEarlier(hashed.data(), k))
+      return hashed[k].item;
+  return nullptr;
+}
+
+template <class T> bool Orb_NameIndex<T>::RepeatsEarlier(Hashed const *hashed, std::size_t k) {
+  // Items of one name share their sort key and keep their order.
+  Hashed const &h = hashed[k];
+  for (std::size_t j = k; j-- > 0 && std::uint32_t(hashed[j].hash) == std::uint32_t(h.hash);)
+    if (hashed[j].hash == h.hash && hashed[j].item->GetNameString() == h.item->GetNameString())
+      return true;
+  return false;
+}
+
+template <class T>
+template <class Items>
+T *Orb_NameIndex<T>::Build(std::size_t count, Items const &items, bool check) {
+  std::size_t const n = items.size();
+  // Groups enough that `count` names fill at most 7/8 of the slots.
+  std::size_t const groups = std::max<std::size_t>(1, (8 * std::max(count, n) + 48) / 49);
+  std::vector<Hashed> const hashed = HashAll(items);
   void *block =
       ::operator new(sizeof(Table) + groups * sizeof(Group), std::align_val_t(alignof(Table)));
   auto *table = new (block) Table{groups * kGroupSlots, groups * kGroupSlots * 7 / 8, 0, 0};
@@ -457,11 +551,8 @@ T *Orb_NameIndex<T>::Fill(Table &table, Hashed const *hashed, std::size_t n, boo
     Hashed const &h = hashed[k];
     std::size_t i = table.Home(h.hash);
     if (sorted) {
-      // Items of one name share their sort key and keep their order.
-      auto const key = std::uint32_t(h.hash);
-      for (std::size_t j = k; check && j-- > 0 && std::uint32_t(hashed[j].hash) == key;)
-        if (hashed[j].hash == h.hash && hashed[j].item->GetNameString() == h.item->GetNameString())
-          return h.item;
+      if (check && RepeatsEarlier(hashed, k))
+        return h.item;
       // Homes come in order: the slots from the last home to the cursor are
       // taken, those after it free. Past the end, probe on from the front.
       i = std::max(i, cursor);

@@ -10,9 +10,9 @@
 
 // What a million-block design pays per object; and every kind fits a pool page.
 static_assert(sizeof(void *) != 8 || sizeof(Orb_Persistent) == 24, "name, parent, slot, flags");
-static_assert(sizeof(void *) != 8 || sizeof(Orb_Pin) == 40, "base and the outer side");
-static_assert(sizeof(void *) != 8 || sizeof(Orb_Signal) == 56, "base and pin list");
-static_assert(sizeof(void *) != 8 || sizeof(Orb_Block) == 88, "base, view, pins, inside");
+static_assert(sizeof(void *) != 8 || sizeof(Orb_Pin) == 32, "base and the outer side");
+static_assert(sizeof(void *) != 8 || sizeof(Orb_Signal) == 40, "base and pin list");
+static_assert(sizeof(void *) != 8 || sizeof(Orb_Block) == 72, "base, view, pins, inside");
 #define ORB_KIND(Kind, shown)                                                                      \
   static_assert(sizeof(Orb_##Kind) <= Orb_ObjectPool::kMaxSlotSize, "Orb_" #Kind " fits a page");
 #include "Orb_Kinds.def"

@@ -158,8 +158,8 @@ struct Orb_ChildSlot {
   }
 };
 
-static_assert(sizeof(Orb_List<Orb_Pin, Orb_ChildSlot>) == 32, "a pointer and six 32-bit counts");
-static_assert(sizeof(Orb_NamedList<Orb_Pin>) == 40, "a list and the index's table pointer");
+static_assert(sizeof(Orb_List<Orb_Pin, Orb_ChildSlot>) == 16, "two elements or an array");
+static_assert(sizeof(Orb_NamedList<Orb_Pin>) == 24, "a list and the index's table pointer");
 
 // Where a pin keeps its slot in the pin list of the signal it connects to,
 // on the side that the list is of.
@@ -188,7 +188,7 @@ public:
   Orb_Block *GetParent() const;
   // The outer connection: a signal of the parent block of the pin's block, or
   // null. A top block's pin has none.
-  Orb_Signal *GetSignal() const { return m_pSignal; }
+  Orb_Signal *GetSignal() const;
   // The inner connection: a signal of the pin's own block, or null.
   Orb_Signal *GetInnerSignal() const;
   // Set the outer or the inner connection, replacing the previous one; null
@@ -215,10 +215,12 @@ private:
   Orb_PinLink *InnerLink() const;
   // In the base's last bytes.
   std::uint8_t m_Direction;
-  // The outer connection and the slot in its signal's pin list. The inner
-  // one lives in the view: most pins (those of leaf blocks) have none.
+  void SetSignal(Orb_Signal *signal);
+  // The outer connection (its signal's bridge id plus one, 0 for none) and
+  // the slot in its signal's pin list. The inner one lives in the view: most
+  // pins (those of leaf blocks) have none.
   std::uint32_t m_OuterSlot = 0;
-  Orb_Signal *m_pSignal = nullptr;
+  std::uint32_t m_SignalId = 0;
 };
 
 LUM_PLATFORM_API char const *Orb_PinDirectionName(Orb_Pin::PIN_DIRECTION direction);
@@ -528,6 +530,7 @@ private:
   friend class Orb_Block;
   friend class Orb_ModelIO;
   friend class Orb_ModelDerived;
+  friend class Orb_Pin;
 
   // While a hold is up, deleted objects leave their containers but stay in
   // memory; the last hold to go frees them. Walks that run event handlers or
@@ -605,6 +608,17 @@ private:
   // Set while an Open fires its events.
   OpenJournal *m_pOpenJournal = nullptr;
 };
+
+inline Orb_Signal *Orb_Pin::GetSignal() const {
+  if (m_SignalId == 0)
+    return nullptr;
+  auto const k = static_cast<unsigned>(Orb_Kind::Signal);
+  return static_cast<Orb_Signal *>(GetModel()->m_Pools[k].At(m_SignalId - 1));
+}
+
+inline void Orb_Pin::SetSignal(Orb_Signal *signal) {
+  m_SignalId = signal ? signal->GetBridgeId() + 1 : 0;
+}
 
 template <class T, class... Args> T *Orb_Model::Make(Args &&...args) {
   auto const k = static_cast<unsigned>(T::kKind);

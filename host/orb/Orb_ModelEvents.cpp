@@ -63,6 +63,11 @@ void Orb_Model::AnnounceLoadTree(Orb_DesignMgr *designMgr) {
   // Without subscribers no event fires and no handler runs.
   if (m_Subscribers.empty())
     return;
+  unsigned limits[Orb_KindCount];
+  for (unsigned k = 0; k < Orb_KindCount; ++k)
+    limits[k] = m_Pools[k].IdLimit();
+  for (Orb_ModelDerived *context : m_Subscribers)
+    context->ReserveBridges(limits);
   AnnounceLoad(designMgr);
   std::vector<Orb_Design *> const designs = designMgr->GetDesigns().ToVector();
   std::vector<Orb_Persistent *> objects;

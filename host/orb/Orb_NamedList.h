@@ -37,8 +37,7 @@ public:
     m_List.Add(item);
     m_Index.Clear();
   }
-  // A child whose name an earlier child has, or null; indexes the children
-  // when they are many.
+  // A child whose name an earlier child has, or null.
   T *CheckNames();
   void Remove(T *item) noexcept {
     if (m_Index.Built())
@@ -101,13 +100,23 @@ template <class T> bool Orb_NamedList<T>::AddUnique(T *item) {
 }
 
 template <class T> T *Orb_NamedList<T>::CheckNames() {
+  // A long list gets its index from the first lookup or insertion: a
+  // netlist's top block is often read and walked but never searched by name.
+  if (m_List.Size() >= Orb_NameIndex<T>::kSortedFill) {
+    m_Index.Clear();
+    return Orb_NameIndex<T>::FindRepeated(m_List.Range());
+  }
   if (m_List.Size() > Orb_NameIndex<T>::kScanLimit)
     return m_Index.RebuildChecked(2 * m_List.Size(), m_List.Range());
+  // Few: each name against those before it, each name read once.
+  std::string_view names[Orb_NameIndex<T>::kScanLimit];
   auto const items = m_List.Range();
-  for (std::size_t i = 1; i < items.size(); ++i)
+  for (std::size_t i = 0; i < items.size(); ++i) {
+    names[i] = items[i]->GetNameString();
     for (std::size_t j = 0; j < i; ++j)
-      if (items[j]->GetNameString() == items[i]->GetNameString())
+      if (names[j] == names[i])
         return items[i];
+  }
   return nullptr;
 }
 

@@ -158,7 +158,7 @@ Orb_Signal *Orb_Pin::GetInnerSignal() const {
 void Orb_Pin::Link(bool inner, Orb_Signal *signal) {
   // One lookup of the inner record serves the whole change.
   Orb_PinLink *link = inner ? InnerLink() : nullptr;
-  if (signal == (inner ? (link ? link->signal : nullptr) : m_pSignal))
+  if (signal == (inner ? (link ? link->signal : nullptr) : GetSignal()))
     return;
   if (!signal) {
     Unlink(inner);
@@ -168,7 +168,7 @@ void Orb_Pin::Link(bool inner, Orb_Signal *signal) {
   signal->m_Pins.Reserve(1);
   if (!inner) {
     Unlink(false);
-    m_pSignal = signal;
+    SetSignal(signal);
   } else if (link) {
     link->signal->m_Pins.Remove(this);
     link->signal = signal;
@@ -180,7 +180,7 @@ void Orb_Pin::Link(bool inner, Orb_Signal *signal) {
 }
 
 void Orb_Pin::Unlink(bool inner) noexcept {
-  Orb_Signal *signal = inner ? GetInnerSignal() : m_pSignal;
+  Orb_Signal *signal = inner ? GetInnerSignal() : GetSignal();
   if (signal)
     signal->m_Pins.Remove(this);
   Forget(inner);
@@ -188,7 +188,7 @@ void Orb_Pin::Unlink(bool inner) noexcept {
 
 void Orb_Pin::Forget(bool inner) noexcept {
   if (!inner) {
-    m_pSignal = nullptr;
+    SetSignal(nullptr);
   } else if (m_HasInner) {
     GetParent()->GetView()->m_InnerLinks.erase(this);
     m_HasInner = false;

@@ -23,10 +23,13 @@ void Orb_ObjectPool::SetSlotSize(std::size_t size, void *owner) {
   m_SlotSize = (std::max(size, sizeof(FreeSlot)) + align - 1) / align * align;
   m_Reciprocal =
       static_cast<std::uint32_t>(((std::uint64_t(1) << 32) + m_SlotSize - 1) / m_SlotSize);
+  m_SlotsPerPage = static_cast<unsigned>((kPageBytes - kPageHeader) / m_SlotSize);
   m_pOwner = owner;
 }
 
 void Orb_ObjectPool::NextPage() {
+  if (m_Pages.size() == m_Pages.capacity())
+    m_Pages.reserve(2 * m_Pages.size() + 8);
   if (m_pPageEnd == m_pChunkEnd) {
     std::size_t const bytes = m_NextChunkPages * kPageBytes;
     m_Chunks.reserve(m_Chunks.size() + 1);
@@ -41,6 +44,7 @@ void Orb_ObjectPool::NextPage() {
   }
   unsigned char *page = m_pPageEnd;
   new (page) PageHeader{m_pOwner, m_NextId, m_Reciprocal};
+  m_Pages.push_back(page);
   m_pNext = page + kPageHeader;
   m_pPageEnd = page + kPageBytes;
 }

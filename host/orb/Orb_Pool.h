@@ -43,6 +43,12 @@ public:
   void Release(void *slot) noexcept;
   // Every slot number handed out so far is below this.
   unsigned IdLimit() const { return m_NextId; }
+  // The slot of number `id` (< IdLimit()), so that links between objects of
+  // one model can be kept as 32-bit numbers.
+  void *At(unsigned id) const {
+    return m_Pages[id / m_SlotsPerPage] + kPageHeader +
+           std::size_t(id % m_SlotsPerPage) * m_SlotSize;
+  }
   // Bytes held in chunks.
   std::size_t Bytes() const { return m_Bytes; }
 
@@ -75,7 +81,10 @@ private:
   std::size_t m_SlotSize = sizeof(FreeSlot);
   std::uint32_t m_Reciprocal = 0;
   void *m_pOwner = nullptr;
+  unsigned m_SlotsPerPage = 1;
   std::vector<void *> m_Chunks;
+  // Every page in slot number order.
+  std::vector<unsigned char *> m_Pages;
   unsigned char *m_pNext = nullptr;
   unsigned char *m_pPageEnd = nullptr;
   unsigned char *m_pChunkEnd = nullptr;

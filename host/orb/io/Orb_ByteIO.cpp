@@ -244,6 +244,23 @@ void ByteReader::Expect(char expected, char const *what) {
 }
 
 std::uint64_t ByteReader::Digits() {
+  // Most numbers lie whole in the buffer: up to 18 digits followed by a
+  // non-digit there cannot overflow and need no refill. Anything else takes
+  // the careful loop below from the same place.
+  constexpr std::ptrdiff_t kSafeDigits = 18;
+  if (m_Size - m_Pos > static_cast<std::size_t>(kSafeDigits)) {
+    char const *const begin = m_Buffer.data() + m_Pos;
+    char const *p = begin;
+    std::uint64_t fast = 0;
+    for (unsigned digit = 0;
+         p - begin <= kSafeDigits && (digit = static_cast<unsigned char>(*p) - unsigned('0')) < 10;
+         ++p)
+      fast = fast * 10 + digit;
+    if (p != begin && p - begin <= kSafeDigits) {
+      m_Pos += static_cast<std::size_t>(p - begin);
+      return fast;
+    }
+  }
   std::uint64_t value = 0;
   bool any = false;
   for (;;) {

@@ -134,23 +134,39 @@ TEST_F(OrbListTest, ChurnKeepsMemoryFlat) {
   EXPECT_LE(m_List.Bytes(), 4 * before);
 }
 
-// Room for one keeps the element in the list itself; growing past it moves
-// the element to an array, in order, with its slot.
-TEST(OrbListInlineTest, OneInPlaceThenGrows) {
-  Item a(0), b(1), c(2);
+// Up to two elements stay in the list itself, the second moving to slot 0
+// when the first goes; growing past two moves them to an array, in order,
+// with their slots; a sort of two renumbers them.
+TEST(OrbListInlineTest, TwoInPlaceThenGrows) {
+  Item a(0), b(1), c(2), d(3);
   List list;
-  list.Reserve(1);
+  list.Reserve(2);
   list.Add(&a);
+  list.Add(&b);
   EXPECT_EQ(list.Bytes(), 0u);
-  EXPECT_EQ(list.Range()[0], &a);
+  EXPECT_EQ(list.Range(), (std::vector<Item *>{&a, &b}));
   list.Remove(&a);
+  EXPECT_EQ(list.Range(), (std::vector<Item *>{&b}));
+  EXPECT_EQ(b.slot, 0u);
+  list.Add(&a);
+  list.StableSort([](Item *x, Item *y) { return x->name < y->name; });
+  EXPECT_EQ(list.Range(), (std::vector<Item *>{&a, &b}));
+  EXPECT_EQ(b.slot, 1u);
+  list.Add(&c);
+  EXPECT_GT(list.Bytes(), 0u);
+  list.Add(&d);
+  list.Remove(&b);
+  EXPECT_EQ(list.Range(), (std::vector<Item *>{&a, &c, &d}));
+  EXPECT_EQ(list.At(2), &d);
+  EXPECT_EQ(d.slot, 2u);
+  // Emptied, the array is kept and reused.
+  std::size_t const bytes = list.Bytes();
+  for (Item *item : {&a, &c, &d})
+    list.Remove(item);
   EXPECT_TRUE(list.Range().empty());
   list.Add(&b);
-  list.Add(&a);
-  list.Add(&c);
-  list.Remove(&a);
-  EXPECT_EQ(list.Range(), (std::vector<Item *>{&b, &c}));
-  EXPECT_EQ(c.slot, 1u);
+  EXPECT_EQ(list.Bytes(), bytes);
+  EXPECT_EQ(list.Range(), (std::vector<Item *>{&b}));
 }
 
 // Drives a name index as a named list does: rebuilt from the live

@@ -198,6 +198,11 @@ TEST_F(Orb_ModelIOTest, RefusesBrokenFiles) {
   }
   manySignals += record("S ", "s5", "\n");
   manyBlocks += record("B ", "c37", "\nE\n");
+  // Past the size at which names are checked by sorting their hashes.
+  std::string hugeSignals;
+  for (int i = 0; i < 5000; ++i)
+    hugeSignals += record("S ", "s" + std::to_string(i), "\n");
+  hugeSignals += record("S ", "s4321", "\n");
   // Each replaces `from` once in kSmallDatabase; an empty `from` replaces all.
   struct {
     std::string_view from, to;
@@ -209,12 +214,17 @@ TEST_F(Orb_ModelIOTest, RefusesBrokenFiles) {
       {"B 3:top", "B 3top", "expected ':'"},
       {"B 3:top\nI", "B 9:top\nI", "expected end of record"},
       {"C 0 1 0", "C 0 1 7", "pin 7 of a view with 2 pins"},
+      // Numbers past the digits that cannot overflow read the same, or overflow.
+      {"C 0 1 0", "C 0 1 0000000000000000000000000007", "pin 7 of a view with 2 pins"},
+      {"C 0 1 0", "C 0 1 18446744073709551616", "number too large"},
+      {"C 0 1 0", "C 0 1 x", "expected a number"},
       {"C 0 1 0", "C 0 2 0 0", "pin 'p' is connected twice inside"},
       {"I 1 1:q\nE\nE\nC 0 1 0", "I 1 1:q\nS 1:t\nE\nE\nC 1 1 0",
        "connects to signal 't' of block 'c', neither its own block nor its parent"},
       {"S 1:s\n", "I 2 1:p\n", "second pin named 'p'"},
       {"S 1:s\n", "S 1:s\nP 1:k 0:\nP 1:k 0:\n", "second property named 'k'"},
       {"S 1:s\n", manySignals, "second signal named 's5'"},
+      {"S 1:s\n", hugeSignals, "second signal named 's4321'"},
       {"B 1:c\nI 1 1:q\nE\n", manyBlocks, "second block named 'c37'"},
       {"1:p", "1:\0"sv, "NUL byte in a name"},
       {"P 1:k", "P 2:k\0"sv, "NUL byte in a name"},
@@ -230,6 +240,31 @@ TEST_F(Orb_ModelIOTest, RefusesBrokenFiles) {
     WriteBytes(m_Path, broken);
     ExpectRefused(m_Path, breakage.expected);
   }
+}
+
+// A block with many children, read without indexing their names, finds each
+// by name afterwards and still refuses a repeated name.
+TEST_F(Orb_ModelIOTest, ManyChildrenFindableAfterOpen) {
+  Orb_Model big("big", "db", "", false);
+  Orb_Block *top =
+      big.CreateDesignMgr("dm")->CreateDesign("d")->CreateView("v")->CreateTopBlock("t");
+  for (int i = 0; i < 5000; ++i) {
+    top->CreateSignal(("s" + std::to_string(i)).c_str());
+    top->CreateBlock(("b" + std::to_string(i)).c_str());
+  }
+  big.Save(m_Path.c_str());
+  Orb_Model opened("o", "db", "", false);
+  opened.Open(m_Path.c_str());
+  Orb_Block *read =
+      opened.GetDesignMgrByName("dm")->GetDesignByName("d")->GetViewByName("v")->GetBlock();
+  for (int i = 0; i < 5000; i += 7) {
+    ASSERT_EQ(read->GetSignalByName(("s" + std::to_string(i)).c_str()), read->GetSignals()[i]);
+    ASSERT_EQ(read->GetBlockByName(("b" + std::to_string(i)).c_str()), read->GetBlocks()[i]);
+  }
+  EXPECT_EQ(read->GetSignalByName("s5000"), nullptr);
+  EXPECT_THROW(read->CreateBlock("b4999"), Orb_Exception);
+  EXPECT_THROW(read->CreateSignal("s0"), Orb_Exception);
+  EXPECT_NE(read->CreateSignal("s5000"), nullptr);
 }
 
 // A failed save keeps the old file; saves keep its mode and links and remove dead saves' files.
