@@ -6,8 +6,10 @@
 #include "Port_String.h"
 
 #include <cstdint>
+#include <deque>
 #include <memory>
 #include <string>
+#include <string_view>
 #include <unordered_map>
 #include <vector>
 
@@ -106,8 +108,8 @@ private:
   // earlier in this view, or null. Blocks of one type resolve through the
   // libraries once; the type blocks live as long as the libraries of the
   // list, which the view holds until it is destroyed.
-  Lum_TlmBlock const *FindTypeBlock(std::string const &storedType) const;
-  void NoteTypeBlock(std::string const &storedType, Lum_TlmBlock const *typeBlock) const;
+  Lum_TlmBlock const *FindTypeBlock(std::string_view storedType) const;
+  void NoteTypeBlock(std::string_view storedType, Lum_TlmBlock const *typeBlock) const;
 
   std::vector<Lum_TlmLibrary const *> &GetLibraryList() const;
   void BuildLibraryList() const;
@@ -126,7 +128,10 @@ private:
   mutable std::vector<bool> m_LocalEntries;
   // Set when building the list failed: TDS_VIEW_TYPE_LIBS is left as stored.
   mutable bool m_LibraryListFailed;
-  mutable std::unordered_map<std::string, Lum_TlmBlock const *> m_TypeBlocks;
+  // The cache's keys view the strings of m_TypeBlockKeys, which never move,
+  // so that a lookup needs no string of its own.
+  mutable std::deque<std::string> m_TypeBlockKeys;
+  mutable std::unordered_map<std::string_view, Lum_TlmBlock const *> m_TypeBlocks;
   // Set while a commit walks the view's blocks, all of which it checked
   // before writing anything.
   mutable bool m_CommitVerified = false;

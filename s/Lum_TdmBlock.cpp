@@ -187,13 +187,13 @@ void Lum_TdmBlock::ResolveTypeBlock() {
   Orb_Property const *stored = GetPropertyByName(kBlockType);
   if (!stored)
     return;
-  std::string const storedType(stored->GetValue());
+  std::string_view const storedType = stored->GetValue();
   Lum_TdmView const *view = GetView();
   Lum_TlmBlock const *typeBlock = view->FindTypeBlock(storedType);
   if (!typeBlock) {
     std::string libraryName;
     std::string typeBlockName;
-    Lum_TdmLoadRules::SplitStoredType(storedType, libraryName, typeBlockName);
+    Lum_TdmLoadRules::SplitStoredType(std::string(storedType), libraryName, typeBlockName);
     Lum_TlmLibrary const *library = view->GetLibrary(Port::StringBase<char>(libraryName.c_str()));
     if (!library)
       throw Lum_ExceptionCorruptDatabase("Lum", kSourcePath, kRevision, __LINE__,
@@ -231,17 +231,19 @@ void Lum_TdmBlock::ReconcilePins(Lum_TlmBlock const *typeBlock) {
   // The second phase creates what the first phase left untaken. The first
   // phase creates no pin, so whether the second will run is known now, and
   // the taken type pins are noted only then.
-  bool const createMissing = Lum_TdmLoadRules::CreatesMissing(
-      typeBlock, GetOrbBlock(), Lum_TdmLoadRules::ForbidsCreating(GetOrbBlock()->GetView()));
+  bool const createMissing = Lum_TdmLoadRules::CreatesMissing(typeBlock, GetOrbBlock());
   std::vector<Lum_TlmPin const *> taken;
   if (createMissing)
     taken.reserve(pins.size());
 
   // First phase: every pin takes the type pin of its (mapped) name.
+  Orb_Block const *typeHost = typeBlock->GetOrbBlock();
+  auto const typePins = typeHost->GetPins();
+  Orb_Context *typeContext = typeBlock->GetContext();
   for (std::size_t i = 0; i < pins.size(); ++i) {
     Orb_Pin *pin = pins[i];
-    Lum_TlmPin const *typePin =
-        typeBlock->GetPinByName(Lum_TdmLoadRules::TypePinName(pin, nameMap));
+    auto const *typePin = static_cast<Lum_TlmPin const *>(typeContext->Specialize(
+        Lum_TdmLoadRules::FindTypePin(typeHost, typePins, i, pin, nameMap)));
     if (Lum_TdmLoadRules::IsUnmatched(pin, typePin))
       throw Lum_ExceptionCorruptDatabase("Lum", kSourcePath, kRevision, __LINE__, pin->GetName(),
                                          Lum_TdmLoadRules::kPinNotFound, false);

@@ -76,6 +76,18 @@ public:
     }
     return pin->GetName();
   }
+  // The host pin of `typePins` (a type block's pins) that the block's i-th
+  // pin looks for by TypePinName, or null. Pins mostly stand in their type
+  // block's order, so the type pin at the same place is tried before the
+  // lookup by name (names are unique in a block).
+  static Orb_Pin *FindTypePin(Orb_Block const *typeBlock, Orb_Range<Orb_Pin> const &typePins,
+                              std::size_t i, Orb_Pin const *pin, NameMap const &map) {
+    std::string_view const name =
+        map.empty() ? pin->GetNameString() : std::string_view(TypePinName(pin, map));
+    if (i < typePins.size() && typePins[i]->GetNameString() == name)
+      return typePins[i];
+    return typeBlock->GetPinByName(map.empty() ? pin->GetName() : TypePinName(pin, map));
+  }
   // A connected pin that finds no type pin fails the load.
   static bool IsUnmatched(Orb_Pin const *pin, Lum_TlmPin const *typePin) {
     return !typePin && pin->GetSignal();
@@ -85,6 +97,10 @@ public:
   static bool CreatesMissing(Lum_TlmBlock const *typeBlock, Orb_Block const *block,
                              bool forbidden) {
     return typeBlock->GetNumPins() > block->GetNumPins() && !forbidden;
+  }
+  // The same, reading the view's property only for a block that lacks pins.
+  static bool CreatesMissing(Lum_TlmBlock const *typeBlock, Orb_Block const *block) {
+    return typeBlock->GetNumPins() > block->GetNumPins() && !ForbidsCreating(block->GetView());
   }
   // Whether the view forbids creating type pins (LUM_DONT_CREATE_UNUSED_PINS).
   static bool ForbidsCreating(Orb_View const *view);

@@ -263,14 +263,16 @@ Lum_TlmLibrary const *Lum_TdmView::GetLocalLibrary() const {
   return GetLibrary(Port::StringBase<char>(Lum_TlmLibrary::LOCAL_LIBRARY_NAME));
 }
 
-Lum_TlmBlock const *Lum_TdmView::FindTypeBlock(std::string const &storedType) const {
+Lum_TlmBlock const *Lum_TdmView::FindTypeBlock(std::string_view storedType) const {
   auto const found = m_TypeBlocks.find(storedType);
   return found == m_TypeBlocks.end() ? nullptr : found->second;
 }
 
-void Lum_TdmView::NoteTypeBlock(std::string const &storedType,
-                                Lum_TlmBlock const *typeBlock) const {
-  m_TypeBlocks.emplace(storedType, typeBlock);
+void Lum_TdmView::NoteTypeBlock(std::string_view storedType, Lum_TlmBlock const *typeBlock) const {
+  if (m_TypeBlocks.count(storedType))
+    return;
+  m_TypeBlockKeys.emplace_back(storedType);
+  m_TypeBlocks.emplace(m_TypeBlockKeys.back(), typeBlock);
 }
 
 // ---------------------------------------------------------------------------

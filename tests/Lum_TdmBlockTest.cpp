@@ -180,6 +180,16 @@ TEST_F(TdmBlockTest, ReconciledPinsEndAsExpected) {
        "P>A,Q>A,C",
        "P=A|Q=A"},
       {{nullptr, {{"P", false}, {"A", true}, {"B", true}}, {{"P", "NOPE"}}}, "P!,A,B", "<absent>"},
+      // Pins in the type block's order, where a map sends one elsewhere or
+      // renames one to the type pin at its place; pins out of that order,
+      // one missing, one beyond the type block's pins.
+      {{nullptr, {{"A", true}, {"B", true}, {"C", true}}, {{"B", "C"}}}, "A,B>C,C", "B=C"},
+      {{nullptr, {{"P", true}, {"B", true}, {"C", true}}, {{"P", "A"}}}, "P>A,B,C", "P=A"},
+      {{nullptr, {{"C", true}, {"B", true}, {"A", true}}, {}}, "C,B,A", "<absent>"},
+      {{nullptr, {{"A", true}, {"C", true}}, {}}, "A,B,C", "<absent>"},
+      {{nullptr, {{"A", true}, {"B", true}, {"C", true}, {"X", false}}, {}},
+       "A,B,C,X!",
+       "<absent>"},
   };
   for (Case const &c : cases) {
     SCOPED_TRACE(c.pins);
