@@ -6,8 +6,6 @@
 #include "Lum_Netlist.h"
 #include "Lum_NetlistExporter.h"
 #include "Lum_NetlistImporter.h"
-#include "Lum_NetlistJsonReader.h"
-#include "Lum_NetlistVerilogReader.h"
 #include "Lum_NetlistWriter.h"
 #include "Lum_TdmView.h"
 #include "Lum_TypeLibraryLoader.h"
@@ -18,9 +16,7 @@
 #include <pybind11/pybind11.h>
 #include <pybind11/stl.h>
 
-#include <cctype>
 #include <filesystem>
-#include <fstream>
 #include <memory>
 #include <optional>
 #include <sstream>
@@ -35,21 +31,6 @@ namespace {
 std::string FolderOf(std::string const &path) {
   std::filesystem::path const p(path);
   return p.has_parent_path() ? p.parent_path().string() : ".";
-}
-
-// A netlist is Verilog by its extension (.v, .vg, .sv) or, with another
-// one, when it does not begin with "{"; .json is JSON.
-bool IsVerilog(std::string const &path) {
-  std::string const extension = std::filesystem::path(path).extension().string();
-  if (extension == ".v" || extension == ".vg" || extension == ".sv")
-    return true;
-  if (extension == ".json")
-    return false;
-  std::ifstream in(path, std::ios::binary);
-  char c = 0;
-  while (in.get(c) && std::isspace(static_cast<unsigned char>(c)))
-    ;
-  return c != '{';
 }
 
 py::dict ImportLibrary(std::string const &path, std::string const &outputDir,
@@ -90,8 +71,7 @@ py::dict ImportNetlist(std::string const &netlistPath, std::string const &output
   std::vector<std::string> kept;
   {
     py::gil_scoped_release release;
-    Lum_Netlist const netlist = IsVerilog(netlistPath) ? Lum_NetlistVerilogReader::Read(netlistPath)
-                                                       : Lum_NetlistJsonReader::Read(netlistPath);
+    Lum_Netlist const netlist = Lum_Netlist::ReadFile(netlistPath);
     // Unlike a one-shot tool, this process may hold a library of that name
     // already (an open database, a type library object): its .tlm serves.
     Lum_TypeLibraryLoadOptions loading;

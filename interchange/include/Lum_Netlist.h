@@ -112,6 +112,10 @@ public:
   Lum_Netlist &operator=(Lum_Netlist &&) noexcept;
   ~Lum_Netlist();
 
+  // Reads a netlist file: Verilog by its extension (.v, .vg, .sv), JSON by
+  // .json, and by its content otherwise (JSON begins with "{").
+  static Lum_Netlist ReadFile(std::string const &path);
+
   // The id of the string, the same for equal strings. Id 0 is "".
   Lum_NetlistName Intern(std::string_view text);
   std::string_view Text(Lum_NetlistName name) const { return m_Texts[name]; }

@@ -1,11 +1,37 @@
 #include "Lum_Netlist.h"
 
 #include "Lum_ExceptionInvalidFormat.h"
+#include "Lum_NetlistJsonReader.h"
+#include "Lum_NetlistVerilogReader.h"
 
 #include <algorithm>
+#include <cctype>
 #include <cstring>
+#include <filesystem>
+#include <fstream>
 #include <stdexcept>
 #include <utility>
+
+namespace {
+
+bool IsVerilog(std::string const &path) {
+  std::string const extension = std::filesystem::path(path).extension().string();
+  if (extension == ".v" || extension == ".vg" || extension == ".sv")
+    return true;
+  if (extension == ".json")
+    return false;
+  std::ifstream in(path, std::ios::binary);
+  char c = 0;
+  while (in.get(c) && std::isspace(static_cast<unsigned char>(c)))
+    ;
+  return c != '{';
+}
+
+} // namespace
+
+Lum_Netlist Lum_Netlist::ReadFile(std::string const &path) {
+  return IsVerilog(path) ? Lum_NetlistVerilogReader::Read(path) : Lum_NetlistJsonReader::Read(path);
+}
 
 Lum_NetlistSpan Lum_NetlistModule::AddBits(std::vector<Lum_NetlistBit> const &more) {
   return AddBits(more.data(), static_cast<std::uint32_t>(more.size()));

@@ -7,8 +7,6 @@
 
 #include "Lum_Netlist.h"
 #include "Lum_NetlistImporter.h"
-#include "Lum_NetlistJsonReader.h"
-#include "Lum_NetlistVerilogReader.h"
 #include "Lum_TdmModel.h"
 #include "Lum_TdmView.h"
 #include "Lum_TypeLibraryLoader.h"
@@ -18,34 +16,15 @@
 
 #include <cstdio>
 #include <filesystem>
-#include <fstream>
 #include <memory>
 
 namespace tdm {
-namespace {
-
-bool IsVerilog(std::string const &path) {
-  std::string const extension = std::filesystem::path(path).extension().string();
-  if (extension == ".v" || extension == ".vg" || extension == ".sv")
-    return true;
-  if (extension == ".json")
-    return false;
-  // Otherwise by content: JSON begins with "{".
-  std::ifstream in(path, std::ios::binary);
-  char c = 0;
-  while (in.get(c) && std::isspace(static_cast<unsigned char>(c)))
-    ;
-  return c != '{';
-}
-
-} // namespace
 
 int RunImport(ImportOptions const &import, CommonOptions const &options) {
   ApplyLibraryPath(options);
   Lum_Netlist netlist;
   try {
-    netlist = IsVerilog(import.netlist) ? Lum_NetlistVerilogReader::Read(import.netlist)
-                                        : Lum_NetlistJsonReader::Read(import.netlist);
+    netlist = Lum_Netlist::ReadFile(import.netlist);
   } catch (Port::Exception const &e) {
     throw Failure(kExitUnreadable, Describe(e) + "; nothing was written");
   }
